@@ -1,0 +1,45 @@
+# Warnings, sanitizers and the pelorin_component() function.
+
+add_library(pelorin_flags INTERFACE)
+target_compile_options(pelorin_flags INTERFACE
+  -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor -Wold-style-cast
+  -Woverloaded-virtual -Wcast-qual -Wformat=2 -Wimplicit-fallthrough -fno-omit-frame-pointer
+  $<$<BOOL:${PELORIN_WERROR}>:-Werror>
+  $<$<CXX_COMPILER_ID:Clang>:-Wthread-safety>)
+if(PELORIN_SANITIZE)
+  add_compile_options(-fsanitize=${PELORIN_SANITIZE} -fno-sanitize-recover=all)
+  add_link_options(-fsanitize=${PELORIN_SANITIZE})
+endif()
+if(PELORIN_FUZZ)
+  add_compile_options(-fsanitize=fuzzer-no-link)
+endif()
+if(CMAKE_BUILD_TYPE STREQUAL "Debug")
+  add_compile_definitions(PLR_DEBUG=1)
+endif()
+
+# pelorin_component(NAME LEVEL n LIBRARY pelorin|platform HEADERS ... SOURCES ... [PRIVATE_LIBS ...])
+#
+# A named group of files of one level. A file may include files of its own
+# component and of lower levels only; tools/check_layers.py reads the table
+# that this function writes to layers.txt in the build folder and holds every
+# #include against it. HEADERS are installed; private ones stand under SOURCES.
+set_property(GLOBAL PROPERTY PELORIN_LAYERS "")
+set_property(GLOBAL PROPERTY PELORIN_HEADERS "")
+function(pelorin_component name)
+  cmake_parse_arguments(C "" "LEVEL;LIBRARY" "HEADERS;SOURCES;PRIVATE_LIBS" ${ARGN})
+  foreach(file IN LISTS C_HEADERS C_SOURCES)
+    set_property(GLOBAL APPEND_STRING PROPERTY PELORIN_LAYERS "${C_LEVEL} ${name} ${file}\n")
+  endforeach()
+  list(TRANSFORM C_HEADERS PREPEND ${PROJECT_SOURCE_DIR}/ OUTPUT_VARIABLE headers)
+  list(TRANSFORM C_SOURCES PREPEND ${PROJECT_SOURCE_DIR}/ OUTPUT_VARIABLE sources)
+  set_property(GLOBAL APPEND PROPERTY PELORIN_HEADERS ${C_HEADERS})
+  list(FILTER sources INCLUDE REGEX "\\.cpp$|\\.c$")
+  if(sources)
+    add_library(${name} OBJECT ${sources})
+    target_include_directories(${name} PUBLIC
+      ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR}/platform/include
+      PRIVATE ${PROJECT_SOURCE_DIR})
+    target_link_libraries(${name} PRIVATE pelorin_flags ${C_PRIVATE_LIBS})
+    set_property(GLOBAL APPEND PROPERTY PELORIN_OBJECTS_${C_LIBRARY} ${name})
+  endif()
+endfunction()

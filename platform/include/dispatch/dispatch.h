@@ -1,0 +1,8 @@
+#pragma once
+
+// Everything of namespace dispatch.
+#include "dispatch/block.h"
+#include "dispatch/group.h"
+#include "dispatch/queue.h"
+#include "dispatch/source.h"
+#include "dispatch/time.h"

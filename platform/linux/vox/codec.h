@@ -1,0 +1,46 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "vox/value.h"
+
+// The value codec: one Vox value as one CBOR item (RFC 8949), both ways.
+// Iterative in both directions; docs/wire-protocol.md has the mapping.
+namespace vox_wire {
+
+// Bytes that were encoded and the descriptors that travel beside them.
+struct encoded {
+    std::vector<std::uint8_t> bytes;  // appended to
+    // Descriptors in the order of their indexes. Each is a duplicate that the
+    // receiver of this struct owns and closes.
+    std::vector<int> descriptors;
+};
+
+struct codec_limits {
+    std::size_t bytes = 16u << 20;
+    unsigned depth = 64;
+    unsigned descriptors = 64;
+};
+
+// Appends `value` to `out.bytes`. Returns 0, or an error number with `out` as
+// it was before: EMSGSIZE over a limit, EILSEQ text that is not UTF-8, EINVAL a
+// value that cannot travel (a connection), EMFILE and the like from dup().
+[[nodiscard]] int encode(vox_object_t value, const codec_limits& limits, encoded& out);
+
+// Decodes the one item that fills `bytes` exactly. Takes ownership of all
+// `descriptors`: those the item names become values, and naming one twice, or
+// leaving one unnamed, is an error; on error all are closed. Returns a new
+// object, or null with a reason for people in `why` (a string literal). Memory taken
+// is at most a constant times the bytes given, whatever they declare.
+[[nodiscard]] vox_object_t decode(std::span<const std::uint8_t> bytes,
+                                  std::span<const int> descriptors, const codec_limits& limits,
+                                  const char*& why) noexcept;
+
+// Whether `text` is well-formed UTF-8 (RFC 3629).
+[[nodiscard]] bool is_utf8(std::span<const std::uint8_t> text) noexcept;
+
+}  // namespace vox_wire
