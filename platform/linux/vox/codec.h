@@ -3,9 +3,9 @@
 #include <cstddef>
 #include <cstdint>
 #include <span>
-#include <string>
 #include <vector>
 
+#include "platform/linux/vox/byte_buffer.h"
 #include "vox/value.h"
 
 // The value codec: one Vox value as one CBOR item (RFC 8949), both ways.
@@ -14,7 +14,7 @@ namespace vox_wire {
 
 // Bytes that were encoded and the descriptors that travel beside them.
 struct encoded {
-    std::vector<std::uint8_t> bytes;  // appended to
+    byte_buffer bytes;  // appended to
     // Descriptors in the order of their indexes. Each is a duplicate that the
     // receiver of this struct owns and closes.
     std::vector<int> descriptors;
