@@ -2,10 +2,22 @@
 
 add_library(pelorin_flags INTERFACE)
 target_compile_options(pelorin_flags INTERFACE
-  -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor -Wold-style-cast
-  -Woverloaded-virtual -Wcast-qual -Wformat=2 -Wimplicit-fallthrough -fno-omit-frame-pointer
+  -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wcast-qual -Wformat=2 -Wimplicit-fallthrough
+  $<$<COMPILE_LANGUAGE:CXX>:-Wnon-virtual-dtor;-Wold-style-cast;-Woverloaded-virtual>
+  -fno-omit-frame-pointer
   $<$<BOOL:${PELORIN_WERROR}>:-Werror>
   $<$<CXX_COMPILER_ID:Clang>:-Wthread-safety>)
+
+# Hardening. What costs time where it counts stays out of users' builds: the
+# checked standard containers are for debug builds.
+target_compile_options(pelorin_flags INTERFACE -fstack-protector-strong -fstack-clash-protection
+  $<$<STREQUAL:${CMAKE_SYSTEM_PROCESSOR},x86_64>:-fcf-protection>)
+target_compile_definitions(pelorin_flags INTERFACE $<$<CONFIG:Debug>:_GLIBCXX_ASSERTIONS>)
+if(NOT PELORIN_SANITIZE)
+  target_compile_options(pelorin_flags INTERFACE
+    $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-U_FORTIFY_SOURCE;-D_FORTIFY_SOURCE=3>)
+endif()
+
 if(PELORIN_SANITIZE)
   add_compile_options(-fsanitize=${PELORIN_SANITIZE} -fno-sanitize-recover=all)
   add_link_options(-fsanitize=${PELORIN_SANITIZE})
