@@ -9,7 +9,10 @@
 #include "vox/value.h"
 
 // The value codec: one Vox value as one CBOR item (RFC 8949), both ways.
-// Iterative in both directions; docs/wire-protocol.md has the mapping.
+// docs/wire-protocol.md has the mapping, cbor.h its grammar.
+//
+// One value has one encoding: what decode() accepts is what encode() gives.
+// Neither recurses. Any thread.
 namespace vox_wire {
 
 // Bytes that were encoded and the descriptors that travel beside them.
@@ -22,8 +25,8 @@ struct encoded {
 
 struct codec_limits {
     std::size_t bytes = 16u << 20;
-    unsigned depth = 64;
-    unsigned descriptors = 64;
+    unsigned depth = 64;        // nested arrays and dictionaries; 64 at most
+    unsigned descriptors = 64;  // 64 at most
 };
 
 // Appends `value` to `out.bytes`. Returns 0, or an error number with `out` as
@@ -32,8 +35,8 @@ struct codec_limits {
 [[nodiscard]] int encode(vox_object_t value, const codec_limits& limits, encoded& out);
 
 // Decodes the one item that fills `bytes` exactly. Takes ownership of all
-// `descriptors`: those the item names become values, and naming one twice, or
-// leaving one unnamed, is an error; on error all are closed. Returns a new
+// `descriptors`: the item names each of them once and in order, and they become
+// values; anything else is an error, and on error all are closed. Returns a new
 // object, or null with a reason for people in `why` (a string literal). Memory taken
 // is at most a constant times the bytes given, whatever they declare.
 [[nodiscard]] vox_object_t decode(std::span<const std::uint8_t> bytes,

@@ -19,7 +19,8 @@
 //          types null and bool are static and never counted.
 // Threads: as in vox/value.h.
 struct vox_object {
-    vox_object(vox_type object_type) noexcept : type(static_cast<std::uint8_t>(object_type)) {}
+    explicit constexpr vox_object(vox_type object_type) noexcept
+        : type(static_cast<std::uint8_t>(object_type)) {}
     vox_object(const vox_object&) = delete;
     vox_object& operator=(const vox_object&) = delete;
 
@@ -58,14 +59,15 @@ struct vox_descriptor_object : vox_object {
     int descriptor = -1;  // owned, close-on-exec
 };
 
-struct vox_array_object : vox_object {
+struct vox_container_object : vox_object {
     using vox_object::vox_object;
     std::uint32_t count = 0;
     std::uint32_t capacity = 0;
-    union {
-        vox_object** items = nullptr;  // owned references, never null
-        vox_object* next_dead;         // while it waits to be freed (see destroy)
-    };
+};
+
+struct vox_array_object : vox_container_object {
+    using vox_container_object::vox_container_object;
+    vox_object** items = nullptr;  // owned references, never null
     vox_object** inline_items() noexcept { return reinterpret_cast<vox_object**>(this + 1); }
 };
 
@@ -86,19 +88,14 @@ struct vox_dictionary_entry {
 };
 static_assert(sizeof(vox_dictionary_entry) == 32);
 
-struct vox_dictionary_object : vox_object {
-    using vox_object::vox_object;
-    std::uint32_t count = 0;
-    std::uint32_t capacity = 0;
+struct vox_dictionary_object : vox_container_object {
+    using vox_container_object::vox_container_object;
     vox_dictionary_entry* entries = nullptr;  // in the order their keys first came
     std::uint32_t* index = nullptr;           // hash table of positions, once there are many
     // For messages: the connection a received one came on, or a reply will go
     // to; an owned reference, null otherwise. Released with the dictionary.
     vox_object* remote = nullptr;
-    union {
-        std::uint64_t reply_id = 0;  // of a request, and of the reply made for it
-        vox_object* next_dead;       // while it waits to be freed
-    };
+    std::uint64_t reply_id = 0;  // of a request, and of the reply made for it
     vox_dictionary_entry* inline_entries() noexcept {
         return reinterpret_cast<vox_dictionary_entry*>(this + 1);
     }
@@ -154,6 +151,7 @@ void deallocate(void* memory) noexcept;
 // Make room for `capacity` elements in all.
 void reserve(vox_array_object& array, std::uint32_t capacity) noexcept;
 void reserve(vox_dictionary_object& dictionary, std::uint32_t capacity) noexcept;
+void free_key(vox_dictionary_entry& entry) noexcept;
 // Append, taking over the caller's reference. `key` must be new.
 void append(vox_array_object& array, vox_object* value) noexcept;
 void append(vox_dictionary_object& dictionary, std::string_view key, vox_object* value) noexcept;
@@ -161,6 +159,18 @@ void append(vox_dictionary_object& dictionary, std::string_view key, vox_object*
 [[nodiscard]] vox_dictionary_entry* find(const vox_dictionary_object& dictionary,
                                          std::string_view key) noexcept;
 
+// The next capacity of a container that is full; doubles, so that appending is
+// cheap on average.
+[[nodiscard]] std::uint32_t grown_capacity(std::uint32_t capacity) noexcept;
+
+inline bool is_counted(const vox_object* object) noexcept {
+    return object->type > VOX_TYPE_BOOL;
+}
+inline bool is_container(const vox_object* object) noexcept {
+    return object->type == VOX_TYPE_ARRAY || object->type == VOX_TYPE_DICTIONARY;
+}
+// Drops one reference; true when it was the last. Not for null and booleans.
+[[nodiscard]] bool drop_reference(vox_object* object) noexcept;
 // Frees an object whose count fell to zero. Containers are taken apart without
 // recursion, however deep they are.
 void destroy(vox_object* object) noexcept;

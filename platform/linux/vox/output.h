@@ -1,0 +1,81 @@
+#pragma once
+
+#include <sys/uio.h>
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <list>
+#include <span>
+#include <vector>
+
+#include "platform/linux/vox/byte_buffer.h"
+#include "platform/linux/vox/frame.h"
+
+// The frames of one connection that wait to be written, and what was written.
+//
+// Owner:   one connection, under its mutex. While one thread writes what
+//          gather() gave it, without the mutex, others may append() only.
+// Order:   frames leave in the order appended. One with descriptors begins a
+//          system call of its own, because descriptors travel with the first byte.
+// Cost:    appending copies small frames behind one another and adopts big ones.
+namespace vox_link {
+
+// What the next sendmsg(2) shall carry.
+struct output_batch {
+    std::array<iovec, 32> pieces;
+    std::size_t count = 0;
+    std::size_t bytes = 0;
+    std::span<const int> descriptors;
+};
+
+class output {
+  public:
+    output() = default;
+    ~output() { clear(); }
+    output(const output&) = delete;
+    output& operator=(const output&) = delete;
+
+    // One complete frame and its descriptors, both taken over.
+    void append(vox_wire::byte_buffer& bytes, std::vector<int>& descriptors);
+    // The rest of a frame of which `sent` bytes (at least one) have left; before
+    // everything that waits.
+    void put_back(vox_wire::byte_buffer& bytes, std::size_t sent);
+    // A frame that was written completely without waiting here.
+    void passed(frame_type type) noexcept;
+
+    void gather(output_batch& batch) noexcept;
+    // `count` bytes of the last batch were written.
+    void written(std::size_t count) noexcept;
+    // Gives up everything that waits.
+    void clear() noexcept;
+
+    [[nodiscard]] bool empty() const noexcept { return chunks_.empty(); }
+    [[nodiscard]] std::size_t bytes() const noexcept { return bytes_; }
+    [[nodiscard]] std::uint64_t frames() const noexcept { return accepted_ - finished_; }
+    [[nodiscard]] std::uint64_t messages() const noexcept { return messages_; }
+    // Frames that ever came, and those that were written or given up.
+    [[nodiscard]] std::uint64_t accepted() const noexcept { return accepted_; }
+    [[nodiscard]] std::uint64_t finished() const noexcept { return finished_; }
+    [[nodiscard]] std::uint64_t messages_written() const noexcept { return messages_written_; }
+
+  private:
+    struct chunk {
+        vox_wire::byte_buffer bytes;   // whole frames
+        std::size_t at = 0;            // first byte not written yet
+        std::size_t frame_begin = 0;   // of the frame that byte belongs to
+        std::vector<int> descriptors;  // owned; leave with the first byte
+    };
+    void close_descriptors(chunk& done) noexcept;
+    void count_frames(chunk& progressed) noexcept;
+
+    std::list<chunk> chunks_;
+    bool tail_open_ = false;      // the last chunk may grow: nobody is writing it
+    std::size_t bytes_ = 0;       // waiting
+    std::uint64_t messages_ = 0;  // waiting, without frames that are no messages
+    std::uint64_t accepted_ = 0;
+    std::uint64_t finished_ = 0;
+    std::uint64_t messages_written_ = 0;
+};
+
+}  // namespace vox_link
