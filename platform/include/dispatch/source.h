@@ -38,7 +38,7 @@ class source {
     // Calls the event handler while `fd` is readable (at end of file too) or
     // writable. The descriptor stays its owner's, who closes it only after the
     // cancel handler has run. A regular file is always ready. Throws
-    // std::system_error (EBADF, EPERM, ENOSPC) when it cannot be watched.
+    // std::system_error (EBADF).
     [[nodiscard]] PLR_EXPORT static source readable(int fd, const queue& on);
     [[nodiscard]] PLR_EXPORT static source writable(int fd, const queue& on);
 
@@ -62,14 +62,17 @@ class source {
 
     // First call at `start`, then every `interval` counted from it, so that no
     // delay adds up; an interval of dispatch::kOnce means once. Firings that
-    // were missed arrive as one call, see data(). `leeway` allows that much
-    // delay. Setting again replaces. Timers only.
+    // were missed arrive as one call, see data(). `leeway`: the delay that the
+    // caller would not mind; kept for callers' sake, timers are always as exact
+    // as the system. Setting again replaces. Timers only.
     PLR_EXPORT void set_timer(time start, std::chrono::nanoseconds interval,
                               std::chrono::nanoseconds leeway = {}) const;
 
     // Counted, as for queues; one suspension stands from the start.
+    // The first resume() of a descriptor's source throws std::system_error when
+    // the kernel cannot watch it (EPERM, EEXIST, ENOSPC).
     PLR_EXPORT void suspend() const noexcept;
-    PLR_EXPORT void resume() const noexcept;
+    PLR_EXPORT void resume() const;
 
     // No event handler starts after cancel() was called on the source's queue;
     // called elsewhere, one that was already submitted may still run. Works on
@@ -84,6 +87,8 @@ class source {
     friend bool operator==(const source&, const source&) noexcept = default;
 
   private:
+    static source adopt(detail::source_core* owned) noexcept;
+
     detail::source_core* core_ = nullptr;
 };
 

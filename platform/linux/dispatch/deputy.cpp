@@ -1,0 +1,91 @@
+#include "deputy.h"
+
+#include <pthread.h>
+#include <signal.h>
+
+#include <algorithm>
+#include <chrono>
+
+#include "futex.h"
+#include "pool.h"
+
+namespace dispatch::detail {
+namespace {
+
+// Longest time that work waits behind a block that takes long, about two ticks.
+constexpr auto kTick = std::chrono::milliseconds(4);
+constexpr unsigned kMostAtOnce = 16;
+
+}  // namespace
+
+std::atomic<std::uint32_t> deputy::watching_{0};
+
+void deputy::start() noexcept {
+    static std::atomic<bool> made{false};
+    if (watching_.exchange(1, std::memory_order_acq_rel))
+        return;
+    if (made.exchange(true)) {
+        futex_wake(watching_, 1);
+        return;
+    }
+    sigset_t all;
+    sigset_t before;
+    sigfillset(&all);
+    ::pthread_sigmask(SIG_SETMASK, &all, &before);
+    pthread_attr_t attributes;
+    ::pthread_attr_init(&attributes);
+    ::pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
+    pthread_t thread;
+    if (::pthread_create(&thread, &attributes, &deputy::main, nullptr) != 0) {
+        made.store(false);
+        watching_.store(0, std::memory_order_release);  // the next call tries again
+    }
+    ::pthread_attr_destroy(&attributes);
+    ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
+}
+
+void* deputy::main(void*) noexcept {
+    ::pthread_setname_np(::pthread_self(), "plr-deputy");
+    for (;;) {
+        observe();
+        watching_.store(0, std::memory_order_seq_cst);
+        // Who called watch() before the store has published his reason before.
+        const pool::progress seen = pool::shared().look();
+        if (seen.waiting || !seen.poller)
+            watching_.store(1, std::memory_order_relaxed);
+        while (!watching_.load(std::memory_order_acquire))
+            futex_wait(watching_, 0);
+    }
+    return nullptr;
+}
+
+// Returns when the pool has been quiet for a tick.
+void deputy::observe() noexcept {
+    std::atomic<std::uint32_t> never{0};
+    pool& watched = pool::shared();
+    pool::progress last = watched.look();
+    for (unsigned reinforcements = 1;;) {
+        futex_wait(never, 0, time::after(kTick));
+        const pool::progress seen = watched.look();
+        const bool moved = seen.taken != last.taken || seen.polled != last.polled;
+        last = seen;
+        if (moved) {
+            reinforcements = 1;
+            continue;
+        }
+        if (!seen.waiting && seen.poller)
+            return;
+        if (!seen.waiting || seen.sleeping > 0) {
+            watched.reinforce();  // takes the work, or becomes the poller
+            continue;
+        }
+        // All workers are at it. When they compute, more of them would not help.
+        if (watched.runnable_workers() >= watched.processors())
+            continue;
+        for (unsigned i = 0; i < reinforcements && watched.reinforce(); ++i) {
+        }
+        reinforcements = std::min(2 * reinforcements, kMostAtOnce);
+    }
+}
+
+}  // namespace dispatch::detail

@@ -1,0 +1,53 @@
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+#include "io_watch.h"
+#include "spin_lock.h"
+#include "timer_queue.h"
+
+// The one epoll instance: descriptor events, timers and the interruption of the
+// idle worker that waits here. Never destroyed.
+namespace dispatch::detail {
+
+struct worker;
+
+class poller {
+  public:
+    static poller& shared() noexcept;
+
+    // Waits for events, takes the worker from among the sleepers, and submits
+    // what the events are for. One worker at a time.
+    void wait(worker& self) noexcept;
+    // Makes wait() return, now or the next time. Any thread.
+    void interrupt() noexcept;
+
+    [[nodiscard]] timer_queue& timers() noexcept { return timers_; }
+
+    // For io_watch.
+    [[nodiscard]] int add(io_watch& watch, std::uint32_t interest) noexcept;
+    [[nodiscard]] int change(io_watch& watch, std::uint32_t interest) noexcept;
+    [[nodiscard]] bool remove(io_watch& watch) noexcept;
+
+  private:
+    // A watch may end while its event is on the way from the kernel: events
+    // carry the place in the table and its generation, not a pointer.
+    struct place {
+        io_watch* watch = nullptr;
+        std::uint32_t generation = 0;
+    };
+
+    poller() noexcept;
+    void deliver(std::uint64_t tag, std::uint32_t events) noexcept;
+    static std::uint64_t tag_of(const io_watch& watch) noexcept;
+
+    int epoll_;
+    int interruption_;  // eventfd, edge-triggered, so that nobody has to read it
+    timer_queue timers_;
+    spin_lock lock_;
+    std::vector<place> places_ PLR_GUARDED_BY(lock_);
+    std::vector<std::uint32_t> free_ PLR_GUARDED_BY(lock_);
+};
+
+}  // namespace dispatch::detail

@@ -1,0 +1,321 @@
+#include "pool.h"
+
+#include <pthread.h>
+#include <sched.h>
+#include <signal.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
+#include <mutex>
+
+#include "deputy.h"
+#include "io_watch.h"
+#include "plr/base/assert.h"
+#include "plr/base/report.h"
+#include "poller.h"
+#include "queue_core.h"
+
+namespace dispatch::detail {
+namespace {
+
+[[gnu::tls_model("initial-exec")]] thread_local worker* current_worker = nullptr;
+
+constexpr unsigned kBatch = 256;
+constexpr auto kRetireAfter = std::chrono::seconds(10);
+
+unsigned usable_processors() noexcept {
+    cpu_set_t set;
+    if (::sched_getaffinity(0, sizeof set, &set) != 0)
+        return 1;
+    return static_cast<unsigned>(std::max(1, CPU_COUNT(&set)));
+}
+
+}  // namespace
+
+std::atomic<pool*> pool::shared_{nullptr};
+
+pool& pool::make() noexcept {
+    static pool* const made = new pool;  // never destroyed: workers outlive main()
+    shared_.store(made, std::memory_order_release);
+    return *made;
+}
+
+pool::pool() noexcept : processors_(usable_processors()) {
+    sleepers_.reserve(kMaximumWorkers);
+    all_.reserve(kMaximumWorkers);
+}
+
+// ---- Submitting -------------------------------------------------------------------------
+
+void pool::submit(item* work, priority level) noexcept {
+    const bool was_empty = lists_[static_cast<unsigned>(level)].push(work);
+    if (current_worker && was_empty)
+        deputy::watch();  // this worker comes for it, unless its present work takes long
+    else
+        notify();
+}
+
+void pool::notify() noexcept {
+    if (searching_.load(std::memory_order_seq_cst) > 0)
+        return;
+    if (sleeping_.load(std::memory_order_seq_cst) > 0 && wake_one())
+        return;
+    const unsigned busy = workers_.load(std::memory_order_relaxed);
+    if (busy - blocked_.load(std::memory_order_relaxed) < processors_ && add_worker())
+        return;
+    deputy::watch();
+}
+
+bool pool::wake_one() noexcept {
+    worker* chosen = nullptr;
+    bool polling = false;
+    {
+        scoped_lock guard(idle_lock_);
+        if (sleepers_.empty())
+            return false;
+        // The poller stays where it is as long as somebody else can come.
+        const auto last = std::find_if(sleepers_.rbegin(), sleepers_.rend(),
+                                       [](const worker* each) { return !each->polling; });
+        chosen = last == sleepers_.rend() ? sleepers_.back() : *last;
+        polling = chosen->polling;
+        remove_sleeper(*chosen);
+        searching_.fetch_add(1, std::memory_order_seq_cst);
+        chosen->wake.store(1, std::memory_order_release);
+    }
+    // `chosen` lives: workers retire only while they stand among the sleepers.
+    if (polling)
+        poller::shared().interrupt();
+    else
+        futex_wake(chosen->wake, 1);
+    return true;
+}
+
+void pool::remove_sleeper(worker& self) noexcept {
+    const auto found = std::find(sleepers_.rbegin(), sleepers_.rend(), &self);
+    if (found == sleepers_.rend())
+        return;
+    sleepers_.erase(std::prev(found.base()));
+    sleeping_.fetch_sub(1, std::memory_order_seq_cst);
+}
+
+bool pool::add_worker() noexcept {
+    unsigned count = workers_.load(std::memory_order_relaxed);
+    do {
+        if (count >= kMaximumWorkers)
+            return false;
+    } while (!workers_.compare_exchange_weak(count, count + 1, std::memory_order_acq_rel));
+    searching_.fetch_add(1, std::memory_order_seq_cst);
+
+    auto* made = new worker;
+    // Signals are for the program's own threads.
+    sigset_t all;
+    sigset_t before;
+    sigfillset(&all);
+    ::pthread_sigmask(SIG_SETMASK, &all, &before);
+    pthread_attr_t attributes;
+    ::pthread_attr_init(&attributes);
+    ::pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
+    pthread_t thread;
+    const int error = ::pthread_create(&thread, &attributes, &pool::main, made);
+    ::pthread_attr_destroy(&attributes);
+    ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
+    if (error == 0)
+        return true;
+    delete made;
+    searching_.fetch_sub(1, std::memory_order_seq_cst);
+    workers_.fetch_sub(1, std::memory_order_acq_rel);
+    static std::atomic<bool> reported{false};
+    if (!reported.exchange(true))
+        plr::report("dispatch: no further worker thread (%s); going on with %u",
+                    ::strerrordesc_np(error), workers_.load());
+    return false;
+}
+
+// ---- Working -----------------------------------------------------------------------------
+
+void* pool::main(void* context) noexcept {
+    auto* self = static_cast<worker*>(context);
+    self->thread = ::gettid();
+    ::pthread_setname_np(::pthread_self(), "plr-worker");
+    pool& owner = shared();
+    {
+        scoped_lock guard(owner.all_lock_);
+        owner.all_.push_back(self);
+    }
+    current_worker = self;
+    owner.run(*self);
+    current_worker = nullptr;
+    {
+        scoped_lock guard(owner.all_lock_);
+        std::erase(owner.all_, self);
+    }
+    owner.workers_.fetch_sub(1, std::memory_order_acq_rel);
+    delete self;
+    return nullptr;
+}
+
+// Begins as a searcher.
+void pool::run(worker& self) noexcept {
+    bool searching = true;
+    for (;;) {
+        priority level;
+        if (item* work = take(level)) {
+            if (searching) {
+                searching = false;
+                // The last searcher that found work sends the next one.
+                if (searching_.fetch_sub(1, std::memory_order_seq_cst) == 1 && has_waiting_work())
+                    notify();
+            }
+            execute(work, level);
+            continue;
+        }
+        if (searching) {
+            searching = false;
+            searching_.fetch_sub(1, std::memory_order_seq_cst);
+            if (has_waiting_work())  // pushed while the pusher saw a searcher
+                continue;
+        }
+        if (!sleep(self))
+            return;
+        searching = self.wake.exchange(0, std::memory_order_acq_rel) != 0;
+    }
+}
+
+item* pool::take(priority& level) noexcept {
+    if (!has_waiting_work())
+        return nullptr;
+    scoped_lock guard(take_lock_);
+    for (unsigned i = 0; i < lists_.size(); ++i) {
+        if (item* work = lists_[i].take()) {
+            level = static_cast<priority>(i);
+            taken_.store(taken_.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
+            return work;
+        }
+    }
+    return nullptr;
+}
+
+void pool::execute(item* work, priority level) noexcept {
+    if (work->run == &queue_tag) {
+        queue_core* queue = queue_core::of(work);
+        unsigned budget = kBatch;
+        switch (queue->drain(budget)) {
+            case queue_core::outcome::idle:
+                queue->release_reference();
+                return;
+            case queue_core::outcome::more:
+                queue->activate();
+                return;
+            case queue_core::outcome::parked:
+            case queue_core::outcome::handed:
+                return;
+        }
+    }
+    frame here(queue_core::global(level));
+    if (work->run == &embedded_tag) {
+        auto* embedded = static_cast<embedded_item*>(work);
+        embedded->function(embedded);
+        return;
+    }
+    work->run(work);
+    recycle_item(static_cast<closure_item*>(work));
+}
+
+// Idle until there may be work. Returns false when the worker shall retire; else
+// the worker stands no longer among the sleepers, and `wake` tells whether it was
+// woken as a searcher.
+bool pool::sleep(worker& self) noexcept {
+    bool polling = false;
+    {
+        scoped_lock guard(idle_lock_);
+        sleepers_.push_back(&self);
+        sleeping_.fetch_add(1, std::memory_order_seq_cst);
+        if (!poller_) {
+            poller_ = polling = self.polling = true;
+            polled_.fetch_add(1, std::memory_order_relaxed);
+        }
+    }
+    if (has_waiting_work()) {
+        leave_idle(self);
+        return true;
+    }
+    if (polling) {
+        poller::shared().wait(self);
+        return true;
+    }
+    while (!self.wake.load(std::memory_order_acquire)) {
+        if (futex_wait(self.wake, 0, time::after(kRetireAfter)))
+            continue;
+        scoped_lock guard(idle_lock_);
+        if (self.wake.load(std::memory_order_acquire))
+            break;
+        remove_sleeper(self);
+        return false;
+    }
+    return true;
+}
+
+void pool::leave_idle(worker& self) noexcept {
+    scoped_lock guard(idle_lock_);
+    remove_sleeper(self);
+    // Not before: an interruption must reach the worker it was meant for, so
+    // nobody else may wait in the poller yet.
+    if (self.polling)
+        self.polling = poller_ = false;
+}
+
+// ---- Blocking and growing ------------------------------------------------------------------
+
+void pool::will_block() noexcept {
+    if (!current_worker)
+        return;
+    const unsigned blocked = blocked_.fetch_add(1, std::memory_order_seq_cst) + 1;
+    if (searching_.load(std::memory_order_seq_cst) == 0) {
+        const progress now = look();
+        const unsigned asleep = now.sleeping + blocked;
+        const unsigned workers = workers_.load(std::memory_order_seq_cst);
+        const unsigned active = workers > asleep ? workers - asleep : 0;
+        // Somebody must be left to run what frees us, and to poll.
+        if (now.waiting ? active < processors_ : active == 0 && !now.poller)
+            reinforce();
+    }
+    deputy::watch();
+}
+
+void pool::did_block() noexcept {
+    if (current_worker)
+        blocked_.fetch_sub(1, std::memory_order_seq_cst);
+}
+
+bool pool::reinforce() noexcept {
+    return (sleeping_.load(std::memory_order_seq_cst) > 0 && wake_one()) || add_worker();
+}
+
+pool::progress pool::look() noexcept {
+    progress seen{};
+    seen.taken = taken_.load(std::memory_order_relaxed);
+    seen.polled = polled_.load(std::memory_order_relaxed);
+    seen.waiting = has_waiting_work();
+    scoped_lock guard(idle_lock_);
+    seen.sleeping = static_cast<unsigned>(sleepers_.size());
+    seen.poller = poller_;
+    return seen;
+}
+
+unsigned pool::runnable_workers() noexcept {
+    scoped_lock guard(all_lock_);
+    return static_cast<unsigned>(std::count_if(all_.begin(), all_.end(), [](const worker* each) {
+        char path[64];
+        std::snprintf(path, sizeof path, "/proc/self/task/%d/stat", each->thread);
+        char state = '?';
+        if (std::FILE* file = std::fopen(path, "re")) {
+            if (std::fscanf(file, "%*d (%*[^)]) %c", &state) != 1)
+                state = '?';
+            std::fclose(file);
+        }
+        return state == 'R';
+    }));
+}
+
+}  // namespace dispatch::detail

@@ -1,0 +1,122 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <array>
+#include <atomic>
+#include <cstdint>
+#include <vector>
+
+#include "dispatch/queue.h"
+#include "run_list.h"
+#include "spin_lock.h"
+
+// The process-wide pool of workers.
+//
+// A worker takes work from the run lists, high priority first. Without work one
+// idle worker is the poller (it waits in epoll_wait, poller.h) and the others
+// sleep on a futex, the one that slept last being woken first.
+//
+// Waking: a push from outside wakes one sleeper, unless a worker is searching
+// already. A push by a worker to an empty list wakes nobody, because that worker
+// comes for it next. The deputy (deputy.h) mends what that leaves open: it wakes
+// or adds workers when work waits and none is taken.
+//
+// No wake-up is lost: who pushes publishes the work and then looks for sleepers;
+// who goes to sleep publishes itself and then looks for work (all seq_cst).
+namespace dispatch::detail {
+
+struct worker {
+    std::atomic<std::uint32_t> wake{0};
+    bool polling = false;  // under pool::idle_lock_
+    pid_t thread = 0;
+};
+
+class pool {
+  public:
+    static pool& shared() noexcept {
+        pool* made = shared_.load(std::memory_order_acquire);
+        return made ? *made : make();
+    }
+
+    // Any thread; `work` is a closure for a global queue, an embedded item or a
+    // queue's place.
+    void submit(item* work, priority level) noexcept;
+
+    [[nodiscard]] bool has_waiting_work() const noexcept {
+        return !lists_[0].empty() || !lists_[1].empty() || !lists_[2].empty();
+    }
+    // Processors this process may use.
+    [[nodiscard]] unsigned processors() const noexcept { return processors_; }
+
+    // The calling worker is about to wait for other work of the pool; it does so
+    // no more. Nothing on other threads.
+    void will_block() noexcept;
+    void did_block() noexcept;
+
+    // There is something to poll for: somebody must exist to do it.
+    void ensure_poller() noexcept {
+        if (workers_.load(std::memory_order_acquire) == 0)
+            add_worker();
+    }
+
+    // For the poller, when it has events in hand and is no poller any more.
+    void leave_idle(worker& self) noexcept;
+
+    // For the deputy.
+    struct progress {
+        std::uint64_t taken;   // work taken since the start
+        std::uint64_t polled;  // times a worker became the poller
+        unsigned sleeping;
+        bool poller;
+        bool waiting;
+        friend bool operator==(const progress&, const progress&) = default;
+    };
+    [[nodiscard]] progress look() noexcept;
+    // Wakes a sleeper or, without one, adds a worker. False at the limit.
+    bool reinforce() noexcept;
+    // Workers that the system has on a processor or in its run queue.
+    [[nodiscard]] unsigned runnable_workers() noexcept;
+
+  private:
+    pool() noexcept;
+    static pool& make() noexcept;
+    static void* main(void* context) noexcept;
+
+    void run(worker& self) noexcept;
+    void execute(item* work, priority level) noexcept;
+    [[nodiscard]] item* take(priority& level) noexcept;
+    [[nodiscard]] bool sleep(worker& self) noexcept;
+    void notify() noexcept;
+    bool wake_one() noexcept;
+    bool add_worker() noexcept;
+    void remove_sleeper(worker& self) noexcept PLR_REQUIRES(idle_lock_);
+
+    static std::atomic<pool*> shared_;
+
+    std::array<run_list, 3> lists_;
+    alignas(64) spin_lock take_lock_;
+    std::atomic<std::uint64_t> taken_{0};
+
+    alignas(64) std::atomic<unsigned> sleeping_{0};  // entries of sleepers_
+    std::atomic<unsigned> searching_{0};             // awake, without work
+    std::atomic<unsigned> workers_{0};
+    std::atomic<unsigned> blocked_{0};  // in will_block()
+    std::atomic<std::uint64_t> polled_{0};
+    spin_lock idle_lock_;
+    std::vector<worker*> sleepers_ PLR_GUARDED_BY(idle_lock_);  // last slept, first woken
+    bool poller_ PLR_GUARDED_BY(idle_lock_) = false;
+    spin_lock all_lock_;
+    std::vector<worker*> all_ PLR_GUARDED_BY(all_lock_);
+    unsigned processors_;
+};
+
+// A worker waits for other work of the pool while one of these lives.
+struct blocking_section {
+    blocking_section() noexcept { pool::shared().will_block(); }
+    ~blocking_section() { pool::shared().did_block(); }
+    blocking_section(const blocking_section&) = delete;
+    blocking_section& operator=(const blocking_section&) = delete;
+};
+
+}  // namespace dispatch::detail

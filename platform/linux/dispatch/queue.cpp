@@ -1,0 +1,116 @@
+#include "dispatch/queue.h"
+
+#include "plr/base/assert.h"
+#include "plr/base/report.h"
+#include "poller.h"
+#include "pool.h"
+#include "queue_core.h"
+
+namespace dispatch {
+namespace detail {
+namespace {
+
+// One pending queue::after().
+struct delayed final : timer_entry {
+    delayed(queue_core* on, block<void()> what) noexcept
+        : timer_entry(&delayed::fire), target(queue::from_raw(on)), work(std::move(what)) {}
+
+    static void fire(timer_entry* entry, std::uint64_t) noexcept {
+        auto* self = static_cast<delayed*>(entry);
+        // The work takes the handle along: its release may destroy the queue.
+        queue_core* on = self->target.get();
+        queue::from_raw(on).async(
+            [held = std::move(self->target), work = std::move(self->work)] { work(); });
+        delete self;
+    }
+
+    queue target;
+    block<void()> work;
+};
+
+}  // namespace
+
+void retain(queue_core* core) noexcept {
+    core->retain();
+}
+void release(queue_core* core) noexcept {
+    core->release();
+}
+
+void submit(queue_core* core, closure_item* work) noexcept {
+    if (core->is_global()) [[unlikely]]
+        pool::shared().submit(work, core->level());
+    else
+        core->push(work);
+}
+
+void submit_and_wait(queue_core* core, void (*function)(void*) noexcept, void* context) {
+    core->run_sync(function, context);
+}
+
+}  // namespace detail
+
+using detail::queue_core;
+
+queue queue::create(std::string_view label, const queue& target) {
+    return adopt(queue_core::create(label, target.get()));
+}
+
+queue queue::global(priority level) noexcept {
+    return from_raw(queue_core::global(level));
+}
+
+void queue::after(time when, block<void()> work) const {
+    if (when.is_forever())
+        return;
+    if (when.nanoseconds() <= time::now(when.on()).nanoseconds()) {
+        async(std::move(work));
+        return;
+    }
+    auto pending = std::make_unique<detail::delayed>(core_, std::move(work));
+    detail::poller::shared().timers().arm(*pending, when, 0);
+    static_cast<void>(pending.release());
+    detail::pool::shared().ensure_poller();
+}
+
+void queue::suspend() const noexcept {
+    core_->suspend();
+}
+void queue::resume() const noexcept {
+    core_->resume();
+}
+const char* queue::label() const noexcept {
+    return core_->label();
+}
+
+void queue::set_specific(const void* key, void* value, void (*destructor)(void*)) const {
+    core_->set_specific(key, value, destructor);
+}
+void* queue::get_specific(const void* key) const noexcept {
+    return core_->get_specific(key);
+}
+
+bool queue::is_current() const noexcept {
+    return core_->is_current();
+}
+
+void queue::assert_current() const noexcept {
+    if (is_current())
+        return;
+    plr::report("dispatch: not on queue '%s'", label());
+    PLR_ASSERT(false, "called on the wrong queue");
+}
+
+void queue::assert_not_current() const noexcept {
+    if (!is_current())
+        return;
+    plr::report("dispatch: on queue '%s'", label());
+    PLR_ASSERT(false, "called on the wrong queue");
+}
+
+void* current_specific(const void* key) noexcept {
+    const detail::frame* innermost = detail::frame::top();
+    return innermost ? innermost->queue->get_specific(key) : nullptr;
+}
+
+}  // namespace dispatch

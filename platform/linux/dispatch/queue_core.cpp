@@ -1,0 +1,418 @@
+#include "queue_core.h"
+
+#include <sched.h>
+
+#include <cstring>
+#include <memory>
+#include <mutex>
+
+#include "plr/base/assert.h"
+#include "plr/base/report.h"
+#include "pool.h"
+
+namespace dispatch::detail {
+namespace {
+
+[[gnu::tls_model("initial-exec")]] thread_local frame* top_frame = nullptr;
+
+constexpr unsigned kBatch = 256;       // items a queue runs before others get their turn
+constexpr unsigned kLingerAfter = 64;  // a drain that ran that many waits a moment for more
+constexpr unsigned kLingerSpins = 64;
+
+// The producer of the successor is between its two stores.
+item* wait_for_next(item* last) noexcept {
+    for (unsigned spins = 1;; ++spins) {
+        if (item* next = last->next.load(std::memory_order_acquire))
+            return next;
+        if (spins % 64 == 0)
+            ::sched_yield();
+        else
+            cpu_relax();
+    }
+}
+
+// A producer that keeps the queue busy is about to push again: going idle now
+// would make it pay for waking us.
+item* linger(item* last, unsigned ran) noexcept {
+    if (ran < kLingerAfter || pool::shared().processors() == 1)
+        return nullptr;
+    for (unsigned spins = 0; spins < kLingerSpins; ++spins) {
+        if (item* next = last->next.load(std::memory_order_acquire))
+            return next;
+        cpu_relax();
+    }
+    return nullptr;
+}
+
+spin_lock specifics_lock;
+
+}  // namespace
+
+void queue_tag(item*) noexcept {}
+void waiter_tag(item*) noexcept {}
+void embedded_tag(item*) noexcept {}
+
+frame::frame(const queue_core* entered) noexcept : queue(entered), up(top_frame) {
+    top_frame = this;
+}
+frame::~frame() {
+    top_frame = up;
+}
+frame* frame::top() noexcept {
+    return top_frame;
+}
+
+void waiter::wait() noexcept {
+    for (unsigned spins = 0; spins < 100 && pool::shared().processors() > 1; ++spins) {
+        if (granted.load(std::memory_order_acquire))
+            return;
+        cpu_relax();
+    }
+    blocking_section blocked;
+    while (!granted.load(std::memory_order_acquire))
+        futex_wait(granted, 0);
+}
+
+void waiter::grant() noexcept {
+    granted.store(1, std::memory_order_release);
+    futex_wake(granted, 1);
+}
+
+// ---- Life -------------------------------------------------------------------------
+
+queue_core* queue_core::create(std::string_view label, queue_core* target) {
+    void* memory = ::operator new(sizeof(queue_core) + label.size() + 1);
+    const bool on_pool = !target || target->is_global();
+    auto* made = ::new (memory) queue_core(label, on_pool ? nullptr : target,
+                                           target ? target->level() : priority::normal, false);
+    if (!on_pool)
+        target->retain();
+    return made;
+}
+
+queue_core* queue_core::global(priority level) noexcept {
+    static constexpr std::string_view kLabels[] = {"global.high", "global.normal", "global.low"};
+    static queue_core* const* const queues = [] {
+        auto* made = new queue_core*[3];
+        for (unsigned i = 0; i < 3; ++i) {
+            void* memory = ::operator new(sizeof(queue_core) + kLabels[i].size() + 1);
+            made[i] =
+                ::new (memory) queue_core(kLabels[i], nullptr, static_cast<priority>(i), true);
+        }
+        return made;
+    }();
+    return queues[static_cast<unsigned>(level)];
+}
+
+queue_core::queue_core(std::string_view label, queue_core* target, priority level,
+                       bool global) noexcept
+    : target_(target), priority_(level), global_(global) {
+    place_.run = &queue_tag;
+    place_.owner = this;
+    char* text = reinterpret_cast<char*>(this + 1);
+    std::memcpy(text, label.data(), label.size());
+    text[label.size()] = '\0';
+}
+
+queue_core::~queue_core() {
+    specific* entry = specifics_.load(std::memory_order_acquire);
+    while (entry) {
+        void* value = entry->value.load(std::memory_order_relaxed);
+        if (value && entry->destructor)
+            entry->destructor(value);
+        delete std::exchange(entry, entry->next);
+    }
+    if (target_)
+        target_->release();
+}
+
+void queue_core::release() noexcept {
+    if (handles_.fetch_sub(1, std::memory_order_acq_rel) != 1 || global_)
+        return;
+    if (suspension_.load(std::memory_order_acquire) >= kSuspension)
+        stop("the last handle of a suspended queue went");
+    release_reference();
+}
+
+void queue_core::release_reference() noexcept {
+    if (references_.fetch_sub(1, std::memory_order_acq_rel) == 1) {
+        this->~queue_core();
+        ::operator delete(this);
+    }
+}
+
+void queue_core::stop(const char* why) const noexcept {
+    plr::report("dispatch: queue '%s': %s", label(), why);
+    PLR_ASSERT(false, why);
+    __builtin_unreachable();
+}
+
+// ---- The list -----------------------------------------------------------------------
+
+// Hot path: one exchange; bench/dispatch_bench.cpp.
+void queue_core::push(item* work) noexcept {
+    work->next.store(nullptr, std::memory_order_relaxed);
+    item* previous = tail_.exchange(work, std::memory_order_acq_rel);
+    if (previous) [[likely]] {
+        previous->next.store(work, std::memory_order_release);
+        return;
+    }
+    head_ = work;
+    counted_ = true;
+    references_.fetch_add(1, std::memory_order_relaxed);
+    activate();
+}
+
+void queue_core::activate() noexcept {
+    if (suspension_.load(std::memory_order_acquire) >= kSuspension && park())
+        return;
+    if (target_)
+        target_->push(&place_);
+    else
+        pool::shared().submit(&place_, priority_);
+}
+
+// Takes `first`, the next to run, off the list. Returns its successor, or null
+// with the stub in its place.
+item* queue_core::detach(item* first) noexcept {
+    if (item* next = first->next.load(std::memory_order_acquire))
+        return next;
+    item* expected = first;
+    if (tail_.compare_exchange_strong(expected, &stub_, std::memory_order_acq_rel))
+        return nullptr;
+    return wait_for_next(first);
+}
+
+// The item behind the stub; null after ownership was given up because there is
+// none.
+item* queue_core::take_after_stub() noexcept {
+    item* next = stub_.next.load(std::memory_order_acquire);
+    if (!next) {
+        item* expected = &stub_;
+        if (tail_.compare_exchange_strong(expected, nullptr, std::memory_order_acq_rel))
+            return nullptr;
+        next = wait_for_next(&stub_);
+    }
+    stub_.next.store(nullptr, std::memory_order_relaxed);
+    return next;
+}
+
+queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
+    frame here(this);
+    item* work = head_;
+    for (unsigned ran = 0;; ++ran) {
+        if (suspension_.load(std::memory_order_acquire) >= kSuspension) [[unlikely]] {
+            head_ = work;
+            if (park())
+                return outcome::parked;
+        }
+        if (budget == 0) [[unlikely]] {
+            if (pool::shared().has_waiting_work()) {
+                head_ = work;
+                return outcome::more;
+            }
+            budget = kBatch;
+        }
+        --budget;
+        if (work->run == &waiter_tag) [[unlikely]] {
+            head_ = detach(work);
+            static_cast<waiter*>(work)->grant();
+            return outcome::handed;
+        }
+        if (work->run == &queue_tag || work->run == &embedded_tag) {
+            head_ = detach(work);
+            if (!run_nested(work, budget))
+                return outcome::handed;
+            work = head_ ? head_ : take_after_stub();
+            if (!work)
+                return outcome::idle;
+            continue;
+        }
+        work->run(work);
+        item* next = work->next.load(std::memory_order_acquire);
+        if (!next)
+            next = linger(work, ran);
+        if (!next) {
+            item* expected = work;
+            if (tail_.compare_exchange_strong(expected, nullptr, std::memory_order_acq_rel)) {
+                recycle_item(static_cast<closure_item*>(work));
+                return outcome::idle;
+            }
+            next = wait_for_next(work);
+        }
+        recycle_item(static_cast<closure_item*>(work));
+        work = next;
+    }
+}
+
+// Runs a detached item that is a queue or embedded. Returns false when a waiter
+// inside took over the ownership.
+bool queue_core::run_nested(item* work, unsigned& budget) noexcept {
+    if (work->run == &embedded_tag) {
+        auto* embedded = static_cast<embedded_item*>(work);
+        embedded->function(embedded);
+        return true;
+    }
+    queue_core* nested = of(work);
+    switch (nested->drain(budget)) {
+        case outcome::idle:
+            nested->release_reference();
+            return true;
+        case outcome::parked:
+            return true;
+        case outcome::more:
+            nested->activate();
+            return true;
+        case outcome::handed:
+            return false;
+    }
+    __builtin_unreachable();
+}
+
+// ---- sync ---------------------------------------------------------------------------
+
+// Takes an idle queue that is not suspended.
+bool queue_core::try_lock() noexcept {
+    if (suspension_.load(std::memory_order_acquire) >= kSuspension)
+        return false;
+    item* expected = nullptr;
+    if (!tail_.compare_exchange_strong(expected, &stub_, std::memory_order_acq_rel))
+        return false;
+    counted_ = false;
+    head_ = nullptr;
+    return true;
+}
+
+// Hot path when idle: one compare-exchange to enter and one to leave;
+// bench/dispatch_bench.cpp.
+void queue_core::run_sync(void (*function)(void*) noexcept, void* context) {
+    frame here(this);
+    if (global_) {
+        function(context);
+        return;
+    }
+    lock_from_here();
+    function(context);
+    unlock_chain();
+}
+
+// Owns this queue and all its targets when it returns.
+void queue_core::lock_from_here() noexcept {
+    for (queue_core* level = this; level; level = level->target_) {
+        if (!level->try_lock()) [[unlikely]] {
+            level->wait_for_ownership();  // comes with the targets'
+            return;
+        }
+    }
+}
+
+void queue_core::wait_for_ownership() noexcept {
+    // The innermost frame is the sync() that waits here.
+    for (const frame* held = top_frame->up; held; held = held->up)
+        for (const queue_core* level = held->queue; level; level = level->target_)
+            if (level == this)
+                stop("sync() from its own work would wait for ever");
+    waiter self;
+    push(&self);
+    self.wait();
+}
+
+void queue_core::unlock_chain() noexcept {
+    for (queue_core* level = this; level;) {
+        queue_core* above = level->target_;
+        level->unlock();
+        level = above;
+    }
+}
+
+void queue_core::unlock() noexcept {
+    const bool counted = counted_;  // not ours to read once the list is empty
+    item* next = head_ ? head_ : take_after_stub();
+    if (!next) {
+        if (counted)
+            release_reference();
+        return;
+    }
+    head_ = next;
+    if (!counted) {
+        counted_ = true;
+        references_.fetch_add(1, std::memory_order_relaxed);
+    }
+    const bool suspended = suspension_.load(std::memory_order_acquire) >= kSuspension;
+    if (next->run == &waiter_tag && !target_ && !suspended) {
+        head_ = detach(next);
+        static_cast<waiter*>(next)->grant();
+        return;
+    }
+    activate();
+}
+
+bool queue_core::is_current() const noexcept {
+    for (const frame* held = top_frame; held; held = held->up)
+        for (const queue_core* level = held->queue; level; level = level->target_)
+            if (level == this)
+                return true;
+    return false;
+}
+
+// ---- Suspension ------------------------------------------------------------------------
+
+bool queue_core::park() noexcept {
+    std::uint32_t seen = suspension_.load(std::memory_order_acquire);
+    while (seen >= kSuspension)
+        if (suspension_.compare_exchange_weak(seen, seen | kParked, std::memory_order_acq_rel))
+            return true;
+    return false;
+}
+
+void queue_core::suspend() noexcept {
+    PLR_ASSERT(!global_, "a global queue cannot be suspended");
+    suspension_.fetch_add(kSuspension, std::memory_order_acq_rel);
+}
+
+void queue_core::resume() noexcept {
+    const std::uint32_t before = suspension_.fetch_sub(kSuspension, std::memory_order_acq_rel);
+    if (before < kSuspension)
+        stop("more resumes than suspends");
+    if (before != (kSuspension | kParked))
+        return;
+    // Nobody owns the queue while it is parked; another suspend() may have come.
+    std::uint32_t expected = kParked;
+    if (suspension_.compare_exchange_strong(expected, 0, std::memory_order_acq_rel))
+        activate();
+}
+
+// ---- Specifics -----------------------------------------------------------------------------
+
+void queue_core::set_specific(const void* key, void* value, void (*destructor)(void*)) {
+    auto fresh = std::unique_ptr<specific>(new specific{key, value, destructor, nullptr});
+    void* replaced = nullptr;
+    void (*replaced_destructor)(void*) = nullptr;
+    {
+        scoped_lock guard(specifics_lock);
+        specific* entry = specifics_.load(std::memory_order_relaxed);
+        while (entry && entry->key != key)
+            entry = entry->next;
+        if (entry) {
+            replaced = entry->value.exchange(value, std::memory_order_acq_rel);
+            replaced_destructor = std::exchange(entry->destructor, destructor);
+        } else if (value) {
+            fresh->next = specifics_.load(std::memory_order_relaxed);
+            specifics_.store(fresh.release(), std::memory_order_release);
+        }
+    }
+    if (replaced && replaced_destructor)
+        replaced_destructor(replaced);
+}
+
+void* queue_core::get_specific(const void* key) const noexcept {
+    for (const queue_core* level = this; level; level = level->target_)
+        for (const specific* entry = level->specifics_.load(std::memory_order_acquire); entry;
+             entry = entry->next)
+            if (entry->key == key)
+                if (void* value = entry->value.load(std::memory_order_acquire))
+                    return value;
+    return nullptr;
+}
+
+}  // namespace dispatch::detail

@@ -1,0 +1,145 @@
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+#include <string_view>
+
+#include "dispatch/queue.h"
+#include "io_watch.h"
+#include "spin_lock.h"
+
+// The state of one queue.
+//
+// A serial queue is its tail word and one intrusive list with many producers
+// and one owner:
+//
+//   tail_ == null            idle: nobody owns the queue
+//   tail_ == the last item   owned; items wait or one runs
+//   tail_ == &stub_          owned, nothing waits
+//
+// push() exchanges the tail. Whoever finds null has become the owner and must
+// activate the queue: hand it to its target's list, or to the pool. The owner
+// passes on ownership with the queue: activator -> list -> drainer, or drainer ->
+// waiter of a sync(). Ownership ends with the compare-exchange of the tail from
+// the last item (or the stub) to null. `head_`, `stub_`, `counted_` are the
+// owner's alone.
+//
+// An executed item stays in place as the tail until its successor is known, so
+// that producers which keep the queue busy touch the tail word only.
+//
+// Suspension is a second word: a count and the bit kParked, which the owner sets
+// instead of going on; the resume() that brings the count to 0 takes ownership
+// from it.
+//
+// A drainer owns the queue and all its targets; a sync() too.
+namespace dispatch::detail {
+
+// What `item::run` holds for items that are not closures. Never called.
+void queue_tag(item*) noexcept;
+void waiter_tag(item*) noexcept;
+void embedded_tag(item*) noexcept;
+
+// A thread in sync(), on its stack.
+struct waiter : item {
+    waiter() noexcept { run = &waiter_tag; }
+    void wait() noexcept;
+    void grant() noexcept;
+
+    std::atomic<std::uint32_t> granted{0};
+};
+
+// What the calling thread runs: innermost queue first.
+struct frame {
+    explicit frame(const queue_core* entered) noexcept;
+    ~frame();
+    frame(const frame&) = delete;
+    frame& operator=(const frame&) = delete;
+    static frame* top() noexcept;
+
+    const queue_core* queue;
+    frame* up;
+};
+
+class queue_core {
+  public:
+    enum class outcome : std::uint8_t {
+        idle,    // drained; ownership and its reference are given up
+        parked,  // suspended; resume() goes on
+        more,    // the batch is over; the caller activates again
+        handed,  // a waiter owns the queue and its targets now
+    };
+
+    static queue_core* create(std::string_view label, queue_core* target);
+    static queue_core* global(priority level) noexcept;
+
+    void retain() noexcept { handles_.fetch_add(1, std::memory_order_relaxed); }
+    void release() noexcept;
+
+    void push(item* work) noexcept;
+    void run_sync(void (*function)(void*) noexcept, void* context);
+    void suspend() noexcept;
+    void resume() noexcept;
+    // For the owner: runs items until one of the outcomes. `budget` counts down.
+    outcome drain(unsigned& budget) noexcept;
+    // For the owner: on to the target or the pool.
+    void activate() noexcept;
+    // For whoever got outcome::idle.
+    void release_reference() noexcept;
+
+    [[nodiscard]] bool is_global() const noexcept { return global_; }
+    [[nodiscard]] bool is_current() const noexcept;
+    [[nodiscard]] const char* label() const noexcept {
+        return reinterpret_cast<const char*>(this + 1);
+    }
+    [[nodiscard]] priority level() const noexcept { return priority_; }
+    void set_specific(const void* key, void* value, void (*destructor)(void*));
+    [[nodiscard]] void* get_specific(const void* key) const noexcept;
+
+    // The queue whose place in a list `work` is.
+    static queue_core* of(item* work) noexcept { return static_cast<place*>(work)->owner; }
+
+  private:
+    static constexpr std::uint32_t kParked = 1;
+    static constexpr std::uint32_t kSuspension = 2;
+
+    struct place : item {
+        queue_core* owner = nullptr;
+    };
+    struct specific {
+        const void* key;
+        std::atomic<void*> value;
+        void (*destructor)(void*);
+        specific* next;
+    };
+
+    queue_core(std::string_view label, queue_core* target, priority level, bool global) noexcept;
+    ~queue_core();
+
+    [[nodiscard]] bool try_lock() noexcept;
+    void lock_from_here() noexcept;
+    void wait_for_ownership() noexcept;
+    void unlock_chain() noexcept;
+    void unlock() noexcept;
+    [[nodiscard]] bool park() noexcept;
+    [[nodiscard]] item* detach(item* first) noexcept;
+    [[nodiscard]] item* take_after_stub() noexcept;
+    [[nodiscard]] bool run_nested(item* work, unsigned& budget) noexcept;
+    [[noreturn]] void stop(const char* why) const noexcept;
+
+    // Producers' line.
+    std::atomic<item*> tail_{nullptr};
+    queue_core* target_;
+    place place_;                               // in the target's list, or the pool's
+    std::atomic<std::uint32_t> references_{1};  // one for all handles, one while owned
+    std::atomic<std::uint32_t> handles_{1};
+    priority priority_;
+    bool global_;
+    // Owner's line.
+    item* head_ = nullptr;  // next to run; null: what follows the stub
+    item stub_;             // its `next` is null whenever it is not in the list
+    std::atomic<std::uint32_t> suspension_{0};
+    bool counted_ = false;  // ownership holds a reference
+    std::atomic<specific*> specifics_{nullptr};
+};
+
+}  // namespace dispatch::detail
