@@ -1,0 +1,114 @@
+"""What is measured, against whom, and the bar each ratio is held to.
+
+A Measurement has one cell a peer, ours first: a program, its arguments and the
+key of the result line to read. Bars compare our median with a peer's (the best
+of several): `limit` is what the ratio ours/peer must not exceed when small is
+good, or must reach when big is good.
+"""
+
+from dataclasses import dataclass, field
+
+
+@dataclass(frozen=True)
+class Cell:
+    program: str
+    arguments: tuple
+    key: str
+    scale: float = 1.0
+
+
+@dataclass(frozen=True)
+class Bar:
+    peers: tuple
+    limit: float
+    text: str
+
+
+@dataclass(frozen=True)
+class Measurement:
+    suite: str
+    title: str
+    unit: str
+    cells: dict  # peer -> Cell
+    bars: tuple = ()
+    big_is_good: bool = False
+    notes: dict = field(default_factory=dict)
+
+
+OURS = "Pelorin"
+ASIO = "Asio strand"
+TBB = "oneTBB"
+SWAP = "mutex + deque swapped"
+MUTEX = "std::mutex lock + unlock"
+EPOLL = "raw socket, epoll"
+BLOCKING = "raw socket, blocking"
+BATCHED = "raw socket, batched"
+SDBUS = "sd-bus"
+ZEROMQ = "ZeroMQ"
+RELAY = "raw relay"
+RELAY_BATCHED = "raw relay, batched"
+MOSQUITTO = "mosquitto"
+
+
+def dispatch():
+    def queue_cells(case, scale=1.0):
+        programs = {OURS: "dispatch_pelorin", ASIO: "dispatch_asio", TBB: "dispatch_tbb", SWAP: "dispatch_mutex"}
+        return {peer: Cell(program, (case,), "ns", scale) for peer, program in programs.items()}
+
+    best = Bar((ASIO, TBB), 1.0, "no slower than the better of strand and oneTBB")
+    yield Measurement("dispatch", "post + drain, 1 producer", "ns", queue_cells("post_drain_1"),
+                      (Bar((ASIO,), 1 / 4, "4 times faster than the strand"),))
+    yield Measurement("dispatch", "post + drain, 2 producers", "ns", queue_cells("post_drain_2"),
+                      (Bar((ASIO,), 1 / 2, "2 times faster than the strand"),))
+    yield Measurement("dispatch", "hop between two queues", "ns", queue_cells("hop"), (best,))
+    yield Measurement("dispatch", "1,000 queues round robin", "ns", queue_cells("round_robin"), (best,))
+    yield Measurement("dispatch", "create + destroy a queue", "ns", queue_cells("create"),
+                      (Bar((ASIO,), 1.0, "no slower than the strand"),))
+    yield Measurement("dispatch", "idle sync", "ns",
+                      {OURS: Cell("dispatch_pelorin", ("sync",), "ns"),
+                       MUTEX: Cell("dispatch_mutex", ("mutex",), "ns")},
+                      (Bar((MUTEX,), 4.0, "at most 4 times"),))
+    yield Measurement("dispatch", "post from outside and wait, one core", "us", queue_cells("outside", 1e-3))
+
+
+def vox():
+    def cells(case, key, extra):
+        programs = {OURS: ("vox_pelorin", case), EPOLL: ("vox_raw", case), **extra,
+                    SDBUS: ("vox_sdbus", case), ZEROMQ: ("vox_zmq", case)}
+        return {peer: Cell(program, (name,), key) for peer, (program, name) in programs.items()}
+
+    raw = Bar((EPOLL,), 1.5, "at most 1.5 times")
+    for size, name in (("small", "small dictionary"), ("large", "64 KiB echo")):
+        for place, where in (("one_core", "one core"), ("two_cores", "two cores")):
+            bars = (raw,) if place == "one_core" else ()
+            if place == "one_core" and size == "small":
+                bars += (Bar((SDBUS,), 1 / 2, "2 times faster"),)
+            case = f"round_trip_{size}_{place}"
+            yield Measurement("vox", f"round trip p50, {name}, {where}", "us",
+                              cells(case, "p50_us", {BLOCKING: ("vox_raw", case + "_blocking")}), bars)
+    yield Measurement("vox", "one way, small", "million/s",
+                      cells("one_way_small", "million_per_s", {BATCHED: ("vox_raw", "one_way_small_batched")}),
+                      (Bar((SDBUS,), 4.0, "at least 4 times"),), big_is_good=True)
+    yield Measurement("vox", "one way, 64 KiB", "GB/s", cells("one_way_large", "gigabyte_per_s", {}),
+                      big_is_good=True)
+
+
+def fanout():
+    programs = {OURS: "fanout_pelorin", RELAY: "fanout_raw", MOSQUITTO: "fanout_mosquitto"}
+    for count in (1, 100, 1000):
+        held = () if count == 1 else (Bar((RELAY,), 1.5, "at most 1.5 times"),
+                                      Bar((MOSQUITTO,), 1.0, "ahead"))
+        yield Measurement("fanout", f"SET to the last of {count:,} watchers, p50", "us",
+                          {peer: Cell(program, ("latency", str(count)), "p50_us")
+                           for peer, program in programs.items()}, held)
+    for count in (1, 100, 1000):
+        held = () if count == 1 else (Bar((RELAY,), 1 / 1.5, "within 1.5 times"),
+                                      Bar((MOSQUITTO,), 1.0, "ahead"))
+        yield Measurement("fanout", f"deliveries to {count:,} watchers", "million/s",
+                          {**{peer: Cell(program, ("rate", str(count)), "million_per_s")
+                              for peer, program in programs.items()},
+                           RELAY_BATCHED: Cell("fanout_raw", ("rate", str(count), "batched"), "million_per_s")},
+                          held, big_is_good=True)
+
+
+SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout}
