@@ -108,7 +108,6 @@ Modem::Modem(const std::string& path, const dispatch::queue& queue, LineSplitter
             source.cancel();
     }));
     // The source holds the reader, and so the descriptor, until it is cancelled.
-    source_.resume();
 }
 
 }  // namespace radio

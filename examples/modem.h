@@ -39,8 +39,9 @@ class LineSplitter {
 // blocks its queue. A file is read to its end; a FIFO stays open when its
 // writers leave; a terminal is set to raw mode.
 //
-// Owner:   its creator, who destroys it on its queue; no handler runs afterwards.
-// Queues:  both handlers run on `queue`.
+// Owner:   its creator, who makes it on any thread and destroys it on its queue;
+//          no handler runs afterwards.
+// Queues:  both handlers run on `queue`, from start() on.
 class Modem {
   public:
     // Called once when nothing will follow: 0 at the end of a file or after a
@@ -53,6 +54,8 @@ class Modem {
     Modem(const Modem&) = delete;
     Modem& operator=(const Modem&) = delete;
     ~Modem() { source_.cancel(); }
+
+    void start() const { source_.resume(); }  // once
 
   private:
     dispatch::source source_;

@@ -1,3 +1,4 @@
+# shellcheck shell=bash
 # Sourced by ./test and ./demo.
 
 # install_missing PACKAGE...: makes sure that these Debian packages are there.

@@ -78,6 +78,7 @@ class ModemTest : public ::testing::Test {
                 end_ = error;
                 ended_.leave();
             });
+        modem_->start();
     }
     static bool happened(const dispatch::group& group) {
         return group.wait(dispatch::time::after(std::chrono::seconds(30))) == 0;

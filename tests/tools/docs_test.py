@@ -1,0 +1,34 @@
+"""The documentation is true: links lead somewhere, shown programs are the tested ones.
+
+usage: docs_test.py PROJECT
+"""
+
+import pathlib
+import re
+import sys
+import unittest
+
+PROJECT = pathlib.Path(sys.argv[1])
+del sys.argv[1:]
+
+
+def documents():
+    yield from PROJECT.glob("*.md")
+    yield from (PROJECT / "docs").rglob("*.md")
+
+
+class Docs(unittest.TestCase):
+    def test_links_lead_to_files(self):
+        for document in documents():
+            for target in re.findall(r"\]\(([^)#\s]+)[^)]*\)", document.read_text()):
+                if "://" not in target:
+                    with self.subTest(document=document.name, target=target):
+                        self.assertTrue((document.parent / target).exists())
+
+    def test_readme_shows_the_example_that_is_built(self):
+        shown = re.findall(r"```cpp\n(.*?)```", (PROJECT / "README.md").read_text(), re.S)
+        self.assertEqual(shown, [(PROJECT / "examples" / "readme_example.cpp").read_text()])
+
+
+if __name__ == "__main__":
+    unittest.main()
