@@ -134,10 +134,10 @@ void measureRate(const Case& measured, Board& board, Set set) {
     result("million_per_s", static_cast<double>(measured.sets() * measured.watchers) / taken * 1e3);
 }
 
-// `set` makes one SET. Fails when a delivery came twice.
+// `set` makes one SET. All watchers are registered. Fails when a delivery came
+// twice.
 template <class Set>
 void measure(const Case& measured, Board& board, Set set) {
-    board.waitForWatchers();
     if (measured.latency)
         measureLatency(measured, board, set);
     else

@@ -121,6 +121,7 @@ int main(int argc, char** argv) {
     awaitBroker(path);
     const bench::Child watching([&] { watch(path, measured.watchers, board); });
     const int setter = connectClient(path, "setter");
+    board.waitForWatchers();
     const std::string publish = publishPacket();
     bench::fanout_cases::measure(measured, board,
                                  [&] { sendAll(setter, publish.data(), publish.size()); });

@@ -71,6 +71,7 @@ int main(int argc, char** argv) {
         pair = makePair();
     const bench::Child service([&] { relay(setter[1], watchers, measured.variant == "batched"); });
     const bench::Child watching([&] { watch(watchers, board); });
+    board.waitForWatchers();
     const std::vector<char> frame(kFrame);
     bench::fanout_cases::measure(measured, board, [&] {
         bench::fanout_sockets::sendAll(setter[0], frame.data(), frame.size());

@@ -41,14 +41,20 @@ def run_program(programs, cell, folder):
     return float(values[cell.key]) * cell.scale
 
 
+def progress(text):
+    """Shows `text` in place of the last one, to a person who waits."""
+    if sys.stderr.isatty():
+        print(f"\r\033[K{text}", end="", file=sys.stderr, flush=True)
+
+
 def measure(measurement, rounds, programs, folder):
     """A list of values for each peer."""
     values = {peer: [] for peer in measurement.cells}
     for number in range(rounds):
         for peer, cell in measurement.cells.items():
-            print(f"\r\033[K{measurement.title}: round {number + 1}, {peer}", end="", file=sys.stderr, flush=True)
+            progress(f"{measurement.title}: round {number + 1}, {peer}")
             values[peer].append(run_program(programs, cell, folder))
-    print("\r\033[K", end="", file=sys.stderr, flush=True)
+    progress("")
     return values
 
 
