@@ -8,7 +8,7 @@ using namespace vox_values;
 
 namespace {
 
-constexpr std::uint32_t usual_room = 4;
+constexpr std::uint32_t kUsualRoom = 4;
 
 vox_object* retained(vox_object* value) noexcept {
     return value ? vox_retain(value) : vox_null_create();
@@ -48,7 +48,7 @@ void append(vox_array_object& array, vox_object* value) noexcept {
 }  // namespace vox_values
 
 vox_object_t vox_array_create(void) {
-    return make_array(usual_room);
+    return make_array(kUsualRoom);
 }
 
 size_t vox_array_get_count(vox_object_t array) {

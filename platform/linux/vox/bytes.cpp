@@ -11,7 +11,7 @@ using namespace vox_values;
 
 namespace {
 
-constexpr std::size_t uuid_length = 16;
+constexpr std::size_t kUuidLength = 16;
 
 vox_object* copy_bytes(vox_type type, const void* bytes, std::size_t length) noexcept {
     vox_bytes_object* object = make_bytes(type, length);
@@ -94,7 +94,7 @@ size_t vox_string_get_length(vox_object_t string) {
 }
 
 vox_object_t vox_uuid_create(const uint8_t bytes[16]) {
-    return copy_bytes(VOX_TYPE_UUID, bytes, uuid_length);
+    return copy_bytes(VOX_TYPE_UUID, bytes, kUuidLength);
 }
 const uint8_t* vox_uuid_get_bytes(vox_object_t uuid) {
     const auto* bytes = as<vox_bytes_object>(uuid, VOX_TYPE_UUID);

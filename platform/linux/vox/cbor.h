@@ -33,22 +33,22 @@ enum class major : std::uint8_t {
     simple = 7,
 };
 
-inline constexpr std::uint8_t byte_false = 0xf4;
-inline constexpr std::uint8_t byte_true = 0xf5;
-inline constexpr std::uint8_t byte_null = 0xf6;
-inline constexpr std::uint8_t byte_double = 0xfb;
+inline constexpr std::uint8_t kByteFalse = 0xf4;
+inline constexpr std::uint8_t kByteTrue = 0xf5;
+inline constexpr std::uint8_t kByteNull = 0xf6;
+inline constexpr std::uint8_t kByteDouble = 0xfb;
 
-inline constexpr std::uint64_t tag_uuid = 37;
-inline constexpr std::uint64_t tag_uint64 = 0x766f7875;    // "voxu"
-inline constexpr std::uint64_t tag_date = 0x766f7874;      // "voxt"
-inline constexpr std::uint64_t tag_error = 0x766f7865;     // "voxe"
-inline constexpr std::uint64_t tag_fd = 0x766f7866;        // "voxf"
-inline constexpr std::uint64_t tag_endpoint = 0x766f7870;  // "voxp"
+inline constexpr std::uint64_t kTagUuid = 37;
+inline constexpr std::uint64_t kTagUint64 = 0x766f7875;    // "voxu"
+inline constexpr std::uint64_t kTagDate = 0x766f7874;      // "voxt"
+inline constexpr std::uint64_t kTagError = 0x766f7865;     // "voxe"
+inline constexpr std::uint64_t kTagFd = 0x766f7866;        // "voxf"
+inline constexpr std::uint64_t kTagEndpoint = 0x766f7870;  // "voxp"
 
-inline constexpr std::size_t uuid_bytes = 16;
-inline constexpr std::size_t most_head_bytes = 9;
-inline constexpr unsigned most_depth = 64;
-inline constexpr unsigned most_descriptors = 64;
+inline constexpr std::size_t kUuidBytes = 16;
+inline constexpr std::size_t kMostHeadBytes = 9;
+inline constexpr unsigned kMostDepth = 64;
+inline constexpr unsigned kMostDescriptors = 64;
 
 inline std::uint64_t to_big_endian(std::uint64_t value) noexcept {
     return __builtin_bswap64(value);
@@ -56,7 +56,7 @@ inline std::uint64_t to_big_endian(std::uint64_t value) noexcept {
 static_assert(__BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__);
 
 // Writes the shortest head of `kind` and `argument` at `at`, where
-// most_head_bytes are free; returns its end.
+// kMostHeadBytes are free; returns its end.
 inline std::uint8_t* put_head(std::uint8_t* at, major kind, std::uint64_t argument) noexcept {
     const auto top = static_cast<std::uint8_t>(static_cast<unsigned>(kind) << 5);
     if (argument < 24) {

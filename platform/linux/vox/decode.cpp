@@ -25,8 +25,8 @@ class decoder {
         : at_(bytes.data()),
           end_(bytes.data() + bytes.size()),
           descriptors_(descriptors),
-          descriptor_limit_(std::min<std::size_t>(limits.descriptors, most_descriptors)),
-          depth_limit_(std::min(limits.depth, most_depth)),
+          descriptor_limit_(std::min<std::size_t>(limits.descriptors, kMostDescriptors)),
+          depth_limit_(std::min(limits.depth, kMostDepth)),
           byte_limit_(limits.bytes) {}
 
     vox_object* run(const char*& why) noexcept {
@@ -196,13 +196,13 @@ class decoder {
     vox_object* read_simple() noexcept {
         owed_--;
         switch (*at_++) {
-            case byte_null:
+            case kByteNull:
                 return vox_null_create();
-            case byte_true:
+            case kByteTrue:
                 return vox_bool_create(1);
-            case byte_false:
+            case kByteFalse:
                 return vox_bool_create(0);
-            case byte_double:
+            case kByteDouble:
                 return read_double();
             default:
                 return fail("a simple value or a float of another width than 64 bits");
@@ -244,7 +244,7 @@ class decoder {
         if (!read_text(length, text))
             return nullptr;
         vox_bytes_object* string = make_bytes(VOX_TYPE_STRING, text.size());
-        string->flags.store(utf8_known, std::memory_order_relaxed);
+        string->flags.store(kUtf8Known, std::memory_order_relaxed);
         std::memcpy(string->text(), text.data(), text.size());
         return string;
     }
@@ -296,17 +296,17 @@ class decoder {
     vox_object* read_tagged(std::uint64_t tag) noexcept {
         owed_++;  // the content; one byte more than was declared, and no memory for it
         switch (tag) {
-            case tag_uuid:
+            case kTagUuid:
                 return read_uuid();
-            case tag_uint64:
+            case kTagUint64:
                 return read_uint64();
-            case tag_date:
+            case kTagDate:
                 return read_date();
-            case tag_error:
+            case kTagError:
                 return read_error();
-            case tag_fd:
+            case kTagFd:
                 return read_descriptor(VOX_TYPE_FD);
-            case tag_endpoint:
+            case kTagEndpoint:
                 return read_descriptor(VOX_TYPE_ENDPOINT);
             default:
                 return fail("a tag is unknown");
@@ -317,12 +317,12 @@ class decoder {
         std::uint64_t length = 0;
         if (!read_head_of(major::bytes, length, "a UUID is not a byte string"))
             return nullptr;
-        if (length != uuid_bytes)
+        if (length != kUuidBytes)
             return fail("a UUID has not 16 bytes");
         if (!fits(length))
             return nullptr;
-        at_ += uuid_bytes;
-        return vox_uuid_create(at_ - uuid_bytes);
+        at_ += kUuidBytes;
+        return vox_uuid_create(at_ - kUuidBytes);
     }
 
     vox_object* read_uint64() noexcept {
@@ -413,7 +413,7 @@ class decoder {
     std::size_t adopted_ = 0;    // descriptors that values own by now, the first ones
     std::size_t owed_ = 0;       // bytes
     unsigned depth_ = 0;
-    container open_[most_depth];  // containers begun and not ended, outermost first
+    container open_[kMostDepth];  // containers begun and not ended, outermost first
 };
 
 }  // namespace

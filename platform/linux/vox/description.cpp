@@ -19,9 +19,9 @@ using namespace vox_values;
 
 namespace {
 
-constexpr std::size_t most_bytes = 16384;  // of a whole description, about
-constexpr std::size_t most_data = 64;      // bytes of one data value that are shown
-constexpr unsigned most_depth = 64;
+constexpr std::size_t kMostBytes = 16384;  // of a whole description, about
+constexpr std::size_t kMostData = 64;      // bytes of one data value that are shown
+constexpr unsigned kMostDepth = 64;
 
 [[gnu::format(printf, 2, 3)]] void append_format(std::string& out, const char* format, ...) {
     char text[64];
@@ -35,7 +35,7 @@ constexpr unsigned most_depth = 64;
 void append_quoted(std::string& out, std::string_view text) {
     const bool valid =
         vox_wire::is_utf8({reinterpret_cast<const std::uint8_t*>(text.data()), text.size()});
-    const std::size_t room = out.size() < most_bytes ? most_bytes - out.size() : 0;
+    const std::size_t room = out.size() < kMostBytes ? kMostBytes - out.size() : 0;
     out += '"';
     for (const char c : text.substr(0, room)) {
         const auto byte = static_cast<unsigned char>(c);
@@ -51,9 +51,9 @@ void append_quoted(std::string& out, std::string_view text) {
 
 void append_data(std::string& out, std::string_view data) {
     append_format(out, "<%zu bytes", data.size());
-    for (const char c : data.substr(0, most_data))
+    for (const char c : data.substr(0, kMostData))
         append_format(out, " %02x", static_cast<unsigned char>(c));
-    out += data.size() > most_data ? " …>" : ">";
+    out += data.size() > kMostData ? " …>" : ">";
 }
 
 void append_date(std::string& out, std::int64_t nanoseconds) {
@@ -92,28 +92,28 @@ void describe(std::string& out, vox_object* object, unsigned depth);
 
 void append_array(std::string& out, const vox_array_object& array, unsigned depth) {
     out += '[';
-    for (std::uint32_t i = 0; i < array.count && out.size() < most_bytes; i++) {
+    for (std::uint32_t i = 0; i < array.count && out.size() < kMostBytes; i++) {
         if (i > 0)
             out += ", ";
         describe(out, array.items[i], depth + 1);
     }
-    out += out.size() < most_bytes ? "]" : "…]";
+    out += out.size() < kMostBytes ? "]" : "…]";
 }
 
 void append_dictionary(std::string& out, const vox_dictionary_object& dictionary, unsigned depth) {
     out += '{';
-    for (std::uint32_t i = 0; i < dictionary.count && out.size() < most_bytes; i++) {
+    for (std::uint32_t i = 0; i < dictionary.count && out.size() < kMostBytes; i++) {
         if (i > 0)
             out += ", ";
         append_quoted(out, dictionary.entries[i].key_view());
         out += ": ";
         describe(out, dictionary.entries[i].value, depth + 1);
     }
-    out += out.size() < most_bytes ? "}" : "…}";
+    out += out.size() < kMostBytes ? "}" : "…}";
 }
 
 void describe_container(std::string& out, vox_object* object, unsigned depth) {
-    if (depth >= most_depth)
+    if (depth >= kMostDepth)
         out += "…";
     else if (object->type == VOX_TYPE_ARRAY)
         append_array(out, *static_cast<vox_array_object*>(object), depth);

@@ -9,14 +9,14 @@ using namespace vox_values;
 
 namespace {
 
-constexpr std::uint32_t usual_room = 4;
+constexpr std::uint32_t kUsualRoom = 4;
 
 void store_key(vox_dictionary_entry& entry, std::string_view key) noexcept {
     PLR_ASSERT(key.size() < UINT32_MAX, "a dictionary key is too long");
     entry.length = static_cast<std::uint32_t>(key.size());
-    if (key.size() > vox_dictionary_entry::inline_key)
+    if (key.size() > vox_dictionary_entry::kInlineKey)
         entry.large = static_cast<char*>(allocate(key.size() + 1));
-    char* text = key.size() > vox_dictionary_entry::inline_key ? entry.large : entry.small;
+    char* text = key.size() > vox_dictionary_entry::kInlineKey ? entry.large : entry.small;
     if (!key.empty())
         std::memcpy(text, key.data(), key.size());
     text[key.size()] = '\0';
@@ -74,7 +74,7 @@ void reserve(vox_dictionary_object& dictionary, std::uint32_t capacity) noexcept
 }
 
 void free_key(vox_dictionary_entry& entry) noexcept {
-    if (entry.length > vox_dictionary_entry::inline_key)
+    if (entry.length > vox_dictionary_entry::kInlineKey)
         deallocate(entry.large);
 }
 
@@ -87,7 +87,7 @@ void append(vox_dictionary_object& dictionary, std::string_view key, vox_object*
     if (dictionary.index) {
         entry.hash = hash_key(key);
         add_to_index(dictionary, dictionary.count - 1);
-    } else if (dictionary.count > unindexed_entries) {
+    } else if (dictionary.count > kUnindexedEntries) {
         start_index(dictionary);
     }
 }
@@ -105,7 +105,7 @@ vox_dictionary_entry* find(const vox_dictionary_object& dictionary, std::string_
 }  // namespace vox_values
 
 vox_object_t vox_dictionary_create(void) {
-    return make_dictionary(usual_room);
+    return make_dictionary(kUsualRoom);
 }
 
 size_t vox_dictionary_get_count(vox_object_t dictionary) {

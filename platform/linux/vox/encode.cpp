@@ -18,7 +18,7 @@ class encoder {
   public:
     encoder(const codec_limits& limits, encoded& out) noexcept
         : limits_(limits),
-          depth_limit_(std::min(limits.depth, most_depth)),
+          depth_limit_(std::min(limits.depth, kMostDepth)),
           out_(out),
           first_byte_(out.bytes.size()),
           first_descriptor_(out.descriptors.size()) {}
@@ -80,25 +80,25 @@ class encoder {
     int put_value(vox_object* value) {
         switch (type_of(value)) {
             case VOX_TYPE_NULL:
-                return put_byte(byte_null);
+                return put_byte(kByteNull);
             case VOX_TYPE_BOOL:
-                return put_byte(vox_bool_get_value(value) ? byte_true : byte_false);
+                return put_byte(vox_bool_get_value(value) ? kByteTrue : kByteFalse);
             case VOX_TYPE_STRING:
                 return put_string(*static_cast<vox_bytes_object*>(value));
             case VOX_TYPE_INT64:
                 return put_int(vox_int64_get_value(value));
             case VOX_TYPE_UINT64:
-                put_head(major::tag, tag_uint64);
+                put_head(major::tag, kTagUint64);
                 return put_head(major::unsigned_int, vox_uint64_get_value(value));
             case VOX_TYPE_DOUBLE:
                 return put_double(static_cast<vox_number_object*>(value)->bits);
             case VOX_TYPE_DATE:
-                put_head(major::tag, tag_date);
+                put_head(major::tag, kTagDate);
                 return put_int(vox_date_get_value(value));
             case VOX_TYPE_DATA:
                 return put_bytes(major::bytes, static_cast<vox_bytes_object*>(value)->view());
             case VOX_TYPE_UUID:
-                put_head(major::tag, tag_uuid);
+                put_head(major::tag, kTagUuid);
                 return put_bytes(major::bytes, static_cast<vox_bytes_object*>(value)->view());
             case VOX_TYPE_ARRAY:
                 return open(major::array, static_cast<vox_container_object*>(value));
@@ -107,9 +107,9 @@ class encoder {
             case VOX_TYPE_ERROR:
                 return put_error(*static_cast<vox_error_object*>(value));
             case VOX_TYPE_FD:
-                return put_descriptor(tag_fd, value);
+                return put_descriptor(kTagFd, value);
             case VOX_TYPE_ENDPOINT:
-                return put_descriptor(tag_endpoint, value);
+                return put_descriptor(kTagEndpoint, value);
             case VOX_TYPE_CONNECTION:
                 break;
         }
@@ -133,7 +133,7 @@ class encoder {
     }
 
     int put_head(major kind, std::uint64_t argument) {
-        std::uint8_t* start = out_.bytes.room(most_head_bytes);
+        std::uint8_t* start = out_.bytes.room(kMostHeadBytes);
         const std::uint8_t* end = vox_wire::put_head(start, kind, argument);
         out_.bytes.set_size(out_.bytes.size() + static_cast<std::size_t>(end - start));
         return 0;
@@ -146,11 +146,11 @@ class encoder {
     }
 
     int put_double(std::uint64_t bits) {
-        std::uint8_t* start = out_.bytes.room(most_head_bytes);
+        std::uint8_t* start = out_.bytes.room(kMostHeadBytes);
         const std::uint64_t wire = to_big_endian(bits);
-        *start = byte_double;
+        *start = kByteDouble;
         std::memcpy(start + 1, &wire, sizeof wire);
-        out_.bytes.set_size(out_.bytes.size() + most_head_bytes);
+        out_.bytes.set_size(out_.bytes.size() + kMostHeadBytes);
         return 0;
     }
 
@@ -158,7 +158,7 @@ class encoder {
     int put_bytes(major kind, std::string_view bytes) {
         if (out_.bytes.size() - first_byte_ + bytes.size() > limits_.bytes)
             return EMSGSIZE;
-        std::uint8_t* start = out_.bytes.room(most_head_bytes + bytes.size());
+        std::uint8_t* start = out_.bytes.room(kMostHeadBytes + bytes.size());
         std::uint8_t* text = vox_wire::put_head(start, kind, bytes.size());
         std::memcpy(text, bytes.data(), bytes.size());
         const auto head = static_cast<std::size_t>(text - start);
@@ -167,16 +167,16 @@ class encoder {
     }
 
     int put_string(vox_bytes_object& string) {
-        if (!(string.flags.load(std::memory_order_relaxed) & utf8_known)) {
+        if (!(string.flags.load(std::memory_order_relaxed) & kUtf8Known)) {
             if (!is_utf8({reinterpret_cast<const std::uint8_t*>(string.text()), string.length}))
                 return EILSEQ;
-            string.flags.store(utf8_known, std::memory_order_relaxed);
+            string.flags.store(kUtf8Known, std::memory_order_relaxed);
         }
         return put_bytes(major::text, string.view());
     }
 
     int put_error(const vox_error_object& error) {
-        put_head(major::tag, tag_error);
+        put_head(major::tag, kTagError);
         put_head(major::array, error.description ? 2 : 1);
         put_int(error.code);
         if (!error.description)
@@ -186,7 +186,7 @@ class encoder {
 
     int put_descriptor(std::uint64_t tag, vox_object* value) {
         const std::size_t place = out_.descriptors.size() - first_descriptor_;
-        if (place >= limits_.descriptors || place >= most_descriptors)
+        if (place >= limits_.descriptors || place >= kMostDescriptors)
             return EMSGSIZE;
         const int copy = duplicate_descriptor(value);
         if (copy < 0)
@@ -210,7 +210,7 @@ class encoder {
     const std::size_t first_byte_;        // where this value begins in `out_`
     const std::size_t first_descriptor_;  // the same for descriptors
     unsigned depth_ = 0;
-    container open_[most_depth];  // containers begun and not ended, outermost first
+    container open_[kMostDepth];  // containers begun and not ended, outermost first
 };
 
 }  // namespace

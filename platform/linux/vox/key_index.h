@@ -13,7 +13,7 @@ struct vox_dictionary_entry;
 // a peer cannot choose keys that collide.
 namespace vox_values {
 
-inline constexpr std::uint32_t unindexed_entries = 16;  // up to here a walk is faster
+inline constexpr std::uint32_t kUnindexedEntries = 16;  // up to here a walk is faster
 
 [[nodiscard]] std::uint32_t hash_key(std::string_view key) noexcept;
 

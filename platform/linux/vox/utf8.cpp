@@ -11,7 +11,7 @@
 namespace vox_wire {
 namespace {
 
-constexpr std::uint64_t high_bits = 0x8080808080808080;
+constexpr std::uint64_t kHighBits = 0x8080808080808080;
 
 std::uint64_t load(const std::uint8_t* bytes) noexcept {
     std::uint64_t word;
@@ -23,11 +23,11 @@ std::uint64_t load(const std::uint8_t* bytes) noexcept {
 // than eight bytes are left.
 const std::uint8_t* skip_ascii(const std::uint8_t* at, const std::uint8_t* end) noexcept {
     while (end - at >= 32) {
-        if ((load(at) | load(at + 8) | load(at + 16) | load(at + 24)) & high_bits)
+        if ((load(at) | load(at + 8) | load(at + 16) | load(at + 24)) & kHighBits)
             break;
         at += 32;
     }
-    while (end - at >= 8 && !(load(at) & high_bits))
+    while (end - at >= 8 && !(load(at) & kHighBits))
         at += 8;
     return at;
 }

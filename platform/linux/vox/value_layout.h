@@ -26,7 +26,7 @@ struct vox_object {
 
     std::atomic<std::uint32_t> references{1};
     const std::uint8_t type;  // a vox_type
-    // Strings: `utf8_known` once the text was found to be valid.
+    // Strings: `kUtf8Known` once the text was found to be valid.
     // Dictionaries: free for whoever made it a message or a reply.
     std::atomic<std::uint8_t> flags{0};
     std::uint16_t inline_capacity = 0;  // arrays, dictionaries: elements that lie in the object
@@ -74,16 +74,16 @@ struct vox_array_object : vox_container_object {
 // Keys of at most 15 bytes lie in the entry, longer ones in memory of their own;
 // both are followed by a NUL.
 struct vox_dictionary_entry {
-    static constexpr std::uint32_t inline_key = 15;
+    static constexpr std::uint32_t kInlineKey = 15;
 
     vox_object* value;     // owned reference, never null
     std::uint32_t length;  // of the key, bytes
     std::uint32_t hash;    // of the key, once the dictionary has an index
     union {
-        char small[inline_key + 1];
+        char small[kInlineKey + 1];
         char* large;
     };
-    const char* key() const noexcept { return length <= inline_key ? small : large; }
+    const char* key() const noexcept { return length <= kInlineKey ? small : large; }
     std::string_view key_view() const noexcept { return {key(), length}; }
 };
 static_assert(sizeof(vox_dictionary_entry) == 32);
@@ -117,7 +117,7 @@ struct vox_custom_object : vox_object {
 
 namespace vox_values {
 
-inline constexpr std::uint8_t utf8_known = 1;
+inline constexpr std::uint8_t kUtf8Known = 1;
 
 // The type of `object`; a null pointer is the null object.
 inline vox_type type_of(const vox_object* object) noexcept {
