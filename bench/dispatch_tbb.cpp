@@ -1,7 +1,7 @@
 // oneTBB has no serial queue; its documentation's idiom is a concurrent_queue
 // and a count of what waits: the post that raises it from 0 enqueues a task that
-// empties the queue. Faster here than a flow graph's serial function_node (one
-// task a message) and than an arena of concurrency 1 a queue.
+// empties the queue. Faster here than a flow graph's serial function_node, which
+// makes a task a message; an arena of concurrency 1 a queue keeps no order.
 
 #include <tbb/concurrent_queue.h>
 #include <tbb/global_control.h>

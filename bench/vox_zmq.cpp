@@ -1,5 +1,5 @@
 // ZeroMQ over ipc://, blobs without structure: PAIR for round trips, PUSH and
-// PULL one way (the fastest patterns that fit). One I/O thread each, default limits.
+// PULL one way (the fastest patterns that fit). One I/O thread each.
 
 #include <zmq.h>
 
@@ -13,11 +13,16 @@ namespace {
 
 using bench::check;
 
+constexpr int kHighWaterMark = 10'000;  // messages; faster one way than its default of 1,000
+
 class Socket {
   public:
     Socket(void* context, int type) : socket_(::zmq_socket(context, type)) {
         if (!socket_)
             bench::fail("zmq_socket");
+        for (const int option : {ZMQ_SNDHWM, ZMQ_RCVHWM})
+            check(::zmq_setsockopt(socket_, option, &kHighWaterMark, sizeof kHighWaterMark),
+                  "zmq_setsockopt");
     }
     Socket(const Socket&) = delete;
     Socket& operator=(const Socket&) = delete;
