@@ -61,3 +61,111 @@ pelorin_component(vox_values LEVEL 1 LIBRARY platform
     platform/linux/vox/utf8.cpp
     platform/linux/vox/value.cpp
     platform/linux/vox/value_layout.h)
+
+pelorin_component(qf_core LEVEL 1 LIBRARY platform
+  HEADERS
+    platform/include/qf/qf.h
+  SOURCES
+    platform/linux/qf/value.cpp
+    platform/linux/qf/value.h)
+
+pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
+  HEADERS
+    include/plr/ipc/array.h
+    include/plr/ipc/auto_reply.h
+    include/plr/ipc/connection.h
+    include/plr/ipc/dict.h
+    include/plr/ipc/object.h
+    include/plr/ipc/read.h
+    include/plr/ipc/values.h
+  SOURCES
+    src/ipc/auto_reply.cpp
+    src/ipc/connection.cpp
+    src/ipc/object.cpp
+    src/ipc/object_to_string.cpp
+    src/ipc/read.cpp)
+
+pelorin_component(concurrency_core LEVEL 2 LIBRARY pelorin
+  HEADERS
+    include/plr/concurrency/async_dispatch_callback.h
+    include/plr/concurrency/qf_shared_ref.h
+    include/plr/concurrency/queue_role.h
+    include/plr/concurrency/shared_ref.h
+    include/plr/concurrency/shared_synchronizable.h
+    include/plr/concurrency/while_alive.h
+  SOURCES
+    src/concurrency/async_dispatch_callback.cpp)
+
+pelorin_component(ipc_endpoints LEVEL 3 LIBRARY pelorin
+  HEADERS
+    include/plr/ipc/vox_client.h
+    include/plr/ipc/vox_client_helper.h
+    include/plr/ipc/vox_server.h
+    include/plr/ipc/vox_server_helper.h
+  SOURCES
+    src/ipc/vox_client.cpp
+    src/ipc/vox_client_helper.cpp
+    src/ipc/vox_server.cpp
+    src/ipc/vox_server_helper.cpp)
+
+pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
+  HEADERS
+    include/plr/rest/auto_reply.h
+    include/plr/rest/message.h
+    include/plr/rest/operation.h
+    include/plr/rest/value_coding.h
+  SOURCES
+    src/rest/auto_reply.cpp
+    src/rest/message.cpp
+    src/rest/operation.cpp
+    src/rest/value_coding.cpp)
+
+pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
+  HEADERS
+    include/plr/rest/connection_resource.h
+    include/plr/rest/connector_server.h
+    include/plr/rest/context_delegater.h
+    include/plr/rest/path_view.h
+    include/plr/rest/reply_dict_context.h
+    include/plr/rest/resource.h
+    include/plr/rest/resource_connection.h
+    include/plr/rest/resource_context.h
+    include/plr/rest/rest_server_example.h
+    include/plr/rest/server_base.h
+    include/plr/rest/tree_resource.h
+  SOURCES
+    src/rest/connection_resource.cpp
+    src/rest/path_view.cpp
+    src/rest/reply_dict_context.cpp
+    src/rest/resource.cpp
+    src/rest/resource_connection.cpp
+    src/rest/resource_context.cpp
+    src/rest/rest_server_example.cpp
+    src/rest/tree_resource.cpp)
+
+pelorin_component(rest_client LEVEL 5 LIBRARY pelorin
+  HEADERS
+    include/plr/rest/rest_module.h
+    include/plr/rest/rest_module_state.h
+    include/plr/rest/vox_connector.h
+  SOURCES
+    src/rest/rest_module.cpp
+    src/rest/rest_module_state.cpp
+    src/rest/vox_connector.cpp)
+
+pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
+  HEADERS
+    include/plr/rest/property_resource.h
+    include/plr/rest/watchable.h
+  SOURCES
+    src/rest/property_path.cpp
+    src/rest/property_path.h
+    src/rest/property_resource.cpp
+    src/rest/watchable.cpp)
+
+pelorin_component(umbrella LEVEL 9 LIBRARY pelorin
+  HEADERS
+    include/plr/concurrency.h
+    include/plr/ipc.h
+    include/plr/plr.h
+    include/plr/rest.h)

@@ -1,0 +1,12 @@
+#pragma once
+
+// Messages between processes: values, connections, servers and clients.
+#include "plr/ipc/array.h"
+#include "plr/ipc/auto_reply.h"
+#include "plr/ipc/connection.h"
+#include "plr/ipc/dict.h"
+#include "plr/ipc/object.h"
+#include "plr/ipc/read.h"
+#include "plr/ipc/values.h"
+#include "plr/ipc/vox_client.h"
+#include "plr/ipc/vox_server.h"

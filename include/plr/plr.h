@@ -1,0 +1,6 @@
+#pragma once
+
+// The whole class interface.
+#include "plr/concurrency.h"
+#include "plr/ipc.h"
+#include "plr/rest.h"

@@ -1,0 +1,145 @@
+#pragma once
+
+#include <algorithm>
+#include <exception>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <utility>
+
+#include "plr/base/report.h"
+#include "plr/concurrency/shared_synchronizable.h"
+#include "plr/ipc/connection.h"
+#include "plr/rest/auto_reply.h"
+#include "plr/rest/connection_resource.h"
+#include "plr/rest/context_delegater.h"
+#include "plr/rest/message.h"
+#include "plr/rest/path_view.h"
+#include "plr/rest/resource.h"
+#include "plr/rest/tree_resource.h"
+
+// What every REST server does whatever its messages come on: it owns the tree
+// of resources, routes messages through it and carries the resources' answers.
+// Server is the deriving class.
+//
+// Queue:   everything runs on the server's queue; registerResource() is for any
+//          thread.
+namespace plr::rest {
+
+template <class Server>
+class RestServerBase : public SharedSynchronizable<Server> {
+  public:
+    // Installs `resource` at `path`, below nodes that are installed already.
+    // False when one is missing, or `resource` is null. A ConnectionRestResource that is the first
+    // resource at exactly "/connections" becomes the server's own. Any thread:
+    // in place on the queue, waiting for it elsewhere.
+    bool registerResource(std::string path, std::shared_ptr<RestResourceBase> resource) {
+        if (!resource)
+            return false;
+        return this->perform([this, &path, &resource] {
+            this->ownQueue_.assertCurrent();
+            return registerResource_sync(path, std::move(resource));
+        });
+    }
+
+    // Routes one message to the resource that its "r" names. Returns whether it
+    // was handled; if not, nobody answers. A service may call it with messages
+    // of its own, on the queue, which come on no connection.
+    bool handleRestMessage(const vox::connection&, const vox::dict& message) {
+        this->ownQueue_.assertCurrent();
+        RestResourceContextDelegater<Server> context(message, self());
+        // Something that is no string reads as the root. The message keeps
+        // the text.
+        const vox::object resource = message[key::kResource];
+        return root_->handleMessage(context, PathView(resource.text()));
+    }
+
+    // A message of a client; ignored without an "r". No message ends the
+    // service: what its handler throws is reported and the message dropped.
+    void handleClientMessage(const vox::connection& connection, const vox::dict& message) {
+        if (!message.contains(key::kResource))
+            return;
+        try {
+            handleRestMessage(connection, message);
+        } catch (const std::exception& failure) {
+            report("a REST resource threw on a client's message, which is dropped: %s",
+                   failure.what());
+        }
+    }
+
+    // A client is gone: tells every resource.
+    void handleDroppedConnection(const vox::connection& connection) {
+        this->ownQueue_.assertCurrent();
+        const std::shared_ptr<RestResourceConnection> dropped = getAuthorResource(connection);
+        if (!dropped)
+            return;
+        RestResourceContextDelegater<Server> context(nullptr, self());
+        root_->handleDroppedConnection(context, PathView("/"), dropped);
+    }
+
+    // What contexts delegate.
+    bool sendReplyWithValue(const vox::dict& message, const vox::object& value) const {
+        const vox::dict reply = createReplyWithValue(message, value);
+        if (!reply)
+            return false;
+        const vox::connection remote(
+            vox::object::retain(vox_dictionary_get_remote_connection(message.get())));
+        remote.send_message(reply);
+        return true;
+    }
+    [[nodiscard]] std::shared_ptr<vox::object> takeAutoReplyValue(const vox::dict& message) const {
+        return createAutoReplyValue(message);
+    }
+    [[nodiscard]] std::shared_ptr<RestResourceConnection> getAuthorResource(
+        const vox::connection& connection) const {
+        this->ownQueue_.assertCurrent();
+        return connections_ ? connections_->lookupConnection(connection) : nullptr;
+    }
+    bool sendNotify(const RestResourceConnection& to, const vox::object& author,
+                    const vox::object& resource, const vox::object& value) const {
+        to.send(createNotify(author, resource, value));
+        return true;
+    }
+    bool sendGet(const RestResourceConnection& to, const vox::object& author,
+                 const vox::object& resource, const vox::object& value,
+                 std::shared_ptr<vox::object> autoReply) const {
+        to.sendWithReply(createRestMessage(asObject(Operation::kGet), author, resource, value),
+                         this->ownQueue_.queue(),
+                         RestResourceConnection::ReplyHandler(
+                             [autoReply = std::move(autoReply)](const vox::object& answer) mutable {
+                                 // Whoever asked first is answered by letting go.
+                                 const std::shared_ptr<vox::object> slot = std::move(autoReply);
+                                 if (const vox::dict reply(answer); slot && reply)
+                                     *slot = getReplyValue(reply);
+                             }));
+        return true;
+    }
+    bool redirect(RestResourceContext& context, const std::string& path) {
+        this->ownQueue_.assertCurrent();
+        return root_->handleMessage(context, PathView(path));
+    }
+
+  protected:
+    using SharedSynchronizable<Server>::SharedSynchronizable;
+    ~RestServerBase() = default;
+
+  private:
+    Server& self() { return static_cast<Server&>(*this); }
+
+    bool registerResource_sync(std::string_view path, std::shared_ptr<RestResourceBase>&& resource)
+        PLR_ON(this->ownQueue_)
+    {
+        // Deliberate: exactly this spelling, and tested before the installation,
+        // which may find the place taken.
+        if (!connections_ && path == "/connections")
+            connections_ = std::dynamic_pointer_cast<ConnectionRestResource>(resource);
+        path.remove_prefix(std::min(path.find_first_not_of('/'), path.size()));
+        return root_->installSubResource(PathView(path), std::move(resource));
+    }
+
+    const std::shared_ptr<TreeRestResource> root_ PLR_CONFINED_TO(this->ownQueue_)
+    = std::make_shared<TreeRestResource>();
+    std::shared_ptr<ConnectionRestResource> connections_ PLR_CONFINED_TO(this->ownQueue_);
+};
+
+}  // namespace plr::rest

@@ -1,0 +1,42 @@
+#pragma once
+
+#include <memory>
+
+#include "plr/base/export.h"
+#include "plr/rest/resource.h"
+
+// A TreeRestResource is an inner node of a server's tree: it hands messages to
+// the child that the next segment of the path names.
+//
+//   GET of the node itself    the children's names, an array in ascending order
+//   GET of its "*"            a dictionary of the children's own "*" by name
+//   everything else           for a child, or unhandled
+//
+// Names match exactly, byte for byte.
+namespace plr::rest {
+
+class PLR_EXPORT TreeRestResource : public RestResource {
+  public:
+    TreeRestResource();
+    ~TreeRestResource() override;
+
+    bool handleMessage(RestResourceContext& context, const PathView& path) override;
+    // Inner nodes are never made: each is installed before what goes below it.
+    // Deliberate: a name that is taken stays as it is, and that is no failure.
+    bool installSubResource(const PathView& path,
+                            std::shared_ptr<RestResourceBase>&& resource) override;
+    // Tells every resource below.
+    void handleDroppedConnection(
+        RestResourceContext& context, const PathView& path,
+        const std::shared_ptr<RestResourceConnection>& connection) override;
+    bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override;
+
+    // `path` stands on the "*".
+    virtual bool handleMessage_DumpState(RestResourceContext& context, PathView path);
+
+  private:
+    struct Children;  // by name, in ascending order
+    const std::unique_ptr<Children> children_;
+};
+
+}  // namespace plr::rest
