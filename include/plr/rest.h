@@ -1,6 +1,9 @@
 #pragma once
 
-// Resources at paths: servers, clients and their messages.
+// Resources at paths: servers, clients and their messages, and what they are
+// made with: values, connections, queue-owning objects.
+#include "plr/concurrency.h"
+#include "plr/ipc.h"
 #include "plr/rest/auto_reply.h"
 #include "plr/rest/connection_resource.h"
 #include "plr/rest/message.h"
