@@ -1,0 +1,290 @@
+#include <gtest/gtest.h>
+
+#include <array>
+#include <atomic>
+#include <memory>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "dispatch/dispatch.h"
+#include "support/waiting.h"
+
+namespace {
+
+using dispatch::queue;
+using plr::test::drain;
+using plr::test::Event;
+
+TEST(Queue, KeepsTheOrderOfEachProducerAndExcludesItself) {
+    constexpr int kProducers = 4;
+    constexpr int kEach = 20'000;
+    const auto serial = queue::create("serial");
+    std::array<int, kProducers> seen{};  // touched on the queue only
+    int inside = 0;
+    int faults = 0;
+    std::vector<std::thread> producers;
+    for (int producer = 0; producer < kProducers; ++producer) {
+        producers.emplace_back([&, producer] {
+            for (int i = 0; i < kEach; ++i) {
+                serial.async([&, producer, i] {
+                    faults += inside++ != 0;
+                    faults += seen[static_cast<unsigned>(producer)]++ != i;
+                    --inside;
+                });
+            }
+        });
+    }
+    for (auto& each : producers)
+        each.join();
+    drain(serial);
+    EXPECT_EQ(faults, 0);
+    EXPECT_EQ(seen, (std::array<int, kProducers>{kEach, kEach, kEach, kEach}));
+}
+
+TEST(Queue, RunsClosuresOfEverySizeAndDestroysThemOnTheQueue) {
+    const auto serial = queue::create("serial");
+    struct Tracked {
+        explicit Tracked(const queue& on, std::atomic<int>& count) : where(on), wrong(count) {}
+        ~Tracked() { wrong += !where.is_current(); }
+        const queue& where;
+        std::atomic<int>& wrong;
+    };
+    std::atomic<int> wrong{0};
+    std::atomic<int> sum{0};
+    const auto submit = [&]<std::size_t Size>(std::array<char, Size> payload) {
+        serial.async([payload, held = std::make_unique<Tracked>(serial, wrong), &sum] {
+            sum += static_cast<int>(payload.size());
+        });
+    };
+    submit(std::array<char, 1>{});
+    submit(std::array<char, 24>{});
+    submit(std::array<char, 500>{});
+    drain(serial);
+    EXPECT_EQ(sum, 525);
+    drain(serial);
+    EXPECT_EQ(wrong, 0);
+}
+
+TEST(Queue, WorkMaySubmitWorkToItsOwnQueueForLong) {
+    const auto serial = queue::create("serial");
+    Event done;
+    int left = 100'000;
+    struct Again {
+        const queue& on;
+        int& left;
+        Event& done;
+        void operator()() const {
+            if (--left == 0)
+                done.signal();
+            else
+                on.async(Again{on, left, done});
+        }
+    };
+    serial.async(Again{serial, left, done});
+    EXPECT_TRUE(done.wait());
+}
+
+TEST(Queue, ABusyQueueDoesNotStarveOthers) {
+    const auto other = queue::create("other");
+    std::atomic<bool> stop{false};
+    struct Again {
+        const queue& on;
+        std::atomic<bool>& stop;
+        void operator()() const {
+            if (!stop)
+                on.async(Again{on, stop});
+        }
+    };
+    // As many endless queues as there may be workers, and one more.
+    std::vector<queue> all;
+    for (unsigned i = 0; i <= std::thread::hardware_concurrency(); ++i)
+        all.push_back(queue::create("endless"));
+    for (const queue& each : all)
+        each.async(Again{each, stop});
+    Event ran;
+    other.async([&] { ran.signal(); });
+    EXPECT_TRUE(ran.wait());
+    stop = true;
+    for (const queue& each : all) {
+        drain(each);
+        drain(each);  // one more may have been submitted just before
+    }
+}
+
+TEST(Queue, LivesUntilItsWorkHasRunWithoutHandles) {
+    Event done;
+    auto destroyed = std::make_shared<int>();
+    {
+        const auto held = queue::create("gate");
+        held.suspend();
+        auto passing = queue::create("passing", held);
+        for (int i = 0; i < 100; ++i)
+            passing.async([destroyed] {});
+        passing.async([&done] { done.signal(); });
+        passing = queue();
+        held.resume();
+    }
+    EXPECT_TRUE(done.wait());
+    Event after;  // the closures' destruction follows their run
+    queue::global().async([&] { after.signal(); });
+    EXPECT_TRUE(after.wait());
+}
+
+TEST(Queue, QueuesOfOneTargetExcludeEachOther) {
+    const auto target = queue::create("target");
+    const std::array<queue, 4> children = {queue::create("a", target), queue::create("b", target),
+                                           queue::create("c", target),
+                                           queue::create("below c", queue::create("c2", target))};
+    int inside = 0;
+    int faults = 0;
+    int ran = 0;
+    std::vector<std::thread> producers;
+    for (const queue& child : children) {
+        producers.emplace_back([&] {
+            for (int i = 0; i < 5'000; ++i) {
+                const auto work = [&] {
+                    faults += inside++ != 0;
+                    ++ran;
+                    --inside;
+                };
+                if (i % 16 == 0)
+                    child.sync(work);
+                else
+                    child.async(work);
+            }
+            drain(child);
+        });
+    }
+    for (auto& each : producers)
+        each.join();
+    target.sync([&] { EXPECT_EQ(ran, 20'000); });
+    EXPECT_EQ(faults, 0);
+}
+
+TEST(Queue, ATargetRunsChildrenInTheOrderOfTheirFirstWork) {
+    const auto target = queue::create("target");
+    const auto first = queue::create("first", target);
+    const auto second = queue::create("second", target);
+    std::string order;
+    target.suspend();
+    first.async([&] { order += "1"; });
+    target.async([&] { order += "t"; });
+    second.async([&] { order += "2"; });
+    target.resume();
+    drain(target);
+    EXPECT_EQ(order, "1t2");
+}
+
+TEST(Queue, GlobalQueuesRunAtOnceAndByPriority) {
+    Event both;
+    Event release;
+    const auto wait = [&] {
+        both.signal();
+        EXPECT_TRUE(release.wait());
+    };
+    const dispatch::group waiting;
+    waiting.async(queue::global(dispatch::priority::low), wait);
+    waiting.async(queue::global(), wait);
+    EXPECT_TRUE(both.wait());
+    EXPECT_TRUE(both.wait());
+    release.signal();
+    release.signal();
+    EXPECT_EQ(waiting.wait(dispatch::time::after(plr::test::kBound)), 0);
+    EXPECT_EQ(queue::global().sync([] { return 3; }), 3);
+    EXPECT_EQ(queue::global(), queue::global(dispatch::priority::normal));
+    Event on_high;
+    queue::global(dispatch::priority::high).async([&] {
+        EXPECT_TRUE(queue::global(dispatch::priority::high).is_current());
+        EXPECT_FALSE(queue::global().is_current());
+        on_high.signal();
+    });
+    EXPECT_TRUE(on_high.wait());
+}
+
+TEST(Queue, AfterRunsOnceTheDeadlineHasPassedOnEitherClock) {
+    const auto serial = queue::create("serial");
+    for (const auto on :
+         {dispatch::clock::monotonic, dispatch::clock::boot, dispatch::clock::wall}) {
+        Event ran;
+        const auto deadline = dispatch::time::after(std::chrono::milliseconds(3), on);
+        serial.after(deadline, dispatch::block<void()>([&] {
+                         EXPECT_TRUE(serial.is_current());
+                         EXPECT_GE(dispatch::time::now(on).nanoseconds(), deadline.nanoseconds());
+                         ran.signal();
+                     }));
+        EXPECT_TRUE(ran.wait()) << static_cast<int>(on);
+    }
+    Event past;
+    serial.after(dispatch::immediately, dispatch::block<void()>([&] { past.signal(); }));
+    EXPECT_TRUE(past.wait());
+    auto token = std::make_shared<int>();
+    serial.after(dispatch::forever, dispatch::block<void()>([token] {}));
+    EXPECT_EQ(token.use_count(), 1);
+}
+
+TEST(Queue, SpecificsAreFoundThroughTargetsAndReleased) {
+    static const char outerKey = 0;
+    static const char innerKey = 0;
+    static std::vector<int> destroyed;
+    destroyed.clear();
+    const auto record = [](void* value) { destroyed.push_back(*static_cast<int*>(value)); };
+    int outer = 1;
+    int inner = 2;
+    int replacement = 3;
+    {
+        const auto target = queue::create("target");
+        const auto child = queue::create("child", target);
+        target.set_specific(&outerKey, &outer, record);
+        child.set_specific(&innerKey, &inner, record);
+        EXPECT_EQ(child.get_specific(&outerKey), &outer);
+        EXPECT_EQ(target.get_specific(&innerKey), nullptr);
+        EXPECT_EQ(dispatch::current_specific(&outerKey), nullptr);
+        child.sync([&] { EXPECT_EQ(dispatch::current_specific(&outerKey), &outer); });
+        child.set_specific(&outerKey, &replacement, record);
+        EXPECT_EQ(child.get_specific(&outerKey), &replacement);
+        child.set_specific(&innerKey, nullptr);
+        EXPECT_EQ(child.get_specific(&innerKey), nullptr);
+        EXPECT_EQ(destroyed, std::vector{2});
+        child.set_specific(&outerKey, nullptr);
+        EXPECT_EQ(child.get_specific(&outerKey), &outer);
+    }
+    EXPECT_EQ(destroyed, (std::vector{2, 3, 1}));
+}
+
+TEST(Queue, KnowsWhetherItIsCurrent) {
+    const auto target = queue::create("target");
+    const auto child = queue::create("child", target);
+    const auto other = queue::create("other");
+    EXPECT_FALSE(child.is_current());
+    child.assert_not_current();
+    child.sync([&] {
+        EXPECT_TRUE(child.is_current());
+        EXPECT_TRUE(target.is_current());
+        EXPECT_FALSE(other.is_current());
+        // Still held further up the stack.
+        other.sync([&] { EXPECT_TRUE(child.is_current()); });
+        child.assert_current();
+    });
+    EXPECT_DEATH(child.assert_current(), "child");
+    EXPECT_STREQ(child.label(), "child");
+}
+
+TEST(Queue, MisuseStopsTheProcessAndNamesTheQueue) {
+    const auto serial = queue::create("the queue");
+    EXPECT_DEATH(serial.resume(), "'the queue': more resumes than suspends");
+    EXPECT_DEATH(
+        {
+            auto doomed = queue::create("doomed");
+            doomed.suspend();
+            doomed = queue();
+        },
+        "'doomed': the last handle of a suspended queue went");
+    EXPECT_DEATH(queue::global().suspend(), "global");
+    EXPECT_DEATH(serial.sync([&] {
+        serial.async([] { throw 1; }), drain(queue::create("x")), serial.sync([] {});
+    }),
+                 "");
+}
+
+}  // namespace

@@ -1,0 +1,255 @@
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <poll.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <array>
+#include <atomic>
+#include <cstdlib>
+#include <memory>
+#include <system_error>
+
+#include "dispatch/dispatch.h"
+#include "support/waiting.h"
+
+namespace {
+
+using dispatch::block;
+using dispatch::queue;
+using dispatch::source;
+using plr::test::drain;
+using plr::test::Event;
+using namespace std::chrono_literals;
+
+struct Pair {
+    Pair() { EXPECT_EQ(::socketpair(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK, 0, ends), 0); }
+    ~Pair() {
+        ::close(ends[0]);
+        ::close(ends[1]);
+    }
+    int ends[2];
+};
+
+TEST(TimerSource, FiresOnceNotBeforeItsTimeOnEitherClock) {
+    const auto serial = queue::create("serial");
+    for (const auto on : {dispatch::clock::monotonic, dispatch::clock::wall}) {
+        const auto timer = source::timer(serial);
+        Event fired;
+        std::atomic<int> count{0};
+        const auto due = dispatch::time::after(3ms, on);
+        timer.set_event_handler(block<void()>([&] {
+            EXPECT_GE(dispatch::time::now(on).nanoseconds(), due.nanoseconds());
+            ++count;
+            fired.signal();
+        }));
+        timer.set_timer(due, dispatch::kOnce);
+        timer.resume();
+        EXPECT_TRUE(fired.wait());
+        timer.cancel();
+        drain(serial);
+        EXPECT_EQ(count, 1);
+    }
+}
+
+TEST(TimerSource, PeriodsAddUpWithoutDrift) {
+    const auto serial = queue::create("serial");
+    const auto timer = source::timer(serial);
+    constexpr auto kPeriod = 1ms;
+    const auto start = dispatch::time::after(kPeriod);
+    std::uint64_t firings = 0;
+    Event enough;
+    timer.set_event_handler(block<void()>([&] {
+        firings += timer.data();
+        // The number of periods that began is what the clock says, at every call.
+        const auto passed = dispatch::time::now().nanoseconds() - start.nanoseconds();
+        EXPECT_LE(firings, static_cast<std::uint64_t>(passed / 1'000'000) + 1);
+        if (firings >= 30) {
+            timer.cancel();
+            enough.signal();
+        }
+    }));
+    timer.set_timer(start, kPeriod);
+    timer.resume();
+    EXPECT_TRUE(enough.wait());
+    drain(serial);
+}
+
+// Returns whether all timers were armed before the first was due; only then
+// does their order say something.
+bool manyFireInOrder(std::chrono::milliseconds lead) {
+    constexpr int kTimers = 2'000;
+    const auto serial = queue::create("serial");
+    int fired = 0;
+    std::int64_t last = 0;
+    bool ordered = true;
+    const dispatch::group all;
+    const auto start = dispatch::time::after(lead);
+    std::vector<source> timers;
+    for (int i = 0; i < kTimers; ++i) {
+        timers.push_back(source::timer(serial));
+        const auto due = start.plus(std::chrono::microseconds((i * 7919) % kTimers));
+        const bool withdrawn = i % 2 == 1;
+        if (!withdrawn)
+            all.enter();
+        timers.back().set_event_handler(block<void()>([&, due, withdrawn] {
+            ordered = ordered && !withdrawn && due.nanoseconds() >= last;
+            last = due.nanoseconds();
+            ++fired;
+            all.leave();
+        }));
+        timers.back().set_timer(due, dispatch::kOnce);
+        timers.back().resume();
+        if (withdrawn)
+            timers.back().cancel();
+    }
+    const bool in_time = dispatch::time::now().nanoseconds() < start.nanoseconds();
+    EXPECT_EQ(all.wait(dispatch::time::after(plr::test::kBound)), 0);
+    drain(serial);
+    EXPECT_EQ(fired, kTimers / 2);
+    EXPECT_TRUE(ordered || !in_time);
+    return in_time;
+}
+
+TEST(TimerSource, ManyFireInTheOrderOfTheirDeadlinesAndWithdrawnOnesNever) {
+    auto lead = 10ms;
+    while (!manyFireInOrder(lead))
+        lead *= 2;
+}
+
+TEST(TimerSource, CanBeSetAnewAndSuspended) {
+    const auto serial = queue::create("serial");
+    const auto timer = source::timer(serial);
+    Event fired;
+    timer.set_event_handler(block<void()>([&] { fired.signal(); }));
+    timer.set_timer(dispatch::forever, dispatch::kOnce);
+    timer.resume();
+    timer.suspend();
+    timer.set_timer(dispatch::immediately, dispatch::kOnce);
+    // A later timer has fired, the suspended one has not been delivered.
+    Event later;
+    serial.after(dispatch::time::after(2ms), block<void()>([&] { later.signal(); }));
+    EXPECT_TRUE(later.wait());
+    timer.resume();
+    EXPECT_TRUE(fired.wait());
+}
+
+TEST(Source, CancelRunsItsHandlerOnceAfterTheLastEventAndFreesBoth) {
+    const auto serial = queue::create("serial");
+    auto token = std::make_shared<int>();
+    int cancelled = 0;
+    int after = 0;
+    {
+        const auto timer = source::timer(serial);
+        timer.set_event_handler(block<void()>([token, &cancelled, &after, timer] {
+            after += cancelled;
+            timer.cancel();
+        }));
+        timer.set_cancel_handler(block<void()>([token, &cancelled] { ++cancelled; }));
+        timer.set_timer(dispatch::immediately, 1ms);
+        timer.resume();
+    }
+    // The handler's own reference keeps the source until it cancels itself.
+    while (token.use_count() > 1)
+        drain(serial);
+    EXPECT_EQ(cancelled, 1);
+    EXPECT_EQ(after, 0);
+}
+
+TEST(Source, DroppingTheLastHandleCancels) {
+    const auto serial = queue::create("serial");
+    Pair pair;
+    Event cancelled;
+    {
+        const auto reader = source::readable(pair.ends[0], serial);
+        reader.set_cancel_handler(block<void()>([&] { cancelled.signal(); }));
+        reader.resume();
+    }
+    EXPECT_TRUE(cancelled.wait());
+    {
+        const auto never_resumed = source::timer(serial);
+        never_resumed.set_cancel_handler(block<void()>([&] { cancelled.signal(); }));
+    }
+    EXPECT_TRUE(cancelled.wait());
+}
+
+TEST(DescriptorSource, CallsWhileReadableHoweverLittleTheHandlerTakes) {
+    const auto serial = queue::create("serial");
+    Pair pair;
+    std::string got;
+    Event end;
+    const auto reader = source::readable(pair.ends[0], serial);
+    reader.set_event_handler(block<void()>([&] {
+        char one = 0;
+        const auto count = ::read(pair.ends[0], &one, 1);
+        if (count == 1)
+            got += one;
+        if (count == 0) {
+            reader.cancel();
+            end.signal();
+        }
+    }));
+    reader.resume();
+    EXPECT_EQ(::write(pair.ends[1], "hello", 5), 5);
+    EXPECT_EQ(::write(pair.ends[1], " world", 6), 6);
+    ::shutdown(pair.ends[1], SHUT_WR);
+    EXPECT_TRUE(end.wait());
+    EXPECT_EQ(got, "hello world");
+    drain(serial);
+}
+
+TEST(DescriptorSource, WritableComesBackWhenThereIsRoom) {
+    const auto serial = queue::create("serial");
+    Pair pair;
+    const std::string chunk(64 * 1024, 'x');
+    std::atomic<std::size_t> written{0};
+    const auto writer = source::writable(pair.ends[1], serial);
+    writer.set_event_handler(block<void()>([&] {
+        const auto count = ::write(pair.ends[1], chunk.data(), chunk.size());
+        if (count > 0)
+            written += static_cast<std::size_t>(count);
+    }));
+    writer.resume();
+    // Many times what the socket holds.
+    std::size_t read = 0;
+    std::string buffer(256 * 1024, '\0');
+    while (read < 200 * chunk.size()) {
+        pollfd state{pair.ends[0], POLLIN, 0};
+        ASSERT_GT(::poll(&state, 1, 60'000), 0);
+        const auto count = ::read(pair.ends[0], buffer.data(), buffer.size());
+        if (count > 0)
+            read += static_cast<std::size_t>(count);
+    }
+    writer.cancel();
+    drain(serial);
+    EXPECT_GE(written, read);
+}
+
+TEST(DescriptorSource, ARegularFileIsAlwaysReadyAndABadOneIsRefused) {
+    const auto serial = queue::create("serial");
+    char path[] = "/tmp/pelorin-test-XXXXXX";
+    const int file = ::mkstemp(path);
+    ASSERT_GE(file, 0);
+    ::unlink(path);
+    ASSERT_EQ(::pwrite(file, "abc", 3, 0), 3);
+    std::string got;
+    Event end;
+    const auto reader = source::readable(file, serial);
+    reader.set_event_handler(block<void()>([&] {
+        char one = 0;
+        if (::read(file, &one, 1) == 1) {
+            got += one;
+            return;
+        }
+        reader.cancel();
+        end.signal();
+    }));
+    reader.resume();
+    EXPECT_TRUE(end.wait());
+    EXPECT_EQ(got, "abc");
+    drain(serial);
+    ::close(file);
+    EXPECT_THROW(static_cast<void>(source::readable(file, serial)), std::system_error);
+}
+
+}  // namespace

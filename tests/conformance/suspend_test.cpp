@@ -1,0 +1,103 @@
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <thread>
+#include <vector>
+
+#include "dispatch/dispatch.h"
+#include "support/waiting.h"
+
+namespace {
+
+using dispatch::queue;
+using plr::test::drain;
+using plr::test::Event;
+
+TEST(Suspend, HoldsWorkBackUntilEveryResumeCame) {
+    const auto serial = queue::create("serial");
+    std::atomic<bool> ran{false};
+    serial.suspend();
+    serial.suspend();
+    serial.async([&] { ran = true; });
+    serial.resume();
+    // A queue beside it that went through the same pool has run.
+    drain(queue::create("beside"));
+    EXPECT_FALSE(ran);
+    serial.resume();
+    drain(serial);
+    EXPECT_TRUE(ran);
+}
+
+TEST(Suspend, FromItsOwnWorkTakesEffectBeforeTheNextPiece) {
+    const auto serial = queue::create("serial");
+    Event suspended;
+    int ran = 0;
+    serial.async([&] {
+        serial.suspend();
+        suspended.signal();
+    });
+    serial.async([&] { ++ran; });
+    EXPECT_TRUE(suspended.wait());
+    serial.resume();
+    drain(serial);
+    EXPECT_EQ(ran, 1);
+}
+
+TEST(Suspend, OfATargetHoldsItsChildrenAndTheirSyncCallers) {
+    const auto target = queue::create("target");
+    const auto child = queue::create("child", target);
+    std::atomic<int> ran{0};
+    target.suspend();
+    child.async([&] { ++ran; });
+    std::thread caller([&] { child.sync([&] { ++ran; }); });
+    drain(queue::create("beside"));
+    EXPECT_EQ(ran, 0);
+    target.resume();
+    caller.join();
+    EXPECT_EQ(ran, 2);
+}
+
+TEST(Suspend, SyncOnASuspendedQueueWaitsForTheResume) {
+    const auto serial = queue::create("serial");
+    serial.suspend();
+    std::atomic<bool> resumed{false};
+    std::thread resumer([&] {
+        resumed = true;
+        serial.resume();
+    });
+    serial.sync([&] { EXPECT_TRUE(resumed); });
+    resumer.join();
+}
+
+// Suspensions come and go on several threads while work is pushed: nothing is
+// lost, nothing runs twice, nothing stays parked.
+TEST(Suspend, RacingWithWorkLosesNothing) {
+    constexpr int kRounds = 3'000;
+    const auto target = queue::create("target");
+    const auto child = queue::create("child", target);
+    int ran = 0;
+    std::vector<std::thread> threads;
+    for (int t = 0; t < 2; ++t) {
+        threads.emplace_back([&, t] {
+            for (int i = 0; i < kRounds; ++i) {
+                const queue& victim = (i + t) % 2 == 0 ? child : target;
+                victim.suspend();
+                child.async([&] { ++ran; });
+                victim.resume();
+            }
+        });
+    }
+    threads.emplace_back([&] {
+        for (int i = 0; i < kRounds; ++i) {
+            if (i % 2 == 0)
+                child.async([&] { ++ran; });
+            else
+                child.sync([&] { ++ran; });
+        }
+    });
+    for (auto& each : threads)
+        each.join();
+    child.sync([&] { EXPECT_EQ(ran, 3 * kRounds); });
+}
+
+}  // namespace

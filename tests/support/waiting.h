@@ -1,0 +1,31 @@
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <semaphore>
+
+#include "dispatch/dispatch.h"
+
+// Waiting for events in tests: always for something, never longer than a bound
+// that only a fault exceeds.
+namespace plr::test {
+
+inline constexpr std::chrono::seconds kBound{60};
+
+// A counting event. signal() on any thread; wait() true once it came.
+class Event {
+  public:
+    void signal() { count_.release(); }
+    [[nodiscard]] bool wait() { return count_.try_acquire_for(kBound); }
+
+  private:
+    std::counting_semaphore<> count_{0};
+};
+
+// Everything submitted to `queue` before has run.
+inline void drain(const dispatch::queue& queue) {
+    queue.sync([] {});
+}
+
+}  // namespace plr::test
