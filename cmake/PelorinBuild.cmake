@@ -50,11 +50,11 @@ function(pelorin_component name)
   set_property(GLOBAL APPEND PROPERTY PELORIN_FILES ${C_HEADERS} ${C_SOURCES})
   list(FILTER sources INCLUDE REGEX "\\.cpp$|\\.c$")
   if(sources)
-    add_library(${name} OBJECT ${sources})
-    target_include_directories(${name} PUBLIC
+    add_library(component_${name} OBJECT ${sources})
+    target_include_directories(component_${name} PUBLIC
       ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR}/platform/include
       PRIVATE ${PROJECT_SOURCE_DIR})
-    target_link_libraries(${name} PRIVATE pelorin_flags ${C_PRIVATE_LIBS})
-    set_property(GLOBAL APPEND PROPERTY PELORIN_OBJECTS_${C_LIBRARY} ${name})
+    target_link_libraries(component_${name} PRIVATE pelorin_flags ${C_PRIVATE_LIBS})
+    set_property(GLOBAL APPEND PROPERTY PELORIN_OBJECTS_${C_LIBRARY} component_${name})
   endif()
 endfunction()

@@ -1,0 +1,56 @@
+// radio_set: sets one property.
+//
+//   radio_set PATH VALUE    VALUE: true, false, null, an integer, else a string
+
+#include <charconv>
+#include <string_view>
+
+#include "examples/show.h"
+#include "plr/rest.h"
+
+namespace {
+
+constexpr const char* kService = "net.example.radio";
+
+vox::object parse(std::string_view text) {
+    if (text == "true" || text == "false")
+        return vox::boolean(text == "true");
+    if (text == "null")
+        return nullptr;
+    std::int64_t number = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (error == std::errc() && end == text.data() + text.size())
+        return vox::int64(number);
+    return vox::string(text);
+}
+
+// Whether the service has handled it.
+bool set(const std::string& path, const vox::object& value) {
+    const auto queue = dispatch::queue::create("radio_set");
+    const plr::RestModule rest(queue, "radio_set");
+    const dispatch::group open;
+    bool handled = false;
+    queue.sync([&] {
+        rest.connect(vox::connection::create(kService));
+        rest.setProperty(path, value);
+        // A SET has no reply. But messages are handled in order, so an answer to
+        // a later one says that the SET was.
+        rest.getPropertyOnce("/", [&, session = dispatch::group_session(open)](
+                                      const vox::object& names) { handled = bool(names); });
+    });
+    static_cast<void>(open.wait());
+    return handled;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    if (argc != 3) {
+        std::cerr << "usage: radio_set PATH VALUE\n";
+        return 2;
+    }
+    if (!set(argv[1], parse(argv[2]))) {
+        std::cerr << "radio_set: " << kService << " is not there\n";
+        return 1;
+    }
+}
