@@ -62,6 +62,51 @@ pelorin_component(vox_values LEVEL 1 LIBRARY platform
     platform/linux/vox/value.cpp
     platform/linux/vox/value_layout.h)
 
+pelorin_component(vox_connections LEVEL 1 LIBRARY platform
+  HEADERS
+    platform/include/vox/connection.h
+    platform/include/vox/vox.h
+  SOURCES
+    platform/linux/vox/client_quota.cpp
+    platform/linux/vox/client_quota.h
+    platform/linux/vox/complaint.cpp
+    platform/linux/vox/complaint.h
+    platform/linux/vox/connection.cpp
+    platform/linux/vox/connection.h
+    platform/linux/vox/connection_api.cpp
+    platform/linux/vox/endpoint.cpp
+    platform/linux/vox/endpoint.h
+    platform/linux/vox/frame.cpp
+    platform/linux/vox/frame.h
+    platform/linux/vox/frame_reader.cpp
+    platform/linux/vox/frame_reader.h
+    platform/linux/vox/hello.cpp
+    platform/linux/vox/hello.h
+    platform/linux/vox/limits.cpp
+    platform/linux/vox/limits.h
+    platform/linux/vox/listener.cpp
+    platform/linux/vox/listener.h
+    platform/linux/vox/lock.h
+    platform/linux/vox/names.cpp
+    platform/linux/vox/names.h
+    platform/linux/vox/output.cpp
+    platform/linux/vox/output.h
+    platform/linux/vox/peer_connection.cpp
+    platform/linux/vox/peer_connection.h
+    platform/linux/vox/peer_input.cpp
+    platform/linux/vox/peer_output.cpp
+    platform/linux/vox/read_memory.cpp
+    platform/linux/vox/read_memory.h
+    platform/linux/vox/reply_table.cpp
+    platform/linux/vox/reply_table.h
+    platform/linux/vox/request.h
+    platform/linux/vox/send_turn.cpp
+    platform/linux/vox/send_turn.h
+    platform/linux/vox/service_socket.cpp
+    platform/linux/vox/service_socket.h
+    platform/linux/vox/socket_io.cpp
+    platform/linux/vox/socket_io.h)
+
 pelorin_component(qf_core LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/qf/qf.h

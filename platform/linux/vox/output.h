@@ -9,7 +9,7 @@
 #include <span>
 #include <vector>
 
-#include "platform/linux/vox/byte_buffer.h"
+#include "platform/linux/vox/codec.h"
 #include "platform/linux/vox/frame.h"
 
 // The frames of one connection that wait to be written, and what was written.
@@ -29,6 +29,9 @@ struct output_batch {
     std::span<const int> descriptors;
 };
 
+// Empties `made` and closes its descriptors.
+void discard(vox_wire::encoded& made) noexcept;
+
 class output {
   public:
     output() = default;
@@ -36,13 +39,14 @@ class output {
     output(const output&) = delete;
     output& operator=(const output&) = delete;
 
-    // One complete frame and its descriptors, both taken over.
-    void append(vox_wire::byte_buffer& bytes, std::vector<int>& descriptors);
-    // The rest of a frame of which `sent` bytes (at least one) have left; before
-    // everything that waits.
-    void put_back(vox_wire::byte_buffer& bytes, std::size_t sent);
-    // A frame that was written completely without waiting here.
+    // One complete frame, taken over.
+    void append(vox_wire::encoded& made);
+    // For a frame that is written without waiting here: that it is on its way,
+    // and then either that it was written completely, or that `sent` bytes were
+    // and the rest is taken over and goes before everything that waits.
+    void pass() noexcept { ++accepted_; }
     void passed(frame_type type) noexcept;
+    void put_back(vox_wire::encoded& made, std::size_t sent);
 
     void gather(output_batch& batch) noexcept;
     // `count` bytes of the last batch were written.
@@ -66,6 +70,7 @@ class output {
         std::size_t frame_begin = 0;   // of the frame that byte belongs to
         std::vector<int> descriptors;  // owned; leave with the first byte
     };
+    void count_waiting(const std::uint8_t* frame, std::size_t bytes) noexcept;
     void close_descriptors(chunk& done) noexcept;
     void count_frames(chunk& progressed) noexcept;
 

@@ -6,7 +6,7 @@
 
 // The sockets behind service names.
 //
-// Names are taken and given up under a lock file (flock(2)) beside the socket,
+// Names are taken under a lock file (flock(2)) beside the socket,
 // named so that no service can have its name. A socket that nobody listens on
 // any more is replaced; a live one never is.
 namespace vox_link {
@@ -15,7 +15,6 @@ namespace vox_link {
 struct service_socket {
     int fd = -1;  // listening, non-blocking
     std::string path;
-    std::string lock_path;
     dev_t device = 0;  // identity of the file, so that only our own is removed
     ino_t inode = 0;
 };
@@ -23,8 +22,10 @@ struct service_socket {
 // Takes `name` in the runtime directory, socket mode 0600. Returns 0, or an
 // error number with the reason in `why`; EADDRINUSE when another serves it.
 [[nodiscard]] int open_service(const std::string& name, service_socket& made, std::string& why);
-// Closes it and removes its file if that is still ours.
-void close_service(service_socket& served) noexcept;
+// Takes no more clients and removes the file if that is still ours. The
+// socket stays open, and bound, until the caller closes it: nobody takes the
+// file for a stale one meanwhile.
+void withdraw_service(const service_socket& served) noexcept;
 
 // Connects to `name` without blocking; the socket is in `fd`. Returns 0, EAGAIN
 // when the service cannot take more now, ENOENT or ECONNREFUSED when nobody

@@ -1,0 +1,83 @@
+#pragma once
+
+#include <cstdint>
+#include <deque>
+#include <list>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "platform/linux/vox/client_quota.h"
+#include "platform/linux/vox/connection.h"
+#include "platform/linux/vox/service_socket.h"
+
+// A listener: takes the clients of a name, or of the endpoints made for it,
+// and hands them as connection events to its handler.
+//
+// Owner:   as connection. Clients outlive their listener.
+// Limits:  clients in all and by user; one too many is closed at once. Out of
+//          descriptors, a reserve one lets waiting clients be refused instead of
+//          being left waiting; without it accepting pauses for a while.
+namespace vox_link {
+
+class listener final : public connection {
+  public:
+    // Anonymous without a name.
+    listener(std::string name, bool anonymous, const vox_limits_t& limits);
+
+    // A new endpoint value; the null object when none can be made.
+    [[nodiscard]] vox_object_t make_endpoint();
+    [[nodiscard]] bool is_anonymous() const noexcept { return anonymous_; }
+    [[nodiscard]] bool is_listener() const noexcept override { return true; }
+
+  protected:
+    void start() override;
+    void turn() override;
+    void cut_off() override;
+    void wind_up(vox_object_t error) override;
+    [[nodiscard]] std::string title() override;
+
+  private:
+    // What clients come from: the listening socket or one endpoint's pair. It
+    // holds the listener while it is watched.
+    struct gate : dispatch::detail::io_watch {
+        gate(listener* of, int adopted, bool accepts) noexcept;
+        ~gate();
+        listener* owner;
+        int fd;
+        bool listening;        // for accept(2); else an endpoint
+        bool watched = false;  // under lock_
+        bool ready = false;    // on the queue: it is in ready_
+        bool over = false;     // on the queue: closed, but one call still comes
+    };
+    enum class taken : std::uint8_t { client, nothing, pause, gone };
+
+    ~listener() override = default;
+    [[nodiscard]] int add_gate(int fd, bool listening) PLR_REQUIRES(lock_);
+    [[nodiscard]] int open_gate(gate& opened) PLR_REQUIRES(lock_);
+    void close_gate(gate* closed) PLR_ON(queue_role_);
+    void gate_called(gate* called);
+    void take_clients() PLR_ON(queue_role_);
+    [[nodiscard]] bool may_take() const noexcept { return !is_ending() && !is_suspended(); }
+    [[nodiscard]] taken take_one(const gate& from) PLR_ON(queue_role_);
+    [[nodiscard]] taken accept_one(int listening) PLR_ON(queue_role_);
+    [[nodiscard]] taken refuse_one(int listening) PLR_ON(queue_role_);
+    [[nodiscard]] taken take_from_endpoint(int pair) PLR_ON(queue_role_);
+    void welcome(int fd) PLR_ON(queue_role_);
+    void pause() PLR_ON(queue_role_);
+
+    const vox_limits_t limits_;
+    const bool anonymous_;
+    const std::shared_ptr<client_quota> quota_;
+    std::optional<service_socket> service_ PLR_GUARDED_BY(lock_);
+    std::list<std::unique_ptr<gate>> gates_ PLR_GUARDED_BY(lock_);
+    bool opened_ PLR_GUARDED_BY(lock_) = false;
+    bool closed_ PLR_GUARDED_BY(lock_) = false;
+    std::deque<gate*> ready_ PLR_CONFINED_TO(queue_role_);
+    bool paused_ PLR_CONFINED_TO(queue_role_)
+    = false;
+    int reserve_ PLR_CONFINED_TO(queue_role_)
+    = -1;
+};
+
+}  // namespace vox_link

@@ -1,0 +1,184 @@
+#pragma once
+
+#include <sys/socket.h>
+
+#include <cstdint>
+#include <deque>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "dispatch/source.h"
+#include "platform/linux/vox/client_quota.h"
+#include "platform/linux/vox/codec.h"
+#include "platform/linux/vox/connection.h"
+#include "platform/linux/vox/frame_reader.h"
+#include "platform/linux/vox/output.h"
+#include "platform/linux/vox/reply_table.h"
+
+// A connection to one peer.
+//
+// Files:   peer_connection.cpp connects and ends, peer_input.cpp reads and
+//          delivers, peer_output.cpp sends.
+// Threads: everything received is read, decoded and delivered on the target
+//          queue. Senders encode on their own thread without the lock; then one
+//          of them writes at a time, without the lock, and takes along what the
+//          others append meanwhile.
+// Closing: the descriptor is closed on the target queue, or by the writer that
+//          still uses it then.
+namespace vox_link {
+
+class send_turn;
+
+// Where a peer connection gets its socket from.
+struct peer_origin {
+    enum class kind : std::uint8_t { socket, service, endpoint };
+    kind from = kind::socket;
+    int fd = -1;             // kind::socket: owned
+    vox_object* endpoint{};  // kind::endpoint: an owned reference
+    bool accepted = false;   // by a listener
+    client_quota::ticket place;
+};
+
+class peer_connection final : public connection {
+  public:
+    // `name` is the service's, or empty. Starts with one reference.
+    peer_connection(std::string name, const vox_limits_t& limits, peer_origin origin);
+
+    // As vox_connection_send_message() says.
+    [[nodiscard]] int send_message(vox_object_t message);
+    void send_request(vox_object_t message, dispatch::queue queue, reply_block handler);
+    void send_barrier(dispatch::block<void()> barrier);
+    // Gives the handler of a request that could not be sent its error.
+    static void fail_request(waiting_reply reply, int error);
+
+    [[nodiscard]] ucred credentials() const;
+    [[nodiscard]] vox_statistics_t statistics() const;
+    [[nodiscard]] bool is_listener() const noexcept override { return false; }
+
+    // Writes what a turn of the calling thread had put together.
+    void flush_turn();
+
+  protected:
+    void start() override;
+    void turn() override;
+    void cut_off() override;
+    void wind_up(vox_object_t error) override;
+    [[nodiscard]] std::string title() override;
+
+  private:
+    struct waiting_barrier {
+        std::uint64_t behind;  // frames; before the hello, messages that wait for it
+        dispatch::block<void()> work;
+    };
+    struct watch : dispatch::detail::io_watch {
+        explicit watch(peer_connection* of) noexcept;
+        peer_connection* owner;
+    };
+    ~peer_connection() override;
+
+    // peer_connection.cpp
+    void try_to_connect(unsigned attempt);
+    void connect_failed(int error, const std::string& why);
+    void open(int fd);
+    void close_socket() PLR_ON(queue_role_);
+    void run_reply(waiting_reply& reply, vox_object_t result) PLR_ON(queue_role_);
+
+    // peer_input.cpp
+    void handle_events();
+    void read_turn() PLR_ON(queue_role_);
+    [[nodiscard]] bool may_deliver() const noexcept { return !is_ending() && !is_suspended(); }
+    [[nodiscard]] bool deliver_frames(send_turn& sends, unsigned& budget) PLR_ON(queue_role_);
+    [[nodiscard]] bool receive(std::span<std::uint8_t> memory) PLR_ON(queue_role_);
+    void handle(const frame& arrived) PLR_ON(queue_role_);
+    void handle_hello(const frame& arrived) PLR_ON(queue_role_);
+    void handle_message(const frame& arrived) PLR_ON(queue_role_);
+    void handle_control(const frame& arrived) PLR_ON(queue_role_);
+    [[nodiscard]] vox_dictionary_object* decode(const frame& arrived) PLR_ON(queue_role_);
+    void read_failed(int error);
+    void violation(std::string reason);
+    void limit_incomplete_frame() PLR_ON(queue_role_);
+    void incomplete_frame_due();
+
+    // peer_output.cpp
+    [[nodiscard]] int send(vox_object_t message, frame_type kind, std::uint64_t id,
+                           waiting_reply* reply);
+    [[nodiscard]] int accept(vox_wire::encoded& made, frame_type kind, waiting_reply* reply)
+        PLR_REQUIRES(lock_);
+    [[nodiscard]] int admit(frame_type kind, std::size_t size) PLR_REQUIRES(lock_);
+    [[nodiscard]] bool has_room(std::size_t size, unsigned times) const PLR_REQUIRES(lock_);
+    void send_control(frame_type kind, std::uint8_t marks, std::uint64_t id, vox_object_t value);
+    void put(vox_wire::encoded& made, frame_type kind) PLR_REQUIRES(lock_);
+    void tell_dropped() PLR_REQUIRES(lock_);
+    [[nodiscard]] bool defer() PLR_REQUIRES(lock_);
+    [[nodiscard]] bool is_burst() PLR_REQUIRES(lock_);
+    void arm_flush() PLR_REQUIRES(lock_);
+    void flush();
+    [[nodiscard]] bool can_write() const PLR_REQUIRES(lock_) {
+        return fd_ >= 0 && !writing_ && !blocked_ && !abandoned_ && !broken_;
+    }
+    void write_through(vox_wire::encoded& made, frame_type kind) PLR_REQUIRES(lock_);
+    void write_waiting() PLR_REQUIRES(lock_);
+    void write_stopped(int error) PLR_REQUIRES(lock_);
+    void finish_writing() PLR_REQUIRES(lock_);
+    void unblock();
+    void retry_later() PLR_REQUIRES(lock_);
+    void greet(const vox_wire::codec_limits& peer);
+    [[nodiscard]] bool fit_to_peer(vox_wire::encoded& made) PLR_REQUIRES(lock_);
+    void give_up(vox_wire::encoded& made) PLR_REQUIRES(lock_);
+    [[nodiscard]] bool is_finished(const waiting_barrier& barrier) const PLR_REQUIRES(lock_);
+    void run_finished_barriers() PLR_REQUIRES(lock_);
+
+    const vox_limits_t limits_;
+    const vox_wire::codec_limits accepts_;  // what this side decodes
+
+    // Set up.
+    peer_origin origin_;
+    watch watch_;
+    ucred credentials_ PLR_GUARDED_BY(lock_) = {-1, static_cast<uid_t>(-1), static_cast<gid_t>(-1)};
+
+    // Receiving.
+    frame_reader reader_ PLR_CONFINED_TO(queue_role_);
+    bool readable_ PLR_CONFINED_TO(queue_role_)
+    = false;
+    bool hung_up_ PLR_CONFINED_TO(queue_role_)
+    = false;  // an end of file is to be read
+    bool greeted_by_peer_ PLR_CONFINED_TO(queue_role_)
+    = false;
+    bool watch_over_ PLR_CONFINED_TO(queue_role_)
+    = false;  // one call still comes
+    dispatch::source incomplete_timer_ PLR_CONFINED_TO(queue_role_);
+    bool incomplete_armed_ PLR_CONFINED_TO(queue_role_)
+    = false;
+    std::int64_t incomplete_since_ PLR_CONFINED_TO(queue_role_)
+    = 0;  // ns; 0: no frame begun
+    std::atomic<std::uint64_t> messages_received_{0};
+    std::atomic<std::uint64_t> peer_dropped_{0};
+
+    // Sending.
+    std::atomic<bool> greeted_{false};  // peer_accepts_ is set and the gate open
+    std::atomic<bool> heard_{false};    // a message came since the last one was sent
+    vox_wire::codec_limits peer_accepts_;
+    std::atomic<int> fd_{-1};  // changes under lock_ only
+    bool watching_ PLR_GUARDED_BY(lock_) = false;
+    bool writing_ PLR_GUARDED_BY(lock_) = false;  // a thread is in sendmsg
+    bool blocked_ PLR_GUARDED_BY(lock_) = false;  // until the peer has read
+    std::atomic<bool> broken_{false};  // the peer reads no more; changes under lock_ only
+    bool abandoned_ PLR_GUARDED_BY(lock_) = false;  // cut off
+    bool closing_ PLR_GUARDED_BY(lock_) = false;    // the writer closes the socket
+    bool wound_up_ PLR_GUARDED_BY(lock_) = false;
+    bool in_turn_ PLR_GUARDED_BY(lock_) = false;  // a turn will flush
+    bool flush_armed_ PLR_GUARDED_BY(lock_) = false;
+    unsigned run_ PLR_GUARDED_BY(lock_) = 0;            // sends in close succession
+    std::int64_t last_send_ PLR_GUARDED_BY(lock_) = 0;  // ns; 0: not known
+    output out_ PLR_GUARDED_BY(lock_);
+    std::deque<vox_wire::encoded> early_ PLR_GUARDED_BY(lock_);  // wait for the peer's hello
+    std::size_t early_bytes_ PLR_GUARDED_BY(lock_) = 0;
+    std::deque<waiting_barrier> barriers_ PLR_GUARDED_BY(lock_);
+    reply_table replies_ PLR_GUARDED_BY(lock_);
+    std::uint64_t last_id_ PLR_GUARDED_BY(lock_) = 0;
+    std::uint64_t dropped_ PLR_GUARDED_BY(lock_) = 0;
+    std::uint64_t dropped_untold_ PLR_GUARDED_BY(lock_) = 0;
+};
+
+}  // namespace vox_link

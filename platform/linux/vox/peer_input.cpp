@@ -1,0 +1,267 @@
+// Receiving: one turn reads what is there and delivers it, in order, on the
+// target queue.
+#include <sys/epoll.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <cstring>
+#include <utility>
+
+#include "platform/linux/vox/hello.h"
+#include "platform/linux/vox/peer_connection.h"
+#include "platform/linux/vox/read_memory.h"
+#include "platform/linux/vox/request.h"
+#include "platform/linux/vox/send_turn.h"
+#include "platform/linux/vox/socket_io.h"
+
+namespace vox_link {
+namespace {
+
+// A turn ends after so much, so that other work of the queue gets its turn.
+constexpr unsigned kFramesPerTurn = 256;
+constexpr unsigned kReadsPerTurn = 4;
+
+void close_all(std::span<const int> descriptors) noexcept {
+    for (const int descriptor : descriptors)
+        ::close(descriptor);
+}
+
+}  // namespace
+
+void peer_connection::handle_events() {
+    queue_role_.entered();
+    if (watch_over_) {
+        unhold();
+        return;
+    }
+    const std::uint32_t events = watch_.take_events();
+    if ((events & (EPOLLIN | EPOLLRDHUP | EPOLLHUP | EPOLLERR)) != 0)
+        readable_ = true;
+    if ((events & (EPOLLRDHUP | EPOLLHUP | EPOLLERR)) != 0)
+        hung_up_ = true;
+    if ((events & (EPOLLOUT | EPOLLHUP | EPOLLERR)) != 0)
+        unblock();
+    if (may_deliver())
+        read_turn();
+}
+
+void peer_connection::turn() {
+    read_turn();
+}
+
+// Hot path: bench/vox_bench.cpp.
+void peer_connection::read_turn() {
+    // Without users nobody is to hear anything; cancelling is under way.
+    const borrowed_reference reference(this);
+    if (!reference)
+        return;
+    send_turn sends(queue().get());
+    const read_memory memory;
+    unsigned frames = kFramesPerTurn;
+    unsigned reads = kReadsPerTurn;
+    while (deliver_frames(sends, frames) && reads > 0 && receive(memory.bytes()))
+        --reads;
+    reader_.keep();
+    if (!may_deliver())
+        return;
+    if (frames == 0 || reads == 0)
+        schedule();
+    else
+        limit_incomplete_frame();
+}
+
+// Returns true when all complete frames were delivered and more bytes are wanted.
+bool peer_connection::deliver_frames(send_turn& sends, unsigned& budget) {
+    while (may_deliver()) {
+        if (budget == 0)
+            return false;
+        frame arrived;
+        switch (reader_.next(arrived)) {
+            case frame_reader::outcome::more:
+                return true;
+            case frame_reader::outcome::error:
+                violation(reader_.error());
+                return false;
+            case frame_reader::outcome::frame:
+                break;
+        }
+        --budget;
+        incomplete_since_ = 0;
+        sends.set_more(reader_.has_next());
+        handle(arrived);
+        sends.flush_if_due();
+    }
+    return false;
+}
+
+// Reads once. Returns false when there is nothing more to read now.
+bool peer_connection::receive(std::span<std::uint8_t> memory) {
+    const int fd = fd_.load(std::memory_order_relaxed);
+    if (fd < 0)
+        return false;
+    const bool broken = broken_.load(std::memory_order_acquire);
+    if (!readable_ && !broken)
+        return false;
+    const std::span<std::uint8_t> space = reader_.space(memory);
+    received got;
+    receive_once(fd, space, got);
+    if (got.error != 0) {
+        readable_ = false;
+        if (got.error != EAGAIN || broken)
+            read_failed(got.error);
+        return false;
+    }
+    if (got.lost_descriptors) {
+        got.close_descriptors();
+        violation("descriptors were lost: no more can be open in this process, or too many came");
+        return false;
+    }
+    if (got.bytes == 0) {
+        fail(VOX_ERROR_CONNECTION_INTERRUPTED,
+             reader_.in_frame() ? "the peer closed the connection in the middle of a frame"
+                                : "the peer closed the connection");
+        return false;
+    }
+    // The kernel ends a read behind bytes that came with descriptors, so only
+    // one without says that nothing is left.
+    if (got.bytes < space.size() && got.descriptor_count == 0 && !hung_up_)
+        readable_ = false;
+    reader_.arrived(got.bytes, got.taken());
+    return true;
+}
+
+void peer_connection::read_failed(int error) {
+    if (error == EAGAIN || error == ECONNRESET)
+        fail(VOX_ERROR_CONNECTION_INTERRUPTED, "the peer closed the connection");
+    else
+        fail(VOX_ERROR_CONNECTION_INVALID, std::string("cannot read: ") + ::strerrordesc_np(error));
+}
+
+void peer_connection::violation(std::string reason) {
+    fail(VOX_ERROR_CONNECTION_INVALID, std::move(reason), blame::peer);
+}
+
+void peer_connection::handle(const frame& arrived) {
+    if (carries_message(arrived.header.type) && greeted_by_peer_) [[likely]]
+        return handle_message(arrived);
+    if (arrived.header.type == frame_type::hello)
+        return handle_hello(arrived);
+    if (greeted_by_peer_)
+        return handle_control(arrived);
+    close_all(arrived.descriptors);
+    violation("the first frame is not a hello");
+}
+
+void peer_connection::handle_hello(const frame& arrived) {
+    if (greeted_by_peer_)
+        return violation("second hello");
+    vox_wire::codec_limits accepted;
+    std::string why;
+    if (!read_hello(arrived.body, accepted, why))
+        return violation(std::move(why));
+    greeted_by_peer_ = true;
+    greet(accepted);
+}
+
+void peer_connection::handle_message(const frame& arrived) {
+    vox_dictionary_object* message = decode(arrived);
+    if (!message)
+        return;
+    message->remote = vox_retain(this);
+    messages_received_.store(messages_received_.load(std::memory_order_relaxed) + 1,
+                             std::memory_order_relaxed);
+    heard_.store(true, std::memory_order_relaxed);
+    if (arrived.header.type == frame_type::reply) {
+        waiting_reply reply;
+        {
+            const lock_guard guard(lock_);
+            reply = replies_.take(arrived.header.id);
+        }
+        // One that nobody waits for is ignored.
+        if (reply.id != 0)
+            run_reply(reply, message);
+    } else {
+        if (arrived.header.type == frame_type::request) {
+            message->reply_id = arrived.header.id;
+            message->flags.store(kOpenRequest, std::memory_order_relaxed);
+        }
+        deliver(message);
+    }
+    vox_release(message);
+}
+
+// The message in `arrived`; null when it is none, and the connection fails.
+vox_dictionary_object* peer_connection::decode(const frame& arrived) {
+    const char* why = nullptr;
+    const vox_object_t value = vox_wire::decode(arrived.body, arrived.descriptors, accepts_, why);
+    vox_dictionary_object* message = vox_values::as_dictionary(value);
+    if (message) [[likely]]
+        return message;
+    violation(value ? "message is no dictionary" : why);
+    vox_release(value);
+    return nullptr;
+}
+
+void peer_connection::handle_control(const frame& arrived) {
+    switch (arrived.header.type) {
+        case frame_type::ping:
+        case frame_type::cancel:
+            if (!is_null_body(arrived.body))
+                return violation("ping or cancel with a body that is not null");
+            if (arrived.header.type == frame_type::ping &&
+                (arrived.header.flags & kPingWantsAnswer) != 0)
+                send_control(frame_type::ping, 0, arrived.header.id, vox_null_create());
+            return;
+        default: {
+            const std::int64_t count = read_dropped(arrived.body);
+            if (count < 0)
+                return violation("count of dropped messages is no number");
+            peer_dropped_.fetch_add(static_cast<std::uint64_t>(count), std::memory_order_relaxed);
+        }
+    }
+}
+
+// ---- Frames that do not get whole ---------------------------------------------------
+
+// The timer is left running when the frame gets whole in time; it then finds
+// nothing to do. So a stream that is always cut somewhere costs one timer call
+// in all that time.
+void peer_connection::limit_incomplete_frame() {
+    if (!reader_.in_frame() || incomplete_since_ != 0)
+        return;
+    incomplete_since_ = dispatch::time::now().nanoseconds();
+    if (incomplete_armed_)
+        return;
+    if (!incomplete_timer_) {
+        incomplete_timer_ = dispatch::source::timer(queue());
+        // The source is cancelled before this object can go.
+        incomplete_timer_.set_event_handler(
+            dispatch::block<void()>([this] { incomplete_frame_due(); }));
+        incomplete_timer_.resume();
+    }
+    incomplete_armed_ = true;
+    incomplete_timer_.set_timer(
+        dispatch::time::after(std::chrono::milliseconds(limits_.incomplete_frame_ms)),
+        dispatch::kOnce);
+}
+
+void peer_connection::incomplete_frame_due() {
+    queue_role_.entered();
+    incomplete_armed_ = false;
+    if (incomplete_since_ == 0 || is_ending())
+        return;
+    const std::int64_t now = dispatch::time::now().nanoseconds();
+    const std::chrono::nanoseconds limit = std::chrono::milliseconds(limits_.incomplete_frame_ms);
+    // Nothing is read while suspended: the peer is not to blame.
+    if (is_suspended())
+        incomplete_since_ = now;
+    const std::chrono::nanoseconds left = limit - std::chrono::nanoseconds(now - incomplete_since_);
+    if (left.count() <= 0)
+        return violation("a frame was not whole after " +
+                         std::to_string(limits_.incomplete_frame_ms) + " ms");
+    incomplete_armed_ = true;
+    incomplete_timer_.set_timer(dispatch::time::after(left), dispatch::kOnce);
+}
+
+}  // namespace vox_link

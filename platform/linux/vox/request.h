@@ -1,0 +1,37 @@
+#pragma once
+
+#include "platform/linux/vox/value_layout.h"
+
+// Dictionaries that are requests or replies: the marks they carry.
+//
+// A received request may get one reply dictionary. A reply dictionary knows its
+// connection and the request's id, and is sent once.
+namespace vox_link {
+
+inline constexpr std::uint8_t kOpenRequest = 1;  // received, no reply made yet
+inline constexpr std::uint8_t kReply = 2;
+inline constexpr std::uint8_t kReplySent = 4;
+
+[[nodiscard]] inline bool is_reply(const vox_dictionary_object& dictionary) noexcept {
+    return (dictionary.flags.load(std::memory_order_relaxed) & kReply) != 0;
+}
+// Whether the caller is the one that may send this reply now.
+[[nodiscard]] inline bool claim_reply(vox_dictionary_object& reply) noexcept {
+    return (reply.flags.fetch_or(kReplySent, std::memory_order_acq_rel) & kReplySent) == 0;
+}
+inline void unclaim_reply(vox_dictionary_object& reply) noexcept {
+    reply.flags.fetch_and(static_cast<std::uint8_t>(~kReplySent), std::memory_order_acq_rel);
+}
+// A reply for `request`, or null when it is none or has got one.
+[[nodiscard]] inline vox_dictionary_object* make_reply(vox_dictionary_object& request) noexcept {
+    const auto closed = static_cast<std::uint8_t>(~kOpenRequest);
+    if ((request.flags.fetch_and(closed, std::memory_order_acq_rel) & kOpenRequest) == 0)
+        return nullptr;
+    vox_dictionary_object* reply = vox_values::make_dictionary(4);
+    reply->remote = vox_retain(request.remote);
+    reply->reply_id = request.reply_id;
+    reply->flags.store(kReply, std::memory_order_relaxed);
+    return reply;
+}
+
+}  // namespace vox_link
