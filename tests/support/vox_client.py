@@ -102,6 +102,8 @@ def _encode(value, descriptors):
         case None | bool() | str() | bytes():
             return cbor2.dumps(value)
         case Uint64():
+            if not 0 <= value < 1 << 64:
+                raise ValueError(f"{int(value)} does not fit into a uint64")
             return _tag(TAG_UINT64, _head(0, int(value)))
         case int():
             return _int(value)
