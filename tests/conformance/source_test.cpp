@@ -139,19 +139,24 @@ TEST(Source, CancelRunsItsHandlerOnceAfterTheLastEventAndFreesBoth) {
     auto token = std::make_shared<int>();
     int cancelled = 0;
     int after = 0;
+    Event end;
     {
         const auto timer = source::timer(serial);
         timer.set_event_handler(block<void()>([token, &cancelled, &after, timer] {
             after += cancelled;
             timer.cancel();
         }));
-        timer.set_cancel_handler(block<void()>([token, &cancelled] { ++cancelled; }));
+        timer.set_cancel_handler(block<void()>([token, &cancelled, &end] {
+            ++cancelled;
+            end.signal();
+        }));
         timer.set_timer(dispatch::immediately, 1ms);
         timer.resume();
     }
     // The handler's own reference keeps the source until it cancels itself.
-    while (token.use_count() > 1)
-        drain(serial);
+    EXPECT_TRUE(end.wait());
+    drain(serial);
+    EXPECT_EQ(token.use_count(), 1);
     EXPECT_EQ(cancelled, 1);
     EXPECT_EQ(after, 0);
 }
