@@ -113,9 +113,8 @@ class queue {
     // A null handle: only assignment, comparison, get() and destruction.
     queue() noexcept {}
 
-    // A new serial queue. `label` is copied; it names the worker thread while
-    // the queue runs (15 bytes of it) and appears in diagnostics. `target` as
-    // above, null for none; it is kept alive and never changes. Throws
+    // A new serial queue. `label` is copied and appears in diagnostics. `target`
+    // as above, null for none; it is kept alive and never changes. Throws
     // std::bad_alloc.
     [[nodiscard]] PLR_EXPORT static queue create(std::string_view label, const queue& target);
     [[nodiscard]] static queue create(std::string_view label) { return create(label, queue()); }

@@ -48,6 +48,9 @@ spin_lock specifics_lock;
 
 }  // namespace
 
+// What the public header promises of an idle queue.
+static_assert(sizeof(queue_core) < 256);
+
 void queue_tag(item*) noexcept {}
 void waiter_tag(item*) noexcept {}
 void embedded_tag(item*) noexcept {}
