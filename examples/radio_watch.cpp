@@ -9,6 +9,9 @@
 
 #include <algorithm>
 #include <chrono>
+#include <memory>
+#include <string>
+#include <utility>
 #include <vector>
 
 #include "examples/end_signals.h"
@@ -44,9 +47,12 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
     void observe_sync(const std::vector<std::string>& paths) PLR_ON(ownQueue_)
     {
         for (const std::string& path : paths)
-            rest_.observeProperty(path, [path](const vox::object& value) {
-                radio::say(path + " = " + radio::oneLine(value));
-            });
+            rest_.observeProperty(
+                path, plr::whileAlive(weak_from_this(), [path](Watcher& self, const auto& value) {
+                    self.ownQueue_.assertCurrent();
+                    self.connected_sync();
+                    radio::say(path + " = " + radio::oneLine(value));
+                }));
         rest_.setServerErrorHandler(plr::whileAlive(weak_from_this(), [](Watcher& self, auto&&) {
             self.ownQueue_.assertCurrent();
             self.lost_sync();
@@ -56,7 +62,8 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
     void connect_sync() PLR_ON(ownQueue_)
     {
         rest_.connect(vox::connection::create(kService));
-        // The service answers this one at once; without a service it is null.
+        // Null without a service; else the first sign of it, when only events are
+        // observed.
         rest_.getPropertyOnce(
             "/", plr::whileAlive(weak_from_this(), [](Watcher& self, const vox::object& names) {
                 self.ownQueue_.assertCurrent();
@@ -67,9 +74,9 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
 
     void connected_sync() PLR_ON(ownQueue_)
     {
-        connected_ = true;
+        if (!std::exchange(connected_, true))
+            radio::say(std::string("connected to ") + kService);
         delay_ = kFirstDelay;
-        radio::say(std::string("connected to ") + kService);
     }
 
     void lost_sync() PLR_ON(ownQueue_)

@@ -35,7 +35,7 @@ class Settings : public PropertyRestResource {
 
     bool handleRestMessage_SET(plr::rest::RestResourceContext& context,
                                const plr::rest::PathView& path) override {
-        radio::say("radiod: " + std::string(path.current()) + " is set to " +
+        radio::say(std::string(path.current()) + " is set to " +
                    radio::oneLine(context.getRestValue()));
         return PropertyRestResource::handleRestMessage_SET(context, path);
     }
@@ -52,7 +52,7 @@ std::shared_ptr<RestServerExample> makeServer(const dispatch::queue& queue) {
 
 // Sets a property of the service's own tree as a client would.
 void publish(RestServerExample& server, const std::string& path, const vox::object& value) {
-    radio::say("radiod: " + path + " = " + radio::oneLine(value));
+    radio::say(path + " = " + radio::oneLine(value));
     server.handleRestMessage(
         nullptr, plr::rest::createRestMessage(asObject(Operation::kSet), vox::string("radiod"),
                                               vox::string(path), value));
@@ -62,7 +62,7 @@ void handleLine(RestServerExample& server, const radio::ModemLine& said) {
     const auto line = said.cut ? std::nullopt : radio::parseAtLine(said.text);
     const auto reading = line ? radio::readLine(*line) : radio::Reading{{}, {}, "unreadable"};
     if (reading.complaint)
-        radio::say("radiod: line " + std::to_string(said.number) + " is " + reading.complaint +
+        radio::say("line " + std::to_string(said.number) + " is " + reading.complaint +
                    ", skipped: " + said.text);
     if (!reading.path.empty())
         publish(server, reading.path, reading.value);
@@ -76,14 +76,14 @@ int serve(const char* modemPath) {
     std::optional<radio::Modem> modem;
     modem.emplace(
         modemPath, queue, [&](const radio::ModemLine& said) { handleLine(*server, said); },
-        [](int) { radio::say("radiod: the modem has ended"); });
+        [](int) { radio::say("the modem has ended"); });
     server->setListenerErrorHandler([&end](const vox::object& error) {
         radio::say("radiod: " + radio::oneLine(error));
         end.raise(1);
     });
     server->connect(vox::connection::create_listener(kService));
     modem->start();
-    radio::say(std::string("radiod: serving ") + kService);
+    radio::say(std::string("serving ") + kService);
     const int status = end.wait();
     queue.sync([&] { modem.reset(); });
     return status;
