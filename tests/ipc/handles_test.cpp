@@ -1,0 +1,118 @@
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "plr/ipc.h"
+
+namespace {
+
+TEST(Object, IsNeverEmpty) {
+    vox::object moved = vox::int64(1);
+    const vox::object taken = std::move(moved);
+    const std::pair<const char*, vox::object> cases[] = {
+        {"default", vox::object()},
+        {"null pointer", vox::object(nullptr)},
+        {"adopted null", vox::object::adopt(nullptr)},
+        {"retained null", vox::object::retain(nullptr)},
+        {"moved from", moved},
+        {"dict of a number", vox::dict(vox::int64(1))},
+        {"array of a dictionary", vox::array(vox::dict::create())},
+        {"connection of a string", vox::connection(vox::string("x"))},
+        {"endpoint of a string", vox::endpoint(vox::string("x"))},
+        {"missing entry", vox::dict::create()["k"]},
+        {"entry of no dictionary", vox::dict()["k"]},
+        {"past the end", vox::array::create()[0]},
+    };
+    for (const auto& [name, value] : cases) {
+        EXPECT_NE(value.get(), nullptr) << name;
+        EXPECT_EQ(value.type(), VOX_TYPE_NULL) << name;
+        EXPECT_FALSE(value) << name;
+    }
+    EXPECT_EQ(taken, vox::int64(1));
+}
+
+TEST(Object, HandlesKeepTheirOwnTypeAndShareTheirContent) {
+    const vox::object plain = vox::dict::create();
+    const vox::dict first(plain);
+    const vox::dict second = first;
+    first["k"] = vox::int64(1);
+    EXPECT_EQ(vox::object(second["k"]), vox::int64(1));
+    EXPECT_EQ(second.count(), 1U);
+    const vox::array list = vox::array_creator()("a")("b");
+    EXPECT_EQ(list.count(), 2U);
+    EXPECT_EQ(list[1].text(), "b");
+    vox::dict self = first;
+    vox::dict& alias = self;
+    self = alias;
+    EXPECT_EQ(self.get(), plain.get());
+}
+
+TEST(ObjectProxy, ReadsByTypeAndStoresEveryKind) {
+    const vox::dict values = vox::dict::create();
+    vox::object moved = vox::string("text");
+    values["object"] = std::move(moved);
+    EXPECT_EQ(moved.type(), VOX_TYPE_NULL);  // NOLINT(bugprone-use-after-move): so it says
+    const vox::dict inner = vox::dict::create();
+    values["dict"] = inner;
+    values["array"] = vox::array::create();
+    values["copy"] = values["object"];
+    values["missing"] = values["no such key"];
+
+    EXPECT_EQ(vox::object(values["copy"]).text(), "text");
+    EXPECT_EQ(vox::dict(values["dict"]).get(), inner.get());
+    EXPECT_TRUE(vox::array(values["array"]));
+    const vox::dict converted = values["array"];
+    EXPECT_FALSE(converted);
+    const vox::array alsoConverted = values["dict"];
+    EXPECT_FALSE(alsoConverted);
+    EXPECT_TRUE(values.contains("missing"));
+    EXPECT_EQ(values.count(), 5U);
+}
+
+TEST(ObjectProxy, AssigningNullKeepsTheKey) {
+    const vox::dict values = vox::dict::create();
+    values["k"] = vox::int64(1);
+    values["k"] = nullptr;
+    values["new"] = nullptr;
+    EXPECT_EQ(values.count(), 2U);
+    EXPECT_TRUE(values.contains("k"));
+    EXPECT_EQ(vox::object(values["k"]).type(), VOX_TYPE_NULL);
+    EXPECT_TRUE(values.contains("new"));
+}
+
+TEST(ObjectProxy, AssigningToNoDictionaryDoesNothing) {
+    const vox::dict none;
+    none["k"] = vox::int64(1);
+    EXPECT_EQ(none.count(), 0U);
+    EXPECT_EQ(none.type(), VOX_TYPE_NULL);
+}
+
+TEST(Values, StringsComeFromFormatsAndFromTextAsItIs) {
+    EXPECT_EQ(vox::string("%d%%", 5).text(), "5%");
+    EXPECT_EQ(vox::string(std::string("%d%%")).text(), "%d%%");
+    EXPECT_EQ(vox::string(std::string_view("a\0b", 3)).text(), std::string_view("a\0b", 3));
+    EXPECT_EQ(vox::int64(1).text(), "");
+}
+
+TEST(Connection, TheNullObjectSendsNothing) {
+    const vox::connection none;
+    EXPECT_EQ(none.send_message(vox::dict::create()), ENOTCONN);
+    none.resume();
+    none.cancel();
+    none.send_barrier(dispatch::block<void()>([] { FAIL(); }));
+    const auto queue = dispatch::queue::create("replies");
+    int replies = 0;  // touched on the queue only
+    none.send_message_with_reply(vox::dict::create(), queue,
+                                 dispatch::block<void(vox::object)>([&](const vox::object& reply) {
+                                     ++replies;
+                                     EXPECT_EQ(reply.type(), VOX_TYPE_ERROR);
+                                 }));
+    EXPECT_EQ(queue.sync([&] { return replies; }), 1);
+    EXPECT_FALSE(vox::endpoint().connect());
+    EXPECT_EQ(none.statistics().messages_sent, 0U);
+}
+
+}  // namespace
