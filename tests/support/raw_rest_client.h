@@ -1,0 +1,170 @@
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <future>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "plr/rest.h"
+#include "support/waiting.h"
+
+// A client of a REST server that sends whatever a test wants, and keeps every
+// message that it gets.
+namespace plr::test {
+
+class RawRestClient {
+  public:
+    // `connection` is not started yet.
+    RawRestClient(vox::connection connection, std::string name)
+        : connection_(std::move(connection)), name_(std::move(name)) {
+        connection_.set_event_handler([this](const vox::object& event) { take(event); });
+        connection_.set_target_queue(queue_);
+        connection_.resume();
+    }
+    // Waits for the last event, which may find this object otherwise.
+    ~RawRestClient() {
+        connection_.cancel();
+        EXPECT_TRUE(waitForEnd());
+    }
+    RawRestClient(const RawRestClient&) = delete;
+    RawRestClient& operator=(const RawRestClient&) = delete;
+
+    [[nodiscard]] const vox::connection& connection() const { return connection_; }
+    [[nodiscard]] const dispatch::queue& queue() const { return queue_; }
+
+    [[nodiscard]] vox::dict message(rest::Operation operation, std::string_view path,
+                                    const vox::object& value = {}) const {
+        return rest::createRestMessage(rest::asObject(operation), vox::string(name_),
+                                       vox::string(path), value);
+    }
+    int send(const vox::dict& message) const { return connection_.send_message(message); }
+    int send(rest::Operation operation, std::string_view path,
+             const vox::object& value = {}) const {
+        return send(message(operation, path, value));
+    }
+    // Makes the client known to the server.
+    void registerName() const { send(rest::Operation::kPush, "/connections"); }
+
+    // The reply to a message; an error when it was not answered in time.
+    [[nodiscard]] vox::object exchange(const vox::dict& message) const {
+        const auto answer = std::make_shared<std::promise<vox::object>>();
+        auto future = answer->get_future();
+        connection_.send_message_with_reply(
+            message, queue_, dispatch::block<void(vox::object)>([answer](const vox::object& reply) {
+                answer->set_value(reply);
+            }));
+        if (future.wait_for(kBound) == std::future_status::ready)
+            return future.get();
+        ADD_FAILURE() << "no reply to " << message.to_string();
+        return vox::error(VOX_ERROR_APPLICATION, "no reply");
+    }
+    [[nodiscard]] vox::object get(std::string_view path, const vox::object& value = {}) const {
+        return rest::getReplyValue(exchange(message(rest::Operation::kGet, path, value)));
+    }
+
+    // The messages that came since the last call, all that the server sent
+    // before now included: it answers a GET of its root behind them.
+    [[nodiscard]] std::vector<vox::dict> takeMessages() {
+        EXPECT_TRUE(vox::array(get(""))) << "the server does not answer";
+        return queue_.sync([this] { return std::exchange(messages_, {}); });
+    }
+    // The same for notifications, each as "author path value".
+    [[nodiscard]] std::vector<std::string> takeNotifications() {
+        std::vector<std::string> texts;
+        for (const vox::dict& message : takeMessages()) {
+            EXPECT_EQ(rest::asOperation(message["o"]), rest::Operation::kNotify);
+            texts.push_back(std::string(vox::object(message["a"]).text()) + " " +
+                            std::string(vox::object(message["r"]).text()) + " " +
+                            oneLine(message["v"]));
+        }
+        return texts;
+    }
+
+    // Whether the connection ended.
+    [[nodiscard]] bool waitForEnd() { return hasEnded_ || (hasEnded_ = end_.wait()); }
+    // What ended it.
+    [[nodiscard]] vox::object endError() {
+        EXPECT_TRUE(waitForEnd());
+        return queue_.sync([this] { return error_; });
+    }
+
+    // A value on one line.
+    [[nodiscard]] static std::string oneLine(const vox::object& value) {
+        std::string text;
+        for (const char c : value.to_string())
+            if (c != '\n' && c != '\t')
+                text += c;
+        return text;
+    }
+
+  private:
+    void take(const vox::object& event) {
+        if (const vox::dict message(event); message) {
+            messages_.push_back(message);
+        } else {
+            error_ = event;
+            end_.signal();
+        }
+    }
+
+    const vox::connection connection_;
+    const std::string name_;
+    const dispatch::queue queue_ = dispatch::queue::create("raw.client");
+    std::vector<vox::dict> messages_;  // touched on the queue only
+    vox::object error_;                // touched on the queue only
+    Event end_;
+    bool hasEnded_ = false;
+};
+
+// A server with an anonymous listener, and clients for it.
+class RestServerRig {
+  public:
+    RestServerRig() : listener_(vox::connection::create_anonymous_listener()) {
+        add("/connections", std::make_shared<rest::ConnectionRestResource>());
+    }
+    explicit RestServerRig(const vox_limits_t& limits)
+        : listener_(vox::connection::create_anonymous_listener(&limits)) {
+        add("/connections", std::make_shared<rest::ConnectionRestResource>());
+    }
+
+    void add(const char* path, std::shared_ptr<rest::RestResourceBase> resource) const {
+        EXPECT_TRUE(server_->registerResource(path, std::move(resource))) << path;
+    }
+    void start() const { server_->connect(listener_); }
+
+    // A new connection to the server, not started.
+    [[nodiscard]] vox::connection connect() const {
+        return vox::endpoint::create(listener_).connect();
+    }
+    [[nodiscard]] std::unique_ptr<RawRestClient> client(std::string name) const {
+        return std::make_unique<RawRestClient>(connect(), std::move(name));
+    }
+    // One that the server knows.
+    [[nodiscard]] std::unique_ptr<RawRestClient> registeredClient(std::string name) const {
+        auto made = client(std::move(name));
+        made->registerName();
+        return made;
+    }
+
+    [[nodiscard]] const dispatch::queue& queue() const { return queue_; }
+    [[nodiscard]] rest::RestServerExample& server() const { return *server_; }
+    [[nodiscard]] const vox::connection& listener() const { return listener_; }
+
+    // Stops listening and ignores the clients from now on.
+    void stop() {
+        server_.reset();
+        drain(queue_);
+    }
+
+  private:
+    const dispatch::queue queue_ = dispatch::queue::create("rest.server");
+    std::shared_ptr<rest::RestServerExample> server_ =
+        rest::RestServerExample::create(queue_, "rig");
+    const vox::connection listener_;
+};
+
+}  // namespace plr::test
