@@ -263,21 +263,14 @@ TEST_F(Property, AnUnknownClientWatchesNothingButMakesProperties) {
     EXPECT_EQ(get("/kept/new/_/watchers"), "[]");
 }
 
-// Lets `client` go and waits until the server has forgotten it.
-void dropAndWait(RestServerRig& rig, std::unique_ptr<RawRestClient>& client,
-                 const RawRestClient& observer, const std::string& left) {
-    client.reset();
-    while (RawRestClient::oneLine(observer.get("/connections")) != left)
-        plr::test::drain(rig.queue());
-}
-
 TEST_F(Property, WatchersThatWentAwayExpireAndStillCountOnce) {
     push("/kept/_/watched");
     auto other = rig_.registeredClient("other");
     other->send(Operation::kPush, "/kept/x");
     static_cast<void>(other->takeMessages());
     EXPECT_EQ(news(), (Texts{"me /kept/_/watched []", "me /kept/_/watched [0: \"x\"]"}));
-    dropAndWait(rig_, other, *client_, R"([0: "me"])");
+    other.reset();
+    ASSERT_TRUE(rig_.waitForDrop());
     EXPECT_EQ(get("/kept/x/_/watchers"), "[]");
     EXPECT_EQ(get("/kept/_/watched"), "[]");
     set("/kept/x", vox::int64(1));

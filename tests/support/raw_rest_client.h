@@ -66,11 +66,15 @@ class RawRestClient {
         return rest::getReplyValue(exchange(message(rest::Operation::kGet, path, value)));
     }
 
-    // The messages that came since the last call, all that the server sent
-    // before now included: it answers a GET of its root behind them.
-    [[nodiscard]] std::vector<vox::dict> takeMessages() {
-        EXPECT_TRUE(vox::array(get(""))) << "the server does not answer";
+    // The messages that came since the last call, all that the other end sent
+    // before now included: it answers `probe` behind them.
+    [[nodiscard]] std::vector<vox::dict> takeMessagesBefore(const vox::dict& probe) {
+        EXPECT_TRUE(vox::dict(exchange(probe))) << "the other end does not answer";
         return queue_.sync([this] { return std::exchange(messages_, {}); });
+    }
+    // The same with a probe that every server answers.
+    [[nodiscard]] std::vector<vox::dict> takeMessages() {
+        return takeMessagesBefore(message(rest::Operation::kGet, ""));
     }
     // The same for notifications, each as "author path value".
     [[nodiscard]] std::vector<std::string> takeNotifications() {
@@ -120,15 +124,23 @@ class RawRestClient {
     bool hasEnded_ = false;
 };
 
+// Signals when the server has told its resources of a client that dropped.
+class DropObserver : public rest::RestResource {
+  public:
+    void handleDroppedConnection(rest::RestResourceContext&, const rest::PathView&,
+                                 const std::shared_ptr<rest::RestResourceConnection>&) override {
+        dropped.signal();
+    }
+    Event dropped;
+};
+
 // A server with an anonymous listener, and clients for it.
 class RestServerRig {
   public:
-    RestServerRig() : listener_(vox::connection::create_anonymous_listener()) {
-        add("/connections", std::make_shared<rest::ConnectionRestResource>());
-    }
-    explicit RestServerRig(const vox_limits_t& limits)
+    explicit RestServerRig(const vox_limits_t& limits = vox_limits_default())
         : listener_(vox::connection::create_anonymous_listener(&limits)) {
         add("/connections", std::make_shared<rest::ConnectionRestResource>());
+        add("/~drops", drops_);  // the last to be told
     }
 
     void add(const char* path, std::shared_ptr<rest::RestResourceBase> resource) const {
@@ -150,6 +162,9 @@ class RestServerRig {
         return made;
     }
 
+    // Whether one more client that was registered has been forgotten.
+    [[nodiscard]] bool waitForDrop() const { return drops_->dropped.wait(); }
+
     [[nodiscard]] const dispatch::queue& queue() const { return queue_; }
     [[nodiscard]] rest::RestServerExample& server() const { return *server_; }
     [[nodiscard]] const vox::connection& listener() const { return listener_; }
@@ -161,6 +176,7 @@ class RestServerRig {
     }
 
   private:
+    const std::shared_ptr<DropObserver> drops_ = std::make_shared<DropObserver>();
     const dispatch::queue queue_ = dispatch::queue::create("rest.server");
     std::shared_ptr<rest::RestServerExample> server_ =
         rest::RestServerExample::create(queue_, "rig");
