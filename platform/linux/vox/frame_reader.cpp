@@ -41,8 +41,9 @@ std::span<std::uint8_t> frame_reader::space(std::span<std::uint8_t> scratch) {
     if (at_ != kept_.data())
         kept_.drop_front(static_cast<std::size_t>(at_ - kept_.data()));
     const std::size_t total = kHeaderBytes + header_.length;
+    const bool full = kept_.capacity() == rest;
     const std::size_t wanted = std::min(total, std::max(kEagerBytes, 2 * rest));
-    filling_ = kept_.room(wanted - rest);
+    filling_ = kept_.room(full ? wanted - rest : 0);
     at_ = kept_.data();
     end_ = at_ + rest;
     return {filling_, std::min(kept_.capacity(), total) - rest};
