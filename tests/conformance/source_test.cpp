@@ -94,6 +94,9 @@ bool manyFireInOrder(std::chrono::milliseconds lead) {
             all.enter();
         timers.back().set_event_handler(block<void()>([&, due, withdrawn] {
             ordered = ordered && !withdrawn && due.nanoseconds() >= last;
+            // Armed too late, it may have been on its way when it was withdrawn.
+            if (withdrawn)
+                return;
             last = due.nanoseconds();
             ++fired;
             all.leave();
