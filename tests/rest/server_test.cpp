@@ -381,6 +381,7 @@ TEST(RestServer, ListensAnewAndDropsTheOldListenersErrors) {
     const RestServerRig rig;
     rig.start();
     const auto client = rig.registeredClient("me");
+    EXPECT_EQ(text(client->get("/connections")), R"([0: "me"])");
     rig.server().setListenerErrorHandler([](const vox::object&) { FAIL(); });
     const auto listener = vox::connection::create_anonymous_listener();
     rig.server().connect(listener);
