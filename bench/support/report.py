@@ -19,6 +19,7 @@ from pathlib import Path
 import suites
 
 TIME_LIMIT_S = 120
+BEGIN, END = "<!-- bench/run: begin -->", "<!-- bench/run: end -->"
 
 
 def run_program(programs, cell, folder):
@@ -100,6 +101,14 @@ def table(rows):
     return "\n".join([line(rows[0]), rule, *map(line, rows[1:])]) + "\n"
 
 
+def write_markdown(file, text):
+    """The table as a file, or in place of the one between a file's marks."""
+    if file.exists() and BEGIN in (old := file.read_text(encoding="utf-8")):
+        head, rest = old.split(BEGIN, 1)
+        text = f"{head}{BEGIN}\n{text}{END}{rest.split(END, 1)[1]}"
+    file.write_text(text, encoding="utf-8")
+
+
 def arguments():
     parser = argparse.ArgumentParser(prog="bench/run")
     parser.add_argument("suites", nargs="*", metavar="suite", help=", ".join(suites.SUITES))
@@ -107,7 +116,7 @@ def arguments():
     parser.add_argument("--quick", action="store_true", help="2 rounds instead of 5")
     parser.add_argument("--rounds", type=int)
     parser.add_argument("--only", default="", help="only measurements whose title contains this")
-    parser.add_argument("--markdown", type=Path, help="write the table to this file as well")
+    parser.add_argument("--markdown", type=Path, help="write the table there as well")
     parsed = parser.parse_args()
     for name in parsed.suites:
         if name not in suites.SUITES:
@@ -134,7 +143,7 @@ def main():
     print(text, end="")
     print(f"{rounds} interleaved rounds; ours/peer is the ratio of the medians.")
     if options.markdown:
-        options.markdown.write_text(text, encoding="utf-8")
+        write_markdown(options.markdown, text)
     for failure in failures:
         print(f"bench/run: {failure}", file=sys.stderr)
     return 1 if failures or not rows else 0
