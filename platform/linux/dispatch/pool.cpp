@@ -50,7 +50,7 @@ pool::pool() noexcept : processors_(usable_processors()) {
 
 void pool::submit(item* work, priority level) noexcept {
     const bool was_empty = lists_[static_cast<unsigned>(level)].push(work);
-    if (current_worker && was_empty)
+    if (current_worker && was_empty && !frame::more_to_do())
         deputy::watch();  // this worker comes for it, unless its present work takes long
     else
         notify();

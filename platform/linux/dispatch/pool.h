@@ -18,9 +18,9 @@
 // sleep on a futex, the one that slept last being woken first.
 //
 // Waking: a push from outside wakes one sleeper, unless a worker is searching
-// already. A push by a worker to an empty list wakes nobody, because that worker
-// comes for it next. The deputy (deputy.h) mends what that leaves open: it wakes
-// or adds workers when work waits and none is taken.
+// already. A push by a worker that has nothing else to do, to an empty list, wakes
+// nobody, because that worker comes for it next. The deputy (deputy.h) mends what that leaves open:
+// it wakes or adds workers when work waits and none is taken.
 //
 // No wake-up is lost: who pushes publishes the work and then looks for sleepers;
 // who goes to sleep publishes itself and then looks for work (all seq_cst).

@@ -64,6 +64,12 @@ frame::~frame() {
 frame* frame::top() noexcept {
     return top_frame;
 }
+bool frame::more_to_do() noexcept {
+    for (const frame* each = top_frame; each; each = each->up)
+        if (each->queue->has_behind(each->running))
+            return true;
+    return false;
+}
 
 void waiter::wait() noexcept {
     for (unsigned spins = 0; spins < 100 && pool::shared().processors() > 1; ++spins) {
@@ -224,6 +230,7 @@ queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
         }
         if (work->run == &queue_tag || work->run == &embedded_tag) {
             head_ = detach(work);
+            here.running = &stub_;
             if (!run_nested(work, budget))
                 return outcome::handed;
             work = head_ ? head_ : take_after_stub();
@@ -231,6 +238,7 @@ queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
                 return outcome::idle;
             continue;
         }
+        here.running = work;
         work->run(work);
         item* next = work->next.load(std::memory_order_acquire);
         if (!next)

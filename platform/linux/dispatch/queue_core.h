@@ -55,9 +55,12 @@ struct frame {
     frame(const frame&) = delete;
     frame& operator=(const frame&) = delete;
     static frame* top() noexcept;
+    // Whether this thread has more to run when the present work is done.
+    static bool more_to_do() noexcept;
 
     const queue_core* queue;
     frame* up;
+    const item* running = nullptr;  // what stands for the present work in the queue's list
 };
 
 class queue_core {
@@ -94,6 +97,11 @@ class queue_core {
     [[nodiscard]] priority level() const noexcept { return priority_; }
     void set_specific(const void* key, void* value, void (*destructor)(void*));
     [[nodiscard]] void* get_specific(const void* key) const noexcept;
+
+    // Whether something waits behind `running`.
+    [[nodiscard]] bool has_behind(const item* running) const noexcept {
+        return running && tail_.load(std::memory_order_relaxed) != running;
+    }
 
     // The queue whose place in a list `work` is.
     static queue_core* of(item* work) noexcept { return static_cast<place*>(work)->owner; }

@@ -21,15 +21,16 @@ constexpr clockid_t kClocks[] = {CLOCK_MONOTONIC, CLOCK_BOOTTIME, CLOCK_REALTIME
 }  // namespace
 
 timer_queue::timer_queue(int epoll, std::uint64_t first_tag) noexcept {
-    for (std::size_t i = 0; i < clocks_.size(); ++i) {
-        const int made = ::timerfd_create(kClocks[i], TFD_NONBLOCK | TFD_CLOEXEC);
+    std::size_t i = 0;
+    for (const clockid_t clock : kClocks) {
+        const int made = ::timerfd_create(clock, TFD_NONBLOCK | TFD_CLOEXEC);
         epoll_event interest{};
         interest.events = EPOLLIN;
         interest.data.u64 = first_tag + i;
         if (made < 0 || ::epoll_ctl(epoll, EPOLL_CTL_ADD, made, &interest) != 0)
             plr::report("dispatch: no timer descriptor (%s)", ::strerrordesc_np(errno));
         PLR_ASSERT(made >= 0, "timerfd_create");
-        clocks_[i].descriptor = made;
+        clocks_[i++].descriptor = made;
     }
 }
 
