@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/un.h>
 #include <unistd.h>
 
 #include <array>
@@ -12,6 +13,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
+#include <memory>
 #include <mutex>
 #include <span>
 #include <string>
@@ -254,6 +256,26 @@ class RawPeer {
         return all;
     }
 
+    // As send(), with as many descriptors as the kernel takes.
+    void sendWith(std::span<const std::uint8_t> bytes, std::span<const int> descriptors) {
+        std::vector<std::byte> control(CMSG_SPACE(descriptors.size_bytes()));
+        Bytes first(bytes.begin(), bytes.begin() + 1);
+        iovec piece = {first.data(), 1};
+        msghdr header = {};
+        header.msg_iov = &piece;
+        header.msg_iovlen = 1;
+        if (!descriptors.empty()) {
+            header.msg_control = control.data();
+            header.msg_controllen = control.size();
+            cmsghdr* rights = CMSG_FIRSTHDR(&header);
+            rights->cmsg_level = SOL_SOCKET;
+            rights->cmsg_type = SCM_RIGHTS;
+            rights->cmsg_len = CMSG_LEN(descriptors.size_bytes());
+            std::memcpy(CMSG_DATA(rights), descriptors.data(), descriptors.size_bytes());
+        }
+        EXPECT_EQ(::sendmsg(fd_, &header, MSG_NOSIGNAL), 1);
+        send(bytes.subspan(1));
+    }
     // Sends all of `bytes`; `descriptors` with the first. False when the other
     // end is gone.
     bool send(std::span<const std::uint8_t> bytes, std::span<const int> descriptors = {}) {
@@ -302,6 +324,126 @@ inline std::pair<Ref, RawPeer> connectionWithRawPeer(const vox_limits_t* limits 
     std::array<int, 2> ends = {-1, -1};
     EXPECT_EQ(::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends.data()), 0);
     return {Ref(vox_connection_create_from_socket(ends[0], limits)), RawPeer(ends[1])};
+}
+
+// A service in this process that answers requests with their number and records
+// the events of each of its clients.
+class EchoService {
+  public:
+    struct Client {
+        Ref connection;
+        Inbox inbox;
+    };
+
+    // `make` makes the listener.
+    explicit EchoService(vox_connection_t listener)
+        : listener_(listener), queue_(dispatch::queue::create("service")) {
+        const dispatch::block<void(vox_object_t)> handler(
+            [this](vox_object_t event) { take(event); });
+        vox_connection_set_event_handler(listener_, &handler);
+        vox_connection_set_target_queue(listener_, &queue_);
+        vox_connection_resume(listener_);
+    }
+    ~EchoService() {
+        vox_connection_cancel(listener_);
+        EXPECT_TRUE(errors_.waitForError());
+        queue_.sync([this] {
+            for (const auto& client : clients_)
+                vox_connection_cancel(client->connection);
+        });
+        for (const auto& client : clients_)
+            EXPECT_TRUE(client->inbox.waitForError());
+        drain(queue_);
+    }
+    EchoService(const EchoService&) = delete;
+    EchoService& operator=(const EchoService&) = delete;
+
+    [[nodiscard]] vox_connection_t listener() const { return listener_; }
+    // The listener's error.
+    [[nodiscard]] Inbox& errors() { return errors_; }
+    // The client that came as number `index`, waited for; null in vain.
+    [[nodiscard]] Client* client(std::size_t index) {
+        Client* found = nullptr;
+        static_cast<void>(eventually([&] {
+            const std::lock_guard guard(lock_);
+            found = index < clients_.size() ? clients_[index].get() : nullptr;
+            return found != nullptr;
+        }));
+        return found;
+    }
+
+  private:
+    void take(vox_object_t event) {
+        if (vox_get_type(event) != VOX_TYPE_CONNECTION)
+            return errors_.add(event);
+        auto client = std::make_unique<Client>();
+        client->connection = Ref::retain(event);
+        const dispatch::block<void(vox_object_t)> handler(
+            [taken = client.get()](vox_object_t arrived) { answer(*taken, arrived); });
+        vox_connection_set_event_handler(event, &handler);
+        vox_connection_set_target_queue(event, &queue_);
+        {
+            const std::lock_guard guard(lock_);
+            clients_.push_back(std::move(client));
+        }
+        vox_connection_resume(event);
+    }
+    static void answer(Client& client, vox_object_t event) {
+        const Ref reply(vox_dictionary_create_reply(event));
+        if (!vox_object_t(reply))
+            return client.inbox.add(event);
+        vox_dictionary_set_value(reply, "n", vox_dictionary_get_value(event, "n"));
+        static_cast<void>(vox_connection_send_message(client.connection, reply));
+    }
+
+    Ref listener_;
+    dispatch::queue queue_;
+    Inbox errors_;
+    std::mutex lock_;
+    std::vector<std::unique_ptr<Client>> clients_;
+};
+
+// A client with its events, cancelled at the end.
+class TestClient {
+  public:
+    explicit TestClient(vox_connection_t connection)
+        : connection_(connection), queue_(dispatch::queue::create("client")) {
+        resumeWith(connection_, inbox_, queue_);
+    }
+    ~TestClient() {
+        vox_connection_cancel(connection_);
+        EXPECT_TRUE(inbox_.waitForError());
+        drain(queue_);
+    }
+    TestClient(const TestClient&) = delete;
+    TestClient& operator=(const TestClient&) = delete;
+    [[nodiscard]] vox_connection_t connection() const { return connection_; }
+    [[nodiscard]] Inbox& inbox() { return inbox_; }
+    // Whether a request is answered.
+    [[nodiscard]] bool works() {
+        auto replies = std::make_shared<Inbox>();
+        const dispatch::block<void(vox_object_t)> handler(
+            [replies](vox_object_t reply) { replies->add(reply); });
+        vox_connection_send_message_with_reply(connection_, message(42), &queue_, &handler);
+        return replies->wait(1) && numberIn(replies->all().front()) == 42;
+    }
+
+  private:
+    Ref connection_;
+    dispatch::queue queue_;
+    Inbox inbox_;
+};
+
+// A stream socket connected to the file at `path`; -1 when that fails.
+inline int connectTo(const std::string& path) {
+    sockaddr_un address = {};
+    address.sun_family = AF_UNIX;
+    std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
+    const int fd = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    if (::connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0)
+        return fd;
+    ::close(fd);
+    return -1;
 }
 
 }  // namespace plr::test

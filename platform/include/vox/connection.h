@@ -15,7 +15,7 @@
 //   - a dictionary: a message, or a request when
 //     vox_dictionary_create_reply() gives a reply for it;
 //   - a connection, on listeners: a new client, suspended; it is refused
-//     unless the handler resumes it or keeps a reference;
+//     unless the handler keeps a reference (its event handler may be the one);
 //   - an error: the last event there is. INTERRUPTED: the other end closed, or
 //     nobody serves the name now; a new connection may succeed. INVALID: it
 //     was cancelled, broke the protocol or a limit, or the name cannot be used.
@@ -115,7 +115,8 @@ PLR_EXPORT void vox_connection_resume(vox_connection_t connection);
 PLR_EXPORT void vox_connection_suspend(vox_connection_t connection);
 // Closes the connection at once; what was not yet handed to the kernel is lost
 // (send a barrier first to keep it). Every outstanding reply handler is called
-// with the error, then the event handler gets INVALID. Again: nothing.
+// with the error, then the event handler gets INVALID, also while suspended.
+// Again: nothing.
 PLR_EXPORT void vox_connection_cancel(vox_connection_t connection);
 
 // ---- Sending -------------------------------------------------------------------

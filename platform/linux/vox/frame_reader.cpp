@@ -18,11 +18,6 @@ static_assert(kSmallRest < frame_reader::kLeastScratch);
 
 }  // namespace
 
-frame_reader::~frame_reader() {
-    for (std::size_t i = next_descriptor_; i < descriptors_.size(); ++i)
-        ::close(descriptors_[i]);
-}
-
 std::span<std::uint8_t> frame_reader::space(std::span<std::uint8_t> scratch) {
     const std::size_t rest = left();
     if (rest <= kSmallRest) {
@@ -131,6 +126,17 @@ void frame_reader::keep() {
         end_ = at_ + rest;
     }
     in_kept_ = true;
+}
+
+void frame_reader::clear() noexcept {
+    for (std::size_t i = next_descriptor_; i < descriptors_.size(); ++i)
+        ::close(descriptors_[i]);
+    descriptors_.clear();
+    next_descriptor_ = 0;
+    kept_ = {};
+    at_ = end_ = nullptr;
+    in_kept_ = true;
+    header_known_ = false;
 }
 
 // An idle connection holds no memory here.

@@ -37,7 +37,7 @@ class frame_reader {
     enum class outcome : std::uint8_t { frame, more, error };
 
     explicit frame_reader(const frame_limits& limits) noexcept : limits_(limits) {}
-    ~frame_reader();
+    ~frame_reader() { clear(); }
     frame_reader(const frame_reader&) = delete;
     frame_reader& operator=(const frame_reader&) = delete;
 
@@ -52,6 +52,9 @@ class frame_reader {
     [[nodiscard]] outcome next(frame& out);
     // Moves what is left in the scratch memory to memory of the reader.
     void keep();
+
+    // Gives up everything held.
+    void clear() noexcept;
 
     // Whether next() would give a frame or an error without more bytes.
     [[nodiscard]] bool has_next() const noexcept;

@@ -32,9 +32,11 @@ class listener final : public connection {
 
   protected:
     void start() override;
-    void turn() override;
-    void cut_off() override;
-    void wind_up(vox_object_t error) override;
+    void turn() PLR_ON(queue_role_)
+    override;
+    void cut_off() PLR_REQUIRES(lock_) override;
+    void wind_up(vox_object_t error) PLR_ON(queue_role_)
+    override;
     [[nodiscard]] std::string title() override;
 
   private:

@@ -159,6 +159,7 @@ void peer_connection::close_socket() {
 
 void peer_connection::wind_up(vox_object_t error) {
     close_socket();
+    reader_.clear();
     if (incomplete_timer_)
         incomplete_timer_.cancel();
     incomplete_timer_ = {};

@@ -61,9 +61,11 @@ class peer_connection final : public connection {
 
   protected:
     void start() override;
-    void turn() override;
-    void cut_off() override;
-    void wind_up(vox_object_t error) override;
+    void turn() PLR_ON(queue_role_)
+    override;
+    void cut_off() PLR_REQUIRES(lock_) override;
+    void wind_up(vox_object_t error) PLR_ON(queue_role_)
+    override;
     [[nodiscard]] std::string title() override;
 
   private:
@@ -95,7 +97,7 @@ class peer_connection final : public connection {
     void handle_message(const frame& arrived) PLR_ON(queue_role_);
     void handle_control(const frame& arrived) PLR_ON(queue_role_);
     [[nodiscard]] vox_dictionary_object* decode(const frame& arrived) PLR_ON(queue_role_);
-    void read_failed(int error);
+    void read_failed(int error) PLR_ON(queue_role_);
     void violation(std::string reason);
     void limit_incomplete_frame() PLR_ON(queue_role_);
     void incomplete_frame_due();

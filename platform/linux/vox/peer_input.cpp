@@ -118,9 +118,7 @@ bool peer_connection::receive(std::span<std::uint8_t> memory) {
         return false;
     }
     if (got.bytes == 0) {
-        fail(VOX_ERROR_CONNECTION_INTERRUPTED,
-             reader_.in_frame() ? "the peer closed the connection in the middle of a frame"
-                                : "the peer closed the connection");
+        read_failed(ECONNRESET);
         return false;
     }
     // The kernel ends a read behind bytes that came with descriptors, so only
@@ -131,11 +129,15 @@ bool peer_connection::receive(std::span<std::uint8_t> memory) {
     return true;
 }
 
+// EAGAIN: writing failed before, and now everything is read.
 void peer_connection::read_failed(int error) {
     if (error == EAGAIN || error == ECONNRESET)
-        fail(VOX_ERROR_CONNECTION_INTERRUPTED, "the peer closed the connection");
+        fail(VOX_ERROR_CONNECTION_INTERRUPTED,
+             reader_.in_frame() ? "the peer closed the connection in the middle of a frame"
+                                : "the peer closed the connection");
     else
-        fail(VOX_ERROR_CONNECTION_INVALID, std::string("cannot read: ") + ::strerrordesc_np(error));
+        fail(VOX_ERROR_CONNECTION_INVALID,
+             std::string("cannot read: ") + ::strerrordesc_np(error));
 }
 
 void peer_connection::violation(std::string reason) {
