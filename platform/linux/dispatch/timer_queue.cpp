@@ -21,6 +21,7 @@ constexpr clockid_t kClocks[] = {CLOCK_MONOTONIC, CLOCK_BOOTTIME, CLOCK_REALTIME
 }  // namespace
 
 timer_queue::timer_queue(int epoll, std::uint64_t first_tag) noexcept {
+    static_assert(std::size(kClocks) == std::tuple_size_v<decltype(clocks_)>);
     std::size_t i = 0;
     for (const clockid_t clock : kClocks) {
         const int made = ::timerfd_create(clock, TFD_NONBLOCK | TFD_CLOEXEC);
