@@ -165,8 +165,8 @@ TEST(VoxCodecRefusal, OfTextThatIsNotUtf8) {
                                 "dfbf",   "e0a080",   "ed9fbf",   "ee8080",
                                 "efbfbf", "f0908080", "f48fbfbf", "e282acc3a9f09f9880"};
     // Behind and before ASCII of lengths around the steps that ASCII is read in.
-    for (const std::size_t before : {0, 1, 7, 8, 31, 32, 33, 100}) {
-        for (const std::size_t behind : {0, 1, 7, 8, 40}) {
+    for (const std::size_t before : {0u, 1u, 7u, 8u, 31u, 32u, 33u, 100u}) {
+        for (const std::size_t behind : {0u, 1u, 7u, 8u, 40u}) {
             const auto framed = [&](const char* hex) {
                 bytes text(before, 'x');
                 for (const std::uint8_t byte : from_hex(hex))

@@ -41,7 +41,8 @@ TEST(VoxCodec, IntegersOfAllLengthsComeBackAsTheType) {
 }
 
 TEST(VoxCodec, LengthsOfAllHeadsComeBack) {
-    for (const std::size_t length : {0, 1, 7, 8, 15, 16, 17, 23, 24, 255, 256, 65535, 65536}) {
+    for (const std::size_t length :
+         {0u, 1u, 7u, 8u, 15u, 16u, 17u, 23u, 24u, 255u, 256u, 65535u, 65536u}) {
         const owned string = text(std::string(length, 's'));
         const owned data = own(vox_data_create(std::string(length, '\xff').data(), length));
         owned list = own(vox_array_create());
