@@ -95,8 +95,9 @@ TEST(Group, AsyncIsAMemberUntilItsClosureIsDestroyed) {
     const group work;
     std::atomic<int> destroyed{0};
     struct Tracked {
-        std::atomic<int>* count;
+        explicit Tracked(std::atomic<int>* destructions) : count(destructions) {}
         ~Tracked() { ++*count; }
+        std::atomic<int>* count;
     };
     for (int i = 0; i < 100; ++i)
         work.async(serial, [held = std::make_unique<Tracked>(&destroyed)] {});

@@ -91,7 +91,8 @@ TEST(FrameReader, FramesAreTheSameHoweverTheBytesAreCut) {
         const Bytes one = messageOf(size);
         stream.insert(stream.end(), one.begin(), one.end());
     }
-    for (const std::size_t step : {1, 2, 7, 23, 24, 25, 100, 4097, 16383, 16384, 1000000}) {
+    const std::vector<std::size_t> steps = {1, 2, 7, 23, 24, 25, 100, 4097, 16383, 16384, 1000000};
+    for (const std::size_t step : steps) {
         Feed feed;
         EXPECT_EQ(feed.give(stream, step), "") << "step " << step;
         EXPECT_EQ(feed.bodies, sizes) << "step " << step;

@@ -37,7 +37,7 @@ class Module : public testing::Test {
     void connect() {
         auto [mine, theirs] = vox::connection::create_pair();
         server_ = std::make_unique<RawRestClient>(theirs, "server");
-        on([&, this] { module_->connect(mine); });
+        on([this, &mine = mine] { module_->connect(mine); });
     }
     // What the module has sent since the last call, as "operation path value".
     Texts heard() {
@@ -386,7 +386,7 @@ TEST_F(Module, FlushWaitsUntilAllIsHandedOver) {
     auto [mine, theirs] = vox::connection::create_pair();
     server_ = std::make_unique<RawRestClient>(theirs, "server");
     const dispatch::group group;
-    on([&] {
+    on([this, &group, &mine = mine] {
         module_->connect(mine);
         for (int i = 0; i < 1000; ++i)
             module_->setProperty("/p", vox::string("%d", i));
