@@ -3,8 +3,7 @@
 #include <unistd.h>
 
 #include <fstream>
-#include <regex>
-#include <sstream>
+#include <utility>
 
 #include "platform/linux/vox/frame.h"
 #include "tests/platform/vox_values.h"
@@ -53,37 +52,45 @@ std::vector<vector> values(const std::string& kind) {
 }
 
 std::vector<vector> frames() {
-    static const std::regex hex("^((?:[0-9a-f]{2} {1,2})*[0-9a-f]{2})(?:  .*)?$");
     std::vector<vector> result;
     vector frame;
     for (const std::string& line : lines_of("vox-frame")) {
-        std::smatch match;
         if (line.empty())
             result.push_back(std::exchange(frame, {}));
         else if (line.starts_with("= "))
             frame.description = line.substr(2);
-        else if (std::regex_match(line, match, hex))
-            for (const std::uint8_t byte : from_hex(match[1].str()))
+        else  // what the bytes mean stands three spaces or more behind them
+            for (const std::uint8_t byte : from_hex(line.substr(0, line.find("   "))))
                 frame.data.push_back(byte);
-        else
-            ADD_FAILURE() << line;
     }
     return result;
+}
+
+std::size_t count(std::string_view text, std::string_view part) {
+    std::size_t result = 0;
+    for (std::size_t at = 0; (at = text.find(part, at)) != std::string_view::npos; at++)
+        result++;
+    return result;
+}
+
+// The page writes "<fd>" where a description has its number.
+std::string without_numbers(std::string text) {
+    for (const std::string_view kind : {"<fd ", "<endpoint "})
+        for (std::size_t at; (at = text.find(kind)) != std::string::npos;)
+            text.erase(at + kind.size() - 1, text.find('>', at) - at - kind.size() + 1);
+    return text;
 }
 
 // Decodes `body`, checks what it is, and that it encodes to the same bytes.
 void check(const vector& expected, std::span<const std::uint8_t> body) {
     std::vector<int> descriptors;
-    for (std::size_t at = 0;
-         (at = expected.description.find_first_of("fe", at)) != std::string::npos; at++)
-        if (expected.description.substr(at).starts_with("fd>") ||
-            expected.description.substr(at).starts_with("endpoint>"))
-            descriptors.push_back(open("/dev/null", O_RDONLY | O_CLOEXEC));
+    const std::string& text = expected.description;
+    for (std::size_t left = count(text, "<fd>") + count(text, "<endpoint>"); left > 0; left--)
+        descriptors.push_back(open("/dev/null", O_RDONLY | O_CLOEXEC));
     const char* why = nullptr;
     const owned value = own(vox_wire::decode(body, descriptors, {}, why));
     ASSERT_NE(value, nullptr) << expected.description << ": " << why;
-    static const std::regex number("<(fd|endpoint) [0-9]+>");
-    EXPECT_EQ(std::regex_replace(description(value.get()), number, "<$1>"), expected.description);
+    EXPECT_EQ(without_numbers(description(value.get())), text);
     vox_wire::encoded again;
     ASSERT_EQ(vox_wire::encode(value.get(), {}, again), 0);
     EXPECT_EQ(to_hex(again.bytes.view()), to_hex(body)) << expected.description;

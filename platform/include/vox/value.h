@@ -110,7 +110,8 @@ PLR_EXPORT void vox_array_set_value(vox_object_t array, size_t index, vox_object
 // Dictionaries: keys are NUL-terminated UTF-8; entries keep the order in which
 // their keys first came. set_value with a null pointer removes the key (the
 // null object is a value like others). get_value gives a null pointer for a
-// missing key.
+// missing key. Finding and adding take the same time at any size; removing moves
+// the entries behind the key.
 PLR_EXPORT vox_object_t vox_dictionary_create(void);
 PLR_EXPORT size_t vox_dictionary_get_count(vox_object_t dictionary);
 PLR_EXPORT vox_object_t vox_dictionary_get_value(vox_object_t dictionary, const char* key);
