@@ -363,6 +363,25 @@ TEST(VoxSlowPeer, GetsEveryReplyUnlessTwiceTheLimitWaits) {
     EXPECT_LE(most.load(), 2 * limits.max_queued_bytes);
 }
 
+TEST(VoxSlowPeer, CannotMakeAnswersToPingsPileUp) {
+    const vox_limits_t limits = smallQueue(VOX_OVERFLOW_DROP);
+    auto [connection, peer] = plr::test::connectionWithRawPeer(&limits);
+    Inbox inbox;
+    plr::test::resumeWith(connection, inbox);
+    const Bytes ping = RawPeer::frame(frame_type::ping, 1, Ref(vox_null_create()), 0, 1);
+    Bytes many;
+    for (int i = 0; i < 1000; ++i)
+        many.insert(many.end(), ping.begin(), ping.end());
+    bool open = peer.send(RawPeer::hello());
+    vox_statistics_t counts;
+    while (open) {
+        open = peer.send(many);
+        vox_connection_get_statistics(connection, &counts);
+        ASSERT_LE(counts.queued_bytes, 2 * limits.max_queued_bytes);
+    }
+    EXPECT_NE(descriptionOf(inbox.waitForError()).find("does not read"), std::string::npos);
+}
+
 TEST(VoxSlowPeer, ToldCountsAreSeenByTheReceiver) {
     auto [connection, peer] = plr::test::connectionWithRawPeer();
     Inbox inbox;

@@ -6,6 +6,16 @@
 #include "plr/base/assert.h"
 
 namespace vox_link {
+namespace {
+
+bool is_concurrent(const dispatch::queue& queue) noexcept {
+    using dispatch::priority;
+    return queue == dispatch::queue::global(priority::normal) ||
+           queue == dispatch::queue::global(priority::high) ||
+           queue == dispatch::queue::global(priority::low);
+}
+
+}  // namespace
 
 const vox_custom_vtable connection::kVtable = {
     [](vox_custom_object* object) noexcept { static_cast<connection*>(object)->references_gone(); },
@@ -47,8 +57,10 @@ void connection::set_event_handler(event_block handler) {
 
 void connection::set_target_queue(dispatch::queue queue) {
     PLR_ASSERT(!started_.load(), "vox_connection_set_target_queue() after the first resume");
-    if (!cancelled_.load())
-        queue_ = std::move(queue);
+    if (cancelled_.load())
+        return;
+    // Events come one at a time, on a concurrent queue too.
+    queue_ = is_concurrent(queue) ? dispatch::queue::create(label(), queue) : std::move(queue);
 }
 
 void connection::resume() {
@@ -79,7 +91,7 @@ void connection::cancel() {
 void connection::settle_queue() {
     const lock_guard guard(lock_);
     if (!queue_)
-        queue_ = dispatch::queue::create(name_.empty() ? "vox" : name_);
+        queue_ = dispatch::queue::create(label());
 }
 
 void connection::fail(std::int64_t code, std::string reason, blame blamed) {

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <string_view>
 
 #include "dispatch/dispatch.h"
 #include "platform/linux/dispatch/io_watch.h"
@@ -97,6 +98,9 @@ class connection : public vox_custom_object {
 
     void references_gone() noexcept;
     void settle_queue();
+    [[nodiscard]] std::string_view label() const noexcept {
+        return name_.empty() ? std::string_view("vox") : name_;
+    }
     void run_turn();
     void end() PLR_ON(queue_role_);
 

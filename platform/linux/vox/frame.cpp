@@ -1,8 +1,8 @@
 #include "platform/linux/vox/frame.h"
 
 #include <algorithm>
+#include <bit>
 #include <cstring>
-#include <type_traits>
 
 namespace vox_link {
 namespace {
@@ -10,17 +10,28 @@ namespace {
 constexpr std::uint8_t kMagic[4] = {'V', 'O', 'X', '1'};
 
 template <class Unsigned>
+Unsigned little_endian(Unsigned value) noexcept {
+    if constexpr (std::endian::native == std::endian::little || sizeof value == 1)
+        return value;
+    else if constexpr (sizeof value == 2)
+        return __builtin_bswap16(value);
+    else if constexpr (sizeof value == 4)
+        return __builtin_bswap32(value);
+    else
+        return __builtin_bswap64(value);
+}
+
+template <class Unsigned>
 void store(Unsigned value, std::uint8_t* out) noexcept {
-    for (std::size_t i = 0; i < sizeof value; ++i)
-        out[i] = static_cast<std::uint8_t>(value >> (8 * i));
+    value = little_endian(value);
+    std::memcpy(out, &value, sizeof value);
 }
 
 template <class Unsigned>
 Unsigned load(const std::uint8_t* in) noexcept {
-    std::uint64_t value = 0;
-    for (std::size_t i = 0; i < sizeof(Unsigned); ++i)
-        value |= std::uint64_t{in[i]} << (8 * i);
-    return static_cast<Unsigned>(value);
+    Unsigned value;
+    std::memcpy(&value, in, sizeof value);
+    return little_endian(value);
 }
 
 // The reason why a header with correct magic cannot be accepted; empty: it can.

@@ -67,6 +67,14 @@ void write_header_id(std::uint64_t id, std::uint8_t* header) noexcept;
                                frame_header& header, std::string& why);
 // What our own writer produced, without checks.
 [[nodiscard]] frame_header read_own_header(const std::uint8_t* bytes) noexcept;
+// Two of its fields.
+[[nodiscard]] inline frame_type type_in_header(const std::uint8_t* bytes) noexcept {
+    return static_cast<frame_type>(bytes[4]);
+}
+[[nodiscard]] inline std::uint32_t length_in_header(const std::uint8_t* bytes) noexcept {
+    return bytes[8] | std::uint32_t{bytes[9]} << 8 | std::uint32_t{bytes[10]} << 16 |
+           std::uint32_t{bytes[11]} << 24;
+}
 // Whether `bytes`, maybe too few for a header, can begin one.
 [[nodiscard]] bool may_begin_frame(std::span<const std::uint8_t> bytes) noexcept;
 

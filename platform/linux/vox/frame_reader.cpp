@@ -106,8 +106,7 @@ bool frame_reader::has_next() const noexcept {
     if (left() < kHeaderBytes)
         return false;
     // A header that is refused later makes this answer wrong, and harmless.
-    const std::uint32_t length = read_own_header(at_).length;
-    return left() - kHeaderBytes >= length;
+    return left() - kHeaderBytes >= length_in_header(at_);
 }
 
 void frame_reader::keep() {

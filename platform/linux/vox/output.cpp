@@ -52,7 +52,7 @@ void output::put_back(vox_wire::encoded& made, std::size_t sent) {
 
 void output::count_waiting(const std::uint8_t* frame, std::size_t bytes) noexcept {
     bytes_ += bytes;
-    if (carries_message(read_own_header(frame).type))
+    if (carries_message(type_in_header(frame)))
         ++messages_;
 }
 
@@ -99,14 +99,13 @@ void output::written(std::size_t count) noexcept {
 
 void output::count_frames(chunk& progressed) noexcept {
     while (progressed.frame_begin < progressed.at) {
-        const frame_header header =
-            read_own_header(progressed.bytes.data() + progressed.frame_begin);
-        const std::size_t end = progressed.frame_begin + kHeaderBytes + header.length;
+        const std::uint8_t* header = progressed.bytes.data() + progressed.frame_begin;
+        const std::size_t end = progressed.frame_begin + kHeaderBytes + length_in_header(header);
         if (end > progressed.at)
             return;
         progressed.frame_begin = end;
         ++finished_;
-        if (carries_message(header.type)) {
+        if (carries_message(type_in_header(header))) {
             --messages_;
             ++messages_written_;
         }

@@ -2,6 +2,7 @@
 
 #include <sys/socket.h>
 
+#include <chrono>
 #include <cstdint>
 #include <deque>
 #include <span>
@@ -114,7 +115,7 @@ class peer_connection final : public connection {
     void tell_dropped() PLR_REQUIRES(lock_);
     [[nodiscard]] bool defer() PLR_REQUIRES(lock_);
     [[nodiscard]] bool is_burst() PLR_REQUIRES(lock_);
-    void arm_flush() PLR_REQUIRES(lock_);
+    void arm_flush(std::chrono::microseconds delay) PLR_REQUIRES(lock_);
     void flush();
     [[nodiscard]] bool can_write() const PLR_REQUIRES(lock_) {
         return fd_ >= 0 && !writing_ && !blocked_ && !abandoned_ && !broken_;

@@ -25,6 +25,8 @@ constexpr std::int64_t kBurstGap = 3'000;  // ns
 constexpr std::size_t kBurstBytes = 32u << 10;
 // … or, at its end, after this time.
 constexpr std::chrono::microseconds kBurstDelay(100);
+// A thread writes so often at most for what others append meanwhile.
+constexpr unsigned kMostWrites = 64;
 // The kernel is short of memory or of room for descriptors under way.
 constexpr std::chrono::milliseconds kShortageDelay(10);
 // Buffers that grew beyond this are not kept by their thread.
@@ -174,8 +176,9 @@ int peer_connection::accept(vox_wire::encoded& made, frame_type kind, waiting_re
 bool peer_connection::has_room(std::size_t size, unsigned times) const {
     const std::size_t bytes = out_.bytes() + early_bytes_;
     const std::uint64_t messages = out_.messages() + early_.size();
-    return messages == 0 || (bytes + size <= std::uint64_t{times} * limits_.max_queued_bytes &&
-                             messages < std::uint64_t{times} * limits_.max_queued_messages);
+    return (out_.empty() && early_.empty()) ||
+           (bytes + size <= std::uint64_t{times} * limits_.max_queued_bytes &&
+            messages < std::uint64_t{times} * limits_.max_queued_messages);
 }
 
 int peer_connection::admit(frame_type kind, std::size_t size) {
@@ -251,8 +254,8 @@ bool peer_connection::defer() {
             turn->add(this);
         return true;
     }
-    if (burst && !flush_armed_)
-        arm_flush();
+    if (burst)
+        arm_flush(kBurstDelay);
     return burst;
 }
 
@@ -273,11 +276,11 @@ bool peer_connection::is_burst() {
     return run_ > kBurstSends;
 }
 
-void peer_connection::arm_flush() {
-    flush_armed_ = true;
+void peer_connection::arm_flush(std::chrono::microseconds delay) {
+    if (std::exchange(flush_armed_, true))
+        return;
     hold();
-    dispatch::queue::global().after(dispatch::time::after(kBurstDelay),
-                                    dispatch::block<void()>([this] {
+    dispatch::queue::global().after(dispatch::time::after(delay), dispatch::block<void()>([this] {
                                         {
                                             const lock_guard guard(lock_);
                                             flush_armed_ = false;
@@ -331,7 +334,11 @@ void peer_connection::write_through(vox_wire::encoded& made, frame_type kind) {
 void peer_connection::write_waiting() {
     const int fd = fd_.load(std::memory_order_relaxed);
     writing_ = true;
-    while (!out_.empty() && !abandoned_ && !blocked_ && !broken_) {
+    for (unsigned round = 0; !out_.empty() && !abandoned_ && !blocked_ && !broken_; ++round) {
+        if (round == kMostWrites) {
+            arm_flush({});
+            break;
+        }
         output_batch batch;
         out_.gather(batch);
         lock_.unlock();

@@ -9,8 +9,8 @@
 // The requests of one connection that wait for their replies.
 //
 // Owner:   one connection, under its mutex.
-// Cost:    ids count up, so their low bits spread them over the slots evenly;
-//          no allocation while the number of outstanding requests is usual.
+// Cost:    a few slots are looked at for each request and reply; no allocation
+//          while the number of outstanding requests is usual.
 namespace vox_link {
 
 using reply_block = dispatch::block<void(vox_object_t)>;
@@ -32,8 +32,10 @@ class reply_table {
     [[nodiscard]] std::size_t size() const noexcept { return used_; }
 
   private:
+    // Ids count up: they must not lie side by side, because a gap among them is
+    // closed by looking at all that follow without one (Fibonacci hashing).
     [[nodiscard]] std::size_t home(std::uint64_t id) const noexcept {
-        return static_cast<std::size_t>(id) & (slots_.size() - 1);
+        return static_cast<std::size_t>((id * 0x9E3779B97F4A7C15u) >> 32) & (slots_.size() - 1);
     }
     [[nodiscard]] std::size_t after(std::size_t slot) const noexcept {
         return (slot + 1) & (slots_.size() - 1);
