@@ -3,11 +3,14 @@
 #include <array>
 #include <cstddef>
 
+#include "plr/ipc/values.h"
+
 namespace plr::rest {
 namespace {
 
 // In the order of Operation.
-constexpr std::array<const char*, 7> kNames = {"?", "set", "get", "push", "pop", "notify", "ping"};
+constexpr std::array<std::string_view, 7> kNames = {"?",   "set",    "get", "push",
+                                                    "pop", "notify", "ping"};
 
 constexpr std::size_t indexOf(Operation operation) noexcept {
     const auto index = static_cast<std::size_t>(operation);
@@ -16,17 +19,16 @@ constexpr std::size_t indexOf(Operation operation) noexcept {
 
 }  // namespace
 
-Operation asOperation(const vox::object& value) noexcept {
-    const std::string_view text = value.text();
+Operation asOperation(std::string_view text) noexcept {
     for (const Operation known : {Operation::kGet, Operation::kSet, Operation::kPush,
                                   Operation::kPop, Operation::kNotify, Operation::kPing})
-        if (text == asString(known))
+        if (text == kNames[indexOf(known)])
             return known;
     return Operation::kNone;
 }
 
 const char* asString(Operation operation) noexcept {
-    return kNames[indexOf(operation)];
+    return kNames[indexOf(operation)].data();
 }
 
 const vox::object& asObject(Operation operation) {
@@ -34,7 +36,7 @@ const vox::object& asObject(Operation operation) {
     static const auto& objects = *[] {
         auto* made = new std::array<vox::object, kNames.size()>();
         for (std::size_t i = 1; i < kNames.size(); ++i)
-            (*made)[i] = vox::object::adopt(vox_string_create(kNames[i]));
+            (*made)[i] = vox::string(kNames[i]);
         return made;
     }();
     return objects[indexOf(operation)];

@@ -207,7 +207,7 @@ bool PropertyRestResource::handleMessage_Resource_SET(RestResourceContext& conte
     if (keepValues_)
         entry->value = value;
     // Hot path: the path's text is made once for all watchers;
-    // bench/fanout_bench.cpp.
+    // bench/fanout_pelorin.cpp.
     if (entry->watchers.hasWatchers())
         notifyWatchers(context, entry->watchers, asText(path_join(path.head(), name)), value);
     return true;

@@ -150,12 +150,12 @@ void RestModuleState::handleServerError(const vox::object& error) {
         handler(error);
 }
 
-// Hot path: no copy of the path, one count on the handler.
+// Hot path: no copy of the path, one count on the handler;
+// bench/fanout_pelorin.cpp.
 bool RestModuleState::handleNotify_sync(const vox::dict& message) {
-    if (rest::asOperation(message[rest::key::kOperation]) != Operation::kNotify)
+    if (rest::asOperation(message.text(rest::key::kOperation)) != Operation::kNotify)
         return false;
-    const vox::object resource = message[rest::key::kResource];
-    const auto found = subscriptions_->find(resource.text());
+    const auto found = subscriptions_->find(message.text(rest::key::kResource));
     if (found == subscriptions_->end())
         return false;
     const std::shared_ptr<const Handler> handler = found->second;
@@ -164,11 +164,12 @@ bool RestModuleState::handleNotify_sync(const vox::dict& message) {
 }
 
 bool RestModuleState::handleRequest_sync(const vox::dict& message) {
-    if (!requestHandlers_ || rest::asOperation(message[rest::key::kOperation]) != Operation::kGet)
+    if (!requestHandlers_ ||
+        rest::asOperation(message.text(rest::key::kOperation)) != Operation::kGet)
         return false;
-    const vox::object resource = message[rest::key::kResource];
-    const auto found = requestHandlers_->find(resource.text());
-    if (resource.text().empty() || found == requestHandlers_->end())
+    const std::string_view path = message.text(rest::key::kResource);
+    const auto found = requestHandlers_->find(path);
+    if (path.empty() || found == requestHandlers_->end())
         return false;
     const std::shared_ptr<const RequestHandler> handler = found->second;
     (*handler)(message[rest::key::kValue], rest::createAutoReplyValue(message));

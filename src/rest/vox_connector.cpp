@@ -22,7 +22,7 @@ void VoxConnector::sendWithReply(Operation operation, std::string_view path,
 }
 
 bool VoxConnector::handlePing(const vox::dict& message) const {
-    if (asOperation(message[key::kOperation]) != Operation::kPing)
+    if (asOperation(message.text(key::kOperation)) != Operation::kPing)
         return false;
     if (const vox::dict reply = createReply(message))
         helper_.getServer().send_message(reply);

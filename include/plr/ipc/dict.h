@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <string_view>
 #include <utility>
 
 #include "plr/ipc/array.h"
@@ -28,6 +29,10 @@ class PLR_EXPORT dict : public object {
     [[nodiscard]] bool contains(const char* key) const noexcept {
         return vox_dictionary_get_value(get(), key) != nullptr;
     }
+    // The bytes of the string under `key`, lent by it; empty for every other type
+    // and when the key is missing. Counts nothing, unlike a copy of the entry.
+    [[nodiscard]] std::string_view text(const char* key) const noexcept;
+    using object::text;
     // The entry under `key` (NUL-terminated, lent for the proxy's life), to read
     // or to assign. On the null object reads give null, assignments do nothing.
     [[nodiscard]] object_proxy operator[](const char* key) const noexcept;

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <string_view>
+
 #include "plr/base/export.h"
 #include "plr/ipc/object.h"
 
@@ -18,7 +20,10 @@ enum class Operation : int {
 };
 
 // Exact and case-sensitive; kNone for everything that is no operation.
-[[nodiscard]] PLR_EXPORT Operation asOperation(const vox::object& value) noexcept;
+[[nodiscard]] PLR_EXPORT Operation asOperation(std::string_view text) noexcept;
+[[nodiscard]] inline Operation asOperation(const vox::object& value) noexcept {
+    return asOperation(value.text());
+}
 // "set", "get", "push", "pop", "notify", "ping"; "?" for everything else.
 [[nodiscard]] PLR_EXPORT const char* asString(Operation operation) noexcept;
 // The same as a Vox string, made once; the null object for kNone and unknown.

@@ -48,10 +48,9 @@ class RestServerBase : public SharedSynchronizable<Server> {
     bool handleRestMessage(const vox::connection&, const vox::dict& message) {
         this->ownQueue_.assertCurrent();
         RestResourceContextDelegater<Server> context(message, self());
-        // Something that is no string reads as the root. The message keeps
-        // the text.
-        const vox::object resource = message[key::kResource];
-        return root_->handleMessage(context, PathView(resource.text()));
+        // Something that is no string reads as the root. The context's copy of the
+        // message keeps the text.
+        return root_->handleMessage(context, PathView(message.text(key::kResource)));
     }
 
     // A message of a client; ignored without an "r". No message ends the
