@@ -94,7 +94,8 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/peer_connection.cpp
     platform/linux/vox/peer_connection.h
     platform/linux/vox/peer_input.cpp
-    platform/linux/vox/peer_output.cpp
+    platform/linux/vox/peer_send.cpp
+    platform/linux/vox/peer_write.cpp
     platform/linux/vox/read_memory.cpp
     platform/linux/vox/read_memory.h
     platform/linux/vox/reply_table.cpp

@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "support/vox_test.h"
+#include "support/vox_raw_peer.h"
 
 namespace {
 

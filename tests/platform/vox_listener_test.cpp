@@ -12,7 +12,8 @@
 #include <vector>
 
 #include "platform/linux/vox/value_layout.h"
-#include "support/vox_test.h"
+#include "support/vox_raw_peer.h"
+#include "support/vox_service.h"
 
 namespace {
 

@@ -12,7 +12,7 @@
 #include <string>
 #include <vector>
 
-#include "support/vox_test.h"
+#include "support/vox_service.h"
 
 namespace {
 

@@ -27,6 +27,13 @@ struct codec_limits {
     std::size_t bytes = 16u << 20;
     unsigned depth = 64;        // nested arrays and dictionaries; 64 at most
     unsigned descriptors = 64;  // 64 at most
+
+    // Elements of all arrays and dictionaries together. A value takes up to 72
+    // bytes of memory and perhaps a single one on the wire: this keeps a message
+    // of 16 MiB from becoming more than a gigabyte.
+    [[nodiscard]] constexpr std::size_t elements() const noexcept {
+        return bytes / 8 > 4096 ? bytes / 8 : 4096;
+    }
 };
 
 // Appends `value` to `out.bytes`. Returns 0, or an error number with `out` as

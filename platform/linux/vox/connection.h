@@ -114,8 +114,7 @@ class connection : public vox_custom_object {
     std::atomic<bool> ending_{false};
     std::atomic<bool> scheduled_{false};
     std::unique_ptr<ending> why_ PLR_GUARDED_BY(lock_);
-    bool ended_ PLR_CONFINED_TO(queue_role_)
-    = false;
+    bool ended_ PLR_GUARDED_BY(queue_role_) = false;
     turn_item turn_;
 };
 

@@ -27,7 +27,8 @@ class decoder {
           descriptors_(descriptors),
           descriptor_limit_(std::min<std::size_t>(limits.descriptors, kMostDescriptors)),
           depth_limit_(std::min(limits.depth, kMostDepth)),
-          byte_limit_(limits.bytes) {}
+          byte_limit_(limits.bytes),
+          elements_left_(limits.elements()) {}
 
     vox_object* run(const char*& why) noexcept {
         vox_object* root = read_root();
@@ -260,19 +261,31 @@ class decoder {
     // ---- Containers --------------------------------------------------------------
 
     vox_object* open_array(std::uint64_t count) noexcept {
-        if (count > UINT32_MAX || !fits(count))
-            return fail("the body is shorter than its values declare");
+        if (!admits(count, count))
+            return nullptr;
         vox_array_object* array = make_array(inline_room(count));
         reserve(*array, static_cast<std::uint32_t>(count));
         return open(array, count, count);
     }
 
     vox_object* open_dictionary(std::uint64_t count) noexcept {
-        if (count > UINT32_MAX || !fits(2 * count))
-            return fail("the body is shorter than its values declare");
+        if (!admits(count, 2 * count))
+            return nullptr;
         vox_dictionary_object* dictionary = make_dictionary(inline_room(count));
         reserve(*dictionary, static_cast<std::uint32_t>(count));
         return open(dictionary, count, 2 * count);
+    }
+
+    // Whether a container of `count` elements may be made.
+    bool admits(std::uint64_t count, std::uint64_t least_bytes) noexcept {
+        if (count > UINT32_MAX)
+            return refuse("the body is shorter than its values declare");
+        if (!fits(least_bytes))
+            return false;
+        if (count > elements_left_)
+            return refuse("more values than this end accepts");
+        elements_left_ -= static_cast<std::size_t>(count);
+        return true;
     }
 
     // Small containers lie in one piece; see make_array().
@@ -409,6 +422,7 @@ class decoder {
     const std::size_t descriptor_limit_;
     const unsigned depth_limit_;
     const std::size_t byte_limit_;
+    std::size_t elements_left_;  // that containers may still declare
     const char* why_ = nullptr;  // null while all is well
     std::size_t adopted_ = 0;    // descriptors that values own by now, the first ones
     std::size_t owed_ = 0;       // bytes

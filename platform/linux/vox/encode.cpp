@@ -119,7 +119,8 @@ class encoder {
     // An element takes a byte at least. Checked at every container, since one
     // that stands in a value many times may swell it beyond all bounds.
     int open(major kind, vox_container_object* object) {
-        if (depth_ == depth_limit_ ||
+        elements_ += object->count;
+        if (depth_ == depth_limit_ || elements_ > limits_.elements() ||
             out_.bytes.size() - first_byte_ + object->count > limits_.bytes)
             return EMSGSIZE;
         open_[depth_++] = {object, 0};
@@ -209,6 +210,7 @@ class encoder {
     encoded& out_;
     const std::size_t first_byte_;        // where this value begins in `out_`
     const std::size_t first_descriptor_;  // the same for descriptors
+    std::size_t elements_ = 0;            // of all containers begun
     unsigned depth_ = 0;
     container open_[kMostDepth];  // containers begun and not ended, outermost first
 };

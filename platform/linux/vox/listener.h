@@ -32,11 +32,9 @@ class listener final : public connection {
 
   protected:
     void start() override;
-    void turn() PLR_ON(queue_role_)
-    override;
+    void turn() PLR_REQUIRES(queue_role_) override;
     void cut_off() PLR_REQUIRES(lock_) override;
-    void wind_up(vox_object_t error) PLR_ON(queue_role_)
-    override;
+    void wind_up(vox_object_t error) PLR_REQUIRES(queue_role_) override;
     [[nodiscard]] std::string title() override;
 
   private:
@@ -75,11 +73,9 @@ class listener final : public connection {
     std::list<std::unique_ptr<gate>> gates_ PLR_GUARDED_BY(lock_);
     bool opened_ PLR_GUARDED_BY(lock_) = false;
     bool closed_ PLR_GUARDED_BY(lock_) = false;
-    std::deque<gate*> ready_ PLR_CONFINED_TO(queue_role_);
-    bool paused_ PLR_CONFINED_TO(queue_role_)
-    = false;
-    int reserve_ PLR_CONFINED_TO(queue_role_)
-    = -1;
+    std::deque<gate*> ready_ PLR_GUARDED_BY(queue_role_);
+    bool paused_ PLR_GUARDED_BY(queue_role_) = false;
+    int reserve_ PLR_GUARDED_BY(queue_role_) = -1;
 };
 
 }  // namespace vox_link

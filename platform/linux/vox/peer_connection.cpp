@@ -164,7 +164,7 @@ void peer_connection::wind_up(vox_object_t error) {
         incomplete_timer_.cancel();
     incomplete_timer_ = {};
     std::vector<waiting_reply> replies;
-    std::deque<waiting_barrier> barriers;
+    std::list<waiting_barrier> barriers;
     {
         const lock_guard guard(lock_);
         wound_up_ = true;

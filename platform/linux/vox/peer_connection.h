@@ -4,7 +4,7 @@
 
 #include <chrono>
 #include <cstdint>
-#include <deque>
+#include <list>
 #include <span>
 #include <string>
 #include <vector>
@@ -20,7 +20,7 @@
 // A connection to one peer.
 //
 // Files:   peer_connection.cpp connects and ends, peer_input.cpp reads and
-//          delivers, peer_output.cpp sends.
+//          delivers, peer_send.cpp takes what is to be sent, peer_write.cpp writes it.
 // Threads: everything received is read, decoded and delivered on the target
 //          queue. Senders encode on their own thread without the lock; then one
 //          of them writes at a time, without the lock, and takes along what the
@@ -62,11 +62,9 @@ class peer_connection final : public connection {
 
   protected:
     void start() override;
-    void turn() PLR_ON(queue_role_)
-    override;
+    void turn() PLR_REQUIRES(queue_role_) override;
     void cut_off() PLR_REQUIRES(lock_) override;
-    void wind_up(vox_object_t error) PLR_ON(queue_role_)
-    override;
+    void wind_up(vox_object_t error) PLR_REQUIRES(queue_role_) override;
     [[nodiscard]] std::string title() override;
 
   private:
@@ -103,7 +101,7 @@ class peer_connection final : public connection {
     void limit_incomplete_frame() PLR_ON(queue_role_);
     void incomplete_frame_due();
 
-    // peer_output.cpp
+    // peer_send.cpp
     [[nodiscard]] int send(vox_object_t message, frame_type kind, std::uint64_t id,
                            waiting_reply* reply);
     [[nodiscard]] int accept(vox_wire::encoded& made, frame_type kind, waiting_reply* reply)
@@ -111,6 +109,13 @@ class peer_connection final : public connection {
     [[nodiscard]] int admit(frame_type kind, std::size_t size) PLR_REQUIRES(lock_);
     [[nodiscard]] bool has_room(std::size_t size, unsigned times) const PLR_REQUIRES(lock_);
     void send_control(frame_type kind, std::uint8_t marks, std::uint64_t id, vox_object_t value);
+    [[nodiscard]] bool is_finished(const waiting_barrier& barrier) const PLR_REQUIRES(lock_);
+    void run_finished_barriers() PLR_REQUIRES(lock_);
+    void greet(const vox_wire::codec_limits& peer);
+    [[nodiscard]] bool fit_to_peer(vox_wire::encoded& made) PLR_REQUIRES(lock_);
+    void give_up(vox_wire::encoded& made) PLR_REQUIRES(lock_);
+
+    // peer_write.cpp
     void put(vox_wire::encoded& made, frame_type kind) PLR_REQUIRES(lock_);
     void tell_dropped() PLR_REQUIRES(lock_);
     [[nodiscard]] bool defer() PLR_REQUIRES(lock_);
@@ -126,11 +131,6 @@ class peer_connection final : public connection {
     void finish_writing() PLR_REQUIRES(lock_);
     void unblock();
     void retry_later() PLR_REQUIRES(lock_);
-    void greet(const vox_wire::codec_limits& peer);
-    [[nodiscard]] bool fit_to_peer(vox_wire::encoded& made) PLR_REQUIRES(lock_);
-    void give_up(vox_wire::encoded& made) PLR_REQUIRES(lock_);
-    [[nodiscard]] bool is_finished(const waiting_barrier& barrier) const PLR_REQUIRES(lock_);
-    void run_finished_barriers() PLR_REQUIRES(lock_);
 
     const vox_limits_t limits_;
     const vox_wire::codec_limits accepts_;  // what this side decodes
@@ -141,20 +141,14 @@ class peer_connection final : public connection {
     ucred credentials_ PLR_GUARDED_BY(lock_) = {-1, static_cast<uid_t>(-1), static_cast<gid_t>(-1)};
 
     // Receiving.
-    frame_reader reader_ PLR_CONFINED_TO(queue_role_);
-    bool readable_ PLR_CONFINED_TO(queue_role_)
-    = false;
-    bool hung_up_ PLR_CONFINED_TO(queue_role_)
-    = false;  // an end of file is to be read
-    bool greeted_by_peer_ PLR_CONFINED_TO(queue_role_)
-    = false;
-    bool watch_over_ PLR_CONFINED_TO(queue_role_)
-    = false;  // one call still comes
-    dispatch::source incomplete_timer_ PLR_CONFINED_TO(queue_role_);
-    bool incomplete_armed_ PLR_CONFINED_TO(queue_role_)
-    = false;
-    std::int64_t incomplete_since_ PLR_CONFINED_TO(queue_role_)
-    = 0;  // ns; 0: no frame begun
+    frame_reader reader_ PLR_GUARDED_BY(queue_role_);
+    bool readable_ PLR_GUARDED_BY(queue_role_) = false;
+    bool hung_up_ PLR_GUARDED_BY(queue_role_) = false;  // an end of file is to be read
+    bool greeted_by_peer_ PLR_GUARDED_BY(queue_role_) = false;
+    bool watch_over_ PLR_GUARDED_BY(queue_role_) = false;  // one call still comes
+    dispatch::source incomplete_timer_ PLR_GUARDED_BY(queue_role_);
+    bool incomplete_armed_ PLR_GUARDED_BY(queue_role_) = false;
+    std::int64_t incomplete_since_ PLR_GUARDED_BY(queue_role_) = 0;  // ns; 0: no frame begun
     std::atomic<std::uint64_t> messages_received_{0};
     std::atomic<std::uint64_t> peer_dropped_{0};
 
@@ -175,9 +169,9 @@ class peer_connection final : public connection {
     unsigned run_ PLR_GUARDED_BY(lock_) = 0;            // sends in close succession
     std::int64_t last_send_ PLR_GUARDED_BY(lock_) = 0;  // ns; 0: not known
     output out_ PLR_GUARDED_BY(lock_);
-    std::deque<vox_wire::encoded> early_ PLR_GUARDED_BY(lock_);  // wait for the peer's hello
+    std::list<vox_wire::encoded> early_ PLR_GUARDED_BY(lock_);  // wait for the peer's hello
     std::size_t early_bytes_ PLR_GUARDED_BY(lock_) = 0;
-    std::deque<waiting_barrier> barriers_ PLR_GUARDED_BY(lock_);
+    std::list<waiting_barrier> barriers_ PLR_GUARDED_BY(lock_);
     reply_table replies_ PLR_GUARDED_BY(lock_);
     std::uint64_t last_id_ PLR_GUARDED_BY(lock_) = 0;
     std::uint64_t dropped_ PLR_GUARDED_BY(lock_) = 0;
