@@ -23,7 +23,7 @@
 // Order:   two submissions of one thread run in that order; what a submitter
 //          wrote before it is seen by the work.
 // Cost:    async() is one recycled node and one atomic exchange, without a
-//          system call unless a worker has to be woken (bench/dispatch_bench.cpp);
+//          system call unless a worker has to be woken (bench/dispatch_cases.h);
 //          an idle queue holds no thread and less than 256 bytes plus its label.
 //
 // A queue may have a target: its work then runs as part of the target's, so

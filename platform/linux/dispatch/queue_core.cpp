@@ -158,7 +158,7 @@ void queue_core::stop(const char* why) const noexcept {
 
 // ---- The list -----------------------------------------------------------------------
 
-// Hot path: one exchange; bench/dispatch_bench.cpp.
+// Hot path: one exchange; bench/dispatch_cases.h.
 void queue_core::push(item* work) noexcept {
     work->next.store(nullptr, std::memory_order_relaxed);
     item* previous = tail_.exchange(work, std::memory_order_acq_rel);
@@ -295,7 +295,7 @@ bool queue_core::try_lock() noexcept {
 }
 
 // Hot path when idle: one compare-exchange to enter and one to leave;
-// bench/dispatch_bench.cpp.
+// bench/dispatch_cases.h.
 void queue_core::run_sync(void (*function)(void*) noexcept, void* context) {
     frame here(this);
     if (global_) {

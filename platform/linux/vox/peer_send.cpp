@@ -222,9 +222,9 @@ bool peer_connection::fit_to_peer(vox_wire::encoded& made) {
     const std::size_t body = made.bytes.size() - kHeaderBytes;
     if (body > peer_accepts_.bytes || made.descriptors.size() > peer_accepts_.descriptors)
         return false;
-    if (accepts_.depth <= peer_accepts_.depth)
+    if (accepts_.depth <= peer_accepts_.depth && accepts_.bytes <= peer_accepts_.bytes)
         return true;
-    // Only encoding tells the depth.
+    // Only encoding tells the depth and the number of elements.
     const char* why = nullptr;
     const frame_header header = read_own_header(made.bytes.data());
     const vox_object_t message =
