@@ -245,6 +245,14 @@ TEST(VoxCodecRefusal, MemoryIsAtMostAHundredTimesTheBytes) {
         ASSERT_NE(value, nullptr);
         EXPECT_LT(allocated() - before, 100 * size) << std::hex << unsigned{item};
     }
+    // More elements than memory shall be spent on, although the bytes would do.
+    vox_wire::codec_limits few;
+    few.bytes = size;
+    const char* why = nullptr;
+    EXPECT_EQ(vox_wire::decode(array_of(0xa0), {}, few, why), nullptr);
+    EXPECT_STREQ(why, "more values than this end accepts");
+    vox_wire::encoded out;
+    EXPECT_EQ(vox_wire::encode(decoded(array_of(0)).get(), few, out), EMSGSIZE);
     // 64 arrays that each promise to be as long as what is left.
     bytes liars;
     for (int i = 0; i < 63; i++)

@@ -44,7 +44,8 @@ typedef enum vox_overflow_policy {
 } vox_overflow_policy_t;
 
 typedef struct vox_limits {
-    uint32_t max_message_bytes;    // body of one message; default 16 MiB, at most 1 GiB
+    uint32_t max_message_bytes;    // body of one message; default 16 MiB, at most 1 GiB. An eighth
+                                   // of it is the limit for the values in one message
     uint32_t max_depth;            // nested arrays and dictionaries; default and most 64
     uint32_t max_descriptors;      // in one message; default and most 64
     uint32_t max_queued_bytes;     // waiting for a peer that does not read; default 16 MiB

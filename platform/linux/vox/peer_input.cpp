@@ -136,8 +136,7 @@ void peer_connection::read_failed(int error) {
              reader_.in_frame() ? "the peer closed the connection in the middle of a frame"
                                 : "the peer closed the connection");
     else
-        fail(VOX_ERROR_CONNECTION_INVALID,
-             std::string("cannot read: ") + ::strerrordesc_np(error));
+        fail(VOX_ERROR_CONNECTION_INVALID, std::string("cannot read: ") + ::strerrordesc_np(error));
 }
 
 void peer_connection::violation(std::string reason) {

@@ -1,5 +1,6 @@
 #include "platform/linux/vox/send_turn.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "dispatch/time.h"
@@ -8,7 +9,17 @@
 namespace vox_link {
 namespace {
 
-constexpr std::int64_t kLongestDelay = 100'000;  // ns
+// How long frames may wait for others of the turn: 100 µs; with many receivers
+// about as long as writing to each of them will take, so that an update to a
+// thousand of them is not written before the next one is known.
+constexpr std::int64_t kDelay = 100'000;             // ns
+constexpr std::int64_t kDelayForEachSender = 1'000;  // ns
+constexpr std::int64_t kLongestDelay = 1'000'000;    // ns
+
+std::int64_t delay_for(std::size_t senders) noexcept {
+    return std::clamp(static_cast<std::int64_t>(senders) * kDelayForEachSender, kDelay,
+                      kLongestDelay);
+}
 
 thread_local send_turn* current = nullptr;
 // The memory of the last turn's list.
@@ -39,7 +50,8 @@ void send_turn::add(peer_connection* sender) {
 }
 
 void send_turn::flush_if_due() {
-    if (!senders_.empty() && dispatch::time::now().nanoseconds() - began_ >= kLongestDelay)
+    if (!senders_.empty() &&
+        dispatch::time::now().nanoseconds() - began_ >= delay_for(senders_.size()))
         flush();
 }
 

@@ -10,8 +10,8 @@
 //
 // While more messages of the batch wait, frames for connections of the same
 // queue are put together, and written at the end of the turn or 100 µs after
-// its begin: a burst of requests is answered with few system calls, a lone
-// request at once (bench/vox_bench.cpp).
+// its begin (at most 1 ms when they go to many): a burst of requests is answered
+// with few system calls, a lone request at once (bench/vox_cases.h).
 namespace vox_link {
 
 class peer_connection;
