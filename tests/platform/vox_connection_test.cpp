@@ -181,6 +181,31 @@ TEST_F(VoxConnection, CountsWhatWentThrough) {
     EXPECT_EQ(counts.queued_bytes, 0u);
 }
 
+TEST_F(VoxConnection, WhatAHandlerSentLeavesWhileItBlocks) {
+    Event answered;
+    const dispatch::block<void(vox_object_t)> blocks([&](vox_object_t event) {
+        rightInbox.add(event);
+        if (vox_get_type(event) == VOX_TYPE_DICTIONARY && numberIn(event) == 0) {
+            EXPECT_EQ(vox_connection_send_message(right, message(1)), 0);
+            EXPECT_TRUE(answered.wait()) << "kept for the end of the turn";
+        }
+    });
+    const dispatch::block<void(vox_object_t)> answers([&](vox_object_t event) {
+        leftInbox.add(event);
+        answered.signal();
+    });
+    // More messages wait behind the one whose handler blocks.
+    for (std::int64_t n = 0; n < 10; ++n)
+        EXPECT_EQ(vox_connection_send_message(left, message(n)), 0);
+    leftResumed = rightResumed = true;
+    vox_connection_set_event_handler(left, &answers);
+    vox_connection_resume(left);
+    vox_connection_set_event_handler(right, &blocks);
+    vox_connection_resume(right);
+    ASSERT_TRUE(rightInbox.wait(10));
+    EXPECT_EQ(rightInbox.numbers(), upTo(10));
+}
+
 // ---- Suspending -----------------------------------------------------------------------
 
 TEST_F(VoxConnection, WhileSuspendedNothingIsDelivered) {

@@ -113,7 +113,7 @@ class peer_connection final : public connection {
     void run_finished_barriers() PLR_REQUIRES(lock_);
     void greet(const vox_wire::codec_limits& peer);
     [[nodiscard]] bool fit_to_peer(vox_wire::encoded& made) PLR_REQUIRES(lock_);
-    void give_up(vox_wire::encoded& made) PLR_REQUIRES(lock_);
+    [[nodiscard]] std::size_t give_up(vox_wire::encoded& made) PLR_REQUIRES(lock_);
 
     // peer_write.cpp
     void put(vox_wire::encoded& made, frame_type kind) PLR_REQUIRES(lock_);

@@ -193,28 +193,34 @@ void peer_connection::send_control(frame_type kind, std::uint8_t marks, std::uin
 // ---- The peer's hello ---------------------------------------------------------------
 
 void peer_connection::greet(const vox_wire::codec_limits& peer) {
-    const lock_guard guard(lock_);
-    peer_accepts_ = peer;
-    std::uint64_t moved = 0;
-    auto barrier = barriers_.begin();
-    const auto place_barriers = [&]() PLR_REQUIRES(lock_) {
-        for (; barrier != barriers_.end() && barrier->behind <= moved; ++barrier)
-            barrier->behind = out_.accepted();
-    };
-    place_barriers();
-    for (vox_wire::encoded& waiting : early_) {
-        if (fit_to_peer(waiting))
-            out_.append(waiting);
-        else
-            give_up(waiting);
-        ++moved;
+    std::vector<std::size_t> given_up;
+    {
+        const lock_guard guard(lock_);
+        peer_accepts_ = peer;
+        std::uint64_t moved = 0;
+        auto barrier = barriers_.begin();
+        const auto place_barriers = [&]() PLR_REQUIRES(lock_) {
+            for (; barrier != barriers_.end() && barrier->behind <= moved; ++barrier)
+                barrier->behind = out_.accepted();
+        };
         place_barriers();
+        for (vox_wire::encoded& waiting : early_) {
+            if (fit_to_peer(waiting))
+                out_.append(waiting);
+            else
+                given_up.push_back(give_up(waiting));
+            ++moved;
+            place_barriers();
+        }
+        early_.clear();
+        early_bytes_ = 0;
+        greeted_.store(true, std::memory_order_release);
+        if (can_write())
+            write_waiting();
     }
-    early_.clear();
-    early_bytes_ = 0;
-    greeted_.store(true, std::memory_order_release);
-    if (can_write())
-        write_waiting();
+    for (const std::size_t bytes : given_up)
+        complain("a message of " + std::to_string(bytes) + " bytes to '" + name() +
+                 "' is over its limits and was not sent");
 }
 
 // Whether the peer accepts what was encoded before its limits were known.
@@ -239,16 +245,16 @@ bool peer_connection::fit_to_peer(vox_wire::encoded& made) {
     return error == 0;
 }
 
-void peer_connection::give_up(vox_wire::encoded& made) {
+// Returns the size of its body.
+std::size_t peer_connection::give_up(vox_wire::encoded& made) {
     const frame_header header = read_own_header(made.bytes.data());
     if (header.type == frame_type::request) {
         if (waiting_reply reply = replies_.take(header.id); reply.id != 0)
             fail_request(std::move(reply), EMSGSIZE);
     }
     ++dropped_;
-    complain("a message of " + std::to_string(header.length) + " bytes to '" + name() +
-             "' is over its limits and was not sent");
     discard(made);
+    return header.length;
 }
 
 }  // namespace vox_link

@@ -1,8 +1,6 @@
 #pragma once
 
-#include <cstddef>
 #include <cstdint>
-#include <vector>
 
 #include "dispatch/queue.h"
 
@@ -10,8 +8,9 @@
 //
 // While more messages of the batch wait, frames for connections of the same
 // queue are put together, and written at the end of the turn or 100 µs after
-// its begin (at most 1 ms when they go to many): a burst of requests is answered
-// with few system calls, a lone request at once (bench/vox_cases.h).
+// the first: a burst of requests is answered with few system calls, a lone
+// request at once (bench/vox_bench.cpp). When a handler takes long or blocks,
+// another thread writes them after a millisecond or two.
 namespace vox_link {
 
 class peer_connection;
@@ -23,7 +22,7 @@ class send_turn {
     send_turn(const send_turn&) = delete;
     send_turn& operator=(const send_turn&) = delete;
 
-    // The innermost turn of the calling thread on `queue`, or null.
+    // The innermost turn of the calling thread, if it is on `queue`, or null.
     [[nodiscard]] static send_turn* on(dispatch::detail::queue_core* queue) noexcept;
 
     // Whether the turn delivers more messages after this one.
@@ -40,8 +39,7 @@ class send_turn {
     dispatch::detail::queue_core* queue_;
     send_turn* outer_;
     bool has_more_ = false;
-    std::int64_t began_ = 0;  // ns, when the first sender was added
-    std::vector<peer_connection*> senders_;
+    std::int64_t began_ = 0;  // ns, when the first sender was added; 0: none was
 };
 
 }  // namespace vox_link
