@@ -125,8 +125,8 @@ TEST_F(VoxProcess, ProcessesKnowEachOtherAndExchangeMessages) {
     EXPECT_EQ(vox_connection_get_pid(client.connection()), service.pid());
     Inbox replies;
     for (std::int64_t n = 0; n < 1000; ++n)
-        plr::test::request(client.connection(), message(n, static_cast<std::size_t>(n * 30)),
-                           queue, replies);
+        plr::test::request(client.connection(), message(n, static_cast<std::size_t>(n * 30)), queue,
+                           replies);
     ASSERT_TRUE(replies.wait(1000));
     const std::vector<std::int64_t> numbers = replies.numbers();
     ASSERT_EQ(numbers.size(), 1000u);
