@@ -1,0 +1,63 @@
+#pragma once
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstdio>
+#include <filesystem>
+#include <string>
+
+// A test program that is its own service: started with the argument "service"
+// it serves, says so by serviceIsReady() and runs until it is killed.
+namespace plr::test {
+
+// In the service: it can be reached now. Never returns.
+[[noreturn]] inline void serviceIsReady() {
+    std::puts("ready");
+    std::fflush(stdout);
+    for (;;)
+        ::pause();
+}
+
+// A running service process of this program; killed at the end.
+class ServiceProcess {
+  public:
+    // Returns when the service is ready.
+    ServiceProcess() {
+        std::string program = std::filesystem::read_symlink("/proc/self/exe").string();
+        std::string role = "service";
+        char* arguments[] = {program.data(), role.data(), nullptr};
+        int ends[2];
+        EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
+        posix_spawn_file_actions_t actions;
+        posix_spawn_file_actions_init(&actions);
+        posix_spawn_file_actions_adddup2(&actions, ends[1], STDOUT_FILENO);
+        EXPECT_EQ(::posix_spawn(&pid_, program.c_str(), &actions, nullptr, arguments, environ), 0);
+        posix_spawn_file_actions_destroy(&actions);
+        ::close(ends[1]);
+        char byte = 0;
+        EXPECT_EQ(::read(ends[0], &byte, 1), 1) << "the service did not start";
+        ::close(ends[0]);
+    }
+    ~ServiceProcess() { kill(); }
+    ServiceProcess(const ServiceProcess&) = delete;
+    ServiceProcess& operator=(const ServiceProcess&) = delete;
+
+    // Ends it at once, without a chance to say anything.
+    void kill() {
+        if (pid_ <= 0)
+            return;
+        ::kill(pid_, SIGKILL);
+        EXPECT_EQ(::waitpid(pid_, nullptr, 0), pid_);
+        pid_ = -1;
+    }
+
+  private:
+    pid_t pid_ = -1;
+};
+
+}  // namespace plr::test
