@@ -191,8 +191,10 @@ TEST_F(VoxConnection, WhatAHandlerSentLeavesWhileItBlocks) {
         }
     });
     const dispatch::block<void(vox_object_t)> answers([&](vox_object_t event) {
-        leftInbox.add(event);
-        answered.signal();
+        if (vox_get_type(event) == VOX_TYPE_DICTIONARY)
+            answered.signal();
+        else
+            leftInbox.add(event);
     });
     // More messages wait behind the one whose handler blocks.
     for (std::int64_t n = 0; n < 10; ++n)
