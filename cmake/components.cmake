@@ -159,6 +159,7 @@ pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
     include/plr/rest/auto_reply.h
     include/plr/rest/message.h
     include/plr/rest/operation.h
+    include/plr/rest/path_map.h
     include/plr/rest/value_coding.h
   SOURCES
     src/rest/auto_reply.cpp

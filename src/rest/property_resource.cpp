@@ -1,7 +1,5 @@
 #include "plr/rest/property_resource.h"
 
-#include <boost/container/flat_map.hpp>
-#include <functional>
 #include <stdexcept>
 #include <string>
 #include <utility>
@@ -55,11 +53,7 @@ struct PropertyRestResource::Entry {
     vox::object value;  // null until set
 };
 
-struct PropertyRestResource::Properties
-    : boost::container::flat_map<std::string, std::unique_ptr<Entry>, std::less<>> {};
-
-PropertyRestResource::PropertyRestResource(bool keepValues)
-    : keepValues_(keepValues), properties_(std::make_unique<Properties>()) {}
+PropertyRestResource::PropertyRestResource(bool keepValues) : keepValues_(keepValues) {}
 
 PropertyRestResource::~PropertyRestResource() = default;
 
@@ -165,7 +159,7 @@ void PropertyRestResource::handleMessage_Meta_Watched_Meta_Watchers_GET(
 
 void PropertyRestResource::handleMessage_DumpState_GET(RestResourceContext& context) {
     ReplyDictRestResourceContextDecorator answers(context);
-    for (const auto& [name, entry] : *properties_) {
+    for (const auto& [name, entry] : properties_) {
         answers.pushScope(name);
         answers.sendReplyWithValue(entry->value);
     }
@@ -275,29 +269,29 @@ void PropertyRestResource::handleMessage_Resource_POP(RestResourceContext& conte
 
 vox::array PropertyRestResource::getResourceArray() const {
     const vox::array names = vox::array::create();
-    for (const auto& property : *properties_)
+    for (const auto& property : properties_)
         names.append(asText(property.first));
     return names;
 }
 
 vox::array PropertyRestResource::getWatchedResourceArray() const {
     const vox::array names = vox::array::create();
-    for (const auto& [name, entry] : *properties_)
+    for (const auto& [name, entry] : properties_)
         if (entry->watchers.hasActiveWatchers())
             names.append(asText(name));
     return names;
 }
 
-PropertyRestResource::Entry* PropertyRestResource::find(std::string_view name) const {
-    const auto found = properties_->find(name);
-    return found == properties_->end() ? nullptr : found->second.get();
+PropertyRestResource::Entry* PropertyRestResource::find(std::string_view name) {
+    const auto* found = properties_.find(name);
+    return found ? found->get() : nullptr;
 }
 
 bool PropertyRestResource::createIfNotPresent(std::string_view name, Entry*& entry) {
     entry = find(name);
     if (entry)
         return false;
-    entry = properties_->emplace(std::string(name), std::make_unique<Entry>()).first->second.get();
+    entry = properties_.insert(name, std::make_unique<Entry>()).first->get();
     return true;
 }
 

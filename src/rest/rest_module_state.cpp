@@ -1,6 +1,5 @@
 #include "plr/rest/rest_module_state.h"
 
-#include <boost/container/flat_map.hpp>
 #include <stdexcept>
 #include <utility>
 
@@ -12,25 +11,13 @@ namespace plr {
 
 using rest::Operation;
 
-namespace {
-// Handlers are shared, so that one may change the registrations, its own too.
-template <class Function>
-using Registrations =
-    boost::container::flat_map<std::string, std::shared_ptr<const Function>, std::less<>>;
-}  // namespace
-
-struct RestModuleState::Subscriptions : Registrations<Handler> {};
-struct RestModuleState::RequestHandlers : Registrations<RequestHandler> {};
-
 std::shared_ptr<RestModuleState> RestModuleState::create(dispatch::queue queue,
                                                          const std::string& name) {
     return make_shared_ptr(new RestModuleState(std::move(queue), name));
 }
 
 RestModuleState::RestModuleState(dispatch::queue queue, const std::string& name)
-    : SharedSynchronizable(std::move(queue)),
-      connector_(name),
-      subscriptions_(std::make_unique<Subscriptions>()) {}
+    : SharedSynchronizable(std::move(queue)), connector_(name) {}
 
 RestModuleState::~RestModuleState() = default;
 
@@ -42,10 +29,9 @@ void RestModuleState::connect(vox::connection server) {
     // The name first, so that the server knows whom the rest is for; then what
     // this module serves, then what it wants to see.
     send_sync(Operation::kPush, "/connections");
-    if (requestHandlers_)
-        for (const auto& entry : *requestHandlers_)
-            send_sync(Operation::kPush, entry.first);
-    for (const auto& entry : *subscriptions_)
+    for (const auto& entry : requestHandlers_)
+        send_sync(Operation::kPush, entry.first);
+    for (const auto& entry : subscriptions_)
         send_sync(Operation::kPush, entry.first);
 }
 
@@ -81,15 +67,14 @@ void RestModuleState::observe(const std::string& path, Handler handler, bool for
         return unobserve(path);
     // Deliberate: the first handler stays, in the forced form too.
     const bool inserted =
-        subscriptions_->try_emplace(path, std::make_shared<const Handler>(std::move(handler)))
-            .second;
+        subscriptions_.insert(path, std::make_shared<const Handler>(std::move(handler))).second;
     if (inserted || forceResubscribe)
         send_sync(Operation::kPush, path);
 }
 
 void RestModuleState::unobserve(const std::string& path) {
     ownQueue_.assertCurrent();
-    if (subscriptions_->erase(path) != 0)
+    if (subscriptions_.erase(path))
         send_sync(Operation::kPop, path);
 }
 
@@ -97,17 +82,17 @@ void RestModuleState::registerAsRequestSink(const std::string& path, RequestHand
     ownQueue_.assertCurrent();
     if (!handler)
         return deregisterAsRequestSink(path);
-    if (!requestHandlers_)
-        requestHandlers_ = std::make_unique<RequestHandlers>();
-    auto shared = std::make_shared<const RequestHandler>(std::move(handler));
+    const auto shared = std::make_shared<const RequestHandler>(std::move(handler));
+    const auto [registered, inserted] = requestHandlers_.insert(path, shared);
+    if (inserted)
+        return send_sync(Operation::kPush, path);
     // Deliberate: unlike a subscription, the handler is replaced.
-    if (requestHandlers_->insert_or_assign(path, std::move(shared)).second)
-        send_sync(Operation::kPush, path);
+    *registered = shared;
 }
 
 void RestModuleState::deregisterAsRequestSink(const std::string& path) {
     ownQueue_.assertCurrent();
-    if (requestHandlers_ && requestHandlers_->erase(path) != 0)
+    if (requestHandlers_.erase(path))
         send_sync(Operation::kPop, path);
 }
 
@@ -155,23 +140,23 @@ void RestModuleState::handleServerError(const vox::object& error) {
 bool RestModuleState::handleNotify_sync(const vox::dict& message) {
     if (rest::asOperation(message.text(rest::key::kOperation)) != Operation::kNotify)
         return false;
-    const auto found = subscriptions_->find(message.text(rest::key::kResource));
-    if (found == subscriptions_->end())
+    const auto* found = subscriptions_.find(message.text(rest::key::kResource));
+    if (!found)
         return false;
-    const std::shared_ptr<const Handler> handler = found->second;
+    const std::shared_ptr<const Handler> handler = *found;
     (*handler)(message[rest::key::kValue]);
     return true;
 }
 
 bool RestModuleState::handleRequest_sync(const vox::dict& message) {
-    if (!requestHandlers_ ||
+    if (requestHandlers_.empty() ||
         rest::asOperation(message.text(rest::key::kOperation)) != Operation::kGet)
         return false;
     const std::string_view path = message.text(rest::key::kResource);
-    const auto found = requestHandlers_->find(path);
-    if (path.empty() || found == requestHandlers_->end())
+    const auto* found = requestHandlers_.find(path);
+    if (path.empty() || !found)
         return false;
-    const std::shared_ptr<const RequestHandler> handler = found->second;
+    const std::shared_ptr<const RequestHandler> handler = *found;
     (*handler)(message[rest::key::kValue], rest::createAutoReplyValue(message));
     return true;
 }

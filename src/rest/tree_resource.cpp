@@ -1,7 +1,5 @@
 #include "plr/rest/tree_resource.h"
 
-#include <boost/container/flat_map.hpp>
-#include <functional>
 #include <string>
 #include <utility>
 
@@ -20,18 +18,15 @@ PathView behind(PathView path) {
 
 }  // namespace
 
-struct TreeRestResource::Children
-    : boost::container::flat_map<std::string, std::shared_ptr<RestResourceBase>, std::less<>> {};
-
-TreeRestResource::TreeRestResource() : children_(std::make_unique<Children>()) {}
+TreeRestResource::TreeRestResource() = default;
 TreeRestResource::~TreeRestResource() = default;
 
 bool TreeRestResource::handleMessage(RestResourceContext& context, const PathView& path) {
     if (!path)
         return RestResource::handleMessage(context, path);
-    if (const auto found = children_->find(path.current()); found != children_->end()) {
+    if (const auto* found = children_.find(path.current())) {
         // A handler may install a child, which moves the others.
-        const std::shared_ptr<RestResourceBase> child = found->second;
+        const std::shared_ptr<RestResourceBase> child = *found;
         return child->handleMessage(context, behind(path));
     }
     // After the look-up, so that a child of that name goes first.
@@ -43,18 +38,17 @@ bool TreeRestResource::installSubResource(const PathView& path,
     if (!path)
         return false;
     if (!path.hasTail()) {
-        children_->try_emplace(std::string(path.current()), std::move(resource));
+        children_.insert(path.current(), std::move(resource));
         return true;
     }
-    const auto found = children_->find(path.current());
-    return found != children_->end() &&
-           found->second->installSubResource(behind(path), std::move(resource));
+    const auto* found = children_.find(path.current());
+    return found && (*found)->installSubResource(behind(path), std::move(resource));
 }
 
 void TreeRestResource::handleDroppedConnection(
     RestResourceContext& context, const PathView& path,
     const std::shared_ptr<RestResourceConnection>& connection) {
-    const Children children = *children_;
+    const auto children = children_;
     for (const auto& [name, child] : children) {
         const std::string childPath = path_join(path.full(), name);
         child->handleDroppedConnection(context, PathView(childPath), connection);
@@ -63,7 +57,7 @@ void TreeRestResource::handleDroppedConnection(
 
 bool TreeRestResource::handleRestMessage_GET(RestResourceContext& context, const PathView&) {
     const vox::array names = vox::array::create();
-    for (const auto& child : *children_)
+    for (const auto& child : children_)
         names.append(vox::string(std::string_view(child.first)));
     context.sendReplyWithValue(names);
     return true;
@@ -74,7 +68,7 @@ bool TreeRestResource::handleMessage_DumpState(RestResourceContext& context, Pat
     if (asOperation(context.getRestOperation()) != Operation::kGet)
         return true;
     ReplyDictRestResourceContextDecorator answers(context);
-    const Children children = *children_;
+    const auto children = children_;
     for (const auto& [name, child] : children) {
         answers.pushScope(name);
         const std::string childPath = path_join(path_join(path.head(), name), "*");

@@ -56,12 +56,12 @@ void VoxClientHelper::setServer(vox::connection server, const dispatch::queue& q
         return;
     // `this` is touched only while the target, which it is part of, is alive.
     server_.set_event_handler(
-        [this, target = std::move(target), installedOn = server_](const vox::object& event) {
+        [this, target = std::move(target), installedOn = server_](vox::object event) {
             const std::shared_ptr<T> alive = target.lock();
             if (!alive)
                 return;
-            if (const vox::dict message(event); message)
-                alive->handleMessage(message);
+            if (event.type() == VOX_TYPE_DICTIONARY)
+                alive->handleMessage(vox::dict(std::move(event)));
             else if (event.type() == VOX_TYPE_ERROR && server_.get() == installedOn.get())
                 // Errors of a connection that was replaced concern nobody.
                 alive->handleServerError(event);

@@ -84,16 +84,16 @@ void VoxServerHelper::startListener(const dispatch::queue& queue, std::weak_ptr<
 template <class T, class Handler>
 void VoxServerHelper::acceptClient(vox::connection client, const dispatch::queue& queue,
                                    std::weak_ptr<T> target, Handler handler) const {
-    client.set_event_handler([target = std::move(target), client,
-                              handler = std::move(handler)](const vox::object& event) {
-        const std::shared_ptr<T> alive = target.lock();
-        if (!alive)
-            return;
-        if (const vox::dict message(event); message)
-            alive->handleClientMessage(client, message, handler);
-        else if (event.type() == VOX_TYPE_ERROR)
-            alive->handleClientError(client, event);
-    });
+    client.set_event_handler(
+        [target = std::move(target), client, handler = std::move(handler)](vox::object event) {
+            const std::shared_ptr<T> alive = target.lock();
+            if (!alive)
+                return;
+            if (event.type() == VOX_TYPE_DICTIONARY)
+                alive->handleClientMessage(client, vox::dict(std::move(event)), handler);
+            else if (event.type() == VOX_TYPE_ERROR)
+                alive->handleClientError(client, event);
+        });
     client.set_target_queue(queue);
     client.resume();
 }

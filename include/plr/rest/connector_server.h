@@ -33,12 +33,12 @@ class VoxConnectorServer {
     template <class T>
     void accept(vox::connection client, const dispatch::queue& queue,
                 std::weak_ptr<T> server) const {
-        client.set_event_handler([server = std::move(server), client](const vox::object& event) {
+        client.set_event_handler([server = std::move(server), client](vox::object event) {
             const std::shared_ptr<T> alive = server.lock();
             if (!alive)
                 return;
-            if (const vox::dict message(event); message)
-                alive->handleClientMessage(client, message);
+            if (event.type() == VOX_TYPE_DICTIONARY)
+                alive->handleClientMessage(client, vox::dict(std::move(event)));
             else if (event.type() == VOX_TYPE_ERROR)
                 alive->handleDroppedConnection(client);
         });

@@ -6,6 +6,7 @@
 #include "plr/base/export.h"
 #include "plr/ipc/array.h"
 #include "plr/ipc/object.h"
+#include "plr/rest/path_map.h"
 #include "plr/rest/resource.h"
 #include "plr/rest/watchable.h"
 
@@ -41,8 +42,7 @@ class PLR_EXPORT PropertyRestResource : public RestResource {
     bool handleRestMessage_NOTIFY(RestResourceContext& context, const PathView& path) override;
 
   private:
-    struct Entry;       // a property
-    struct Properties;  // by name, in ascending order
+    struct Entry;  // a property
 
     // The handlers by operation and kind of path. Paths stand on the property's
     // own segment, so that path.head() is the resource's path.
@@ -69,14 +69,14 @@ class PLR_EXPORT PropertyRestResource : public RestResource {
 
     [[nodiscard]] vox::array getResourceArray() const;
     [[nodiscard]] vox::array getWatchedResourceArray() const;
-    [[nodiscard]] Entry* find(std::string_view name) const;
+    [[nodiscard]] Entry* find(std::string_view name);
     // Stores the entry in `entry`; true when it was made now.
     bool createIfNotPresent(std::string_view name, Entry*& entry);
     void sendResourcesNotification(RestResourceContext& context, const PathView& path) const;
     void sendWatchedResourcesNotification(RestResourceContext& context, const PathView& path) const;
 
     const bool keepValues_;
-    const std::unique_ptr<Properties> properties_;
+    PathMap<std::unique_ptr<Entry>> properties_;   // by name
     WatchableRestResourceHelper rootWatchers_;     // of the list of names
     WatchableRestResourceHelper watchedWatchers_;  // of the list of watched properties
 };

@@ -9,6 +9,7 @@
 #include "plr/base/export.h"
 #include "plr/concurrency/shared_synchronizable.h"
 #include "plr/ipc/connection.h"
+#include "plr/rest/path_map.h"
 #include "plr/rest/vox_connector.h"
 
 // What RestModule handles share: the connection to the server and everything
@@ -51,9 +52,9 @@ class PLR_EXPORT RestModuleState : public SharedSynchronizable<RestModuleState> 
   private:
     RestModuleState(dispatch::queue queue, const std::string& name);
 
-    // Handlers by path, in ascending order.
-    struct Subscriptions;
-    struct RequestHandlers;
+    // Handlers are shared, so that one may change the registrations, its own too.
+    template <class Function>
+    using Registrations = rest::PathMap<std::shared_ptr<const Function>>;
 
     void send_sync(rest::Operation operation, std::string_view path,
                    const vox::object& value = {}) const PLR_ON(ownQueue_);
@@ -61,9 +62,8 @@ class PLR_EXPORT RestModuleState : public SharedSynchronizable<RestModuleState> 
     bool handleRequest_sync(const vox::dict& message) PLR_ON(ownQueue_);
 
     rest::VoxConnector connector_ PLR_CONFINED_TO(ownQueue_);
-    const std::unique_ptr<Subscriptions> subscriptions_ PLR_CONFINED_TO(ownQueue_);
-    // Absent until the first registration.
-    std::unique_ptr<RequestHandlers> requestHandlers_ PLR_CONFINED_TO(ownQueue_);
+    Registrations<Handler> subscriptions_ PLR_CONFINED_TO(ownQueue_);
+    Registrations<RequestHandler> requestHandlers_ PLR_CONFINED_TO(ownQueue_);
     Handler serverErrorHandler_ PLR_CONFINED_TO(ownQueue_);
 };
 

@@ -3,6 +3,7 @@
 #include <memory>
 
 #include "plr/base/export.h"
+#include "plr/rest/path_map.h"
 #include "plr/rest/resource.h"
 
 // A TreeRestResource is an inner node of a server's tree: it hands messages to
@@ -35,8 +36,7 @@ class PLR_EXPORT TreeRestResource : public RestResource {
     virtual bool handleMessage_DumpState(RestResourceContext& context, PathView path);
 
   private:
-    struct Children;  // by name, in ascending order
-    const std::unique_ptr<Children> children_;
+    PathMap<std::shared_ptr<RestResourceBase>> children_;  // by name
 };
 
 }  // namespace plr::rest
