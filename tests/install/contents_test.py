@@ -17,7 +17,7 @@ LIBRARIES = ("libpelorin-platform", "libpelorin")
 OFFERED = re.compile(
     r"(Pelorin|vox_|VOX_|qf_)\w*$|__PLAssertTrigger$|"
     r"((typeinfo|typeinfo name|vtable|VTT|(non-)?virtual thunk) (for|to) |guard variable for )?"
-    r"(plr|vox|dispatch)::")
+    r"((plr|vox|dispatch)::|PelorinAsync)")
 # What they may need from the system.
 NEEDED = {"libstdc++.so.6", "libm.so.6", "libgcc_s.so.1", "libc.so.6", "libpelorin-platform.so.0",
           "ld-linux-x86-64.so.2", "ld-linux-aarch64.so.1"}

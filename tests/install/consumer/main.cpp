@@ -30,10 +30,20 @@ bool serviceWorks() {
     return open.wait() == 0 && vox::dyn_cast_or_default(answer, 0) == -73;
 }
 
+// What stands outside the namespaces is there, too.
+bool callbackWorks() {
+    const auto queue = dispatch::queue::create("callback");
+    bool outcome = false;
+    const dispatch::block<void(bool)> keep([&outcome](bool value) { outcome = value; });
+    PelorinAsyncDispatchCallback callback(queue, keep);
+    callback.invoke(true);
+    return queue.sync([&outcome] { return outcome; });
+}
+
 }  // namespace
 
 int main() {
-    const bool works = values_work() != 0 && serviceWorks();
+    const bool works = values_work() != 0 && serviceWorks() && callbackWorks();
     std::cout << (works ? "works\n" : "does not work\n");
     return works ? 0 : 1;
 }
