@@ -29,7 +29,7 @@
 //          whose queue is the target queue runs in that same order.
 // Cost:    a message is encoded and written on the calling thread; one that
 //          arrives is read, decoded and handled on the thread that woke up for
-//          it (bench/vox_bench.cpp).
+//          it (bench/vox_cases.h).
 //
 // Transport errors are never ignored silently: what ends a connection is told
 // by its error event, and when the peer is to blame also in one line through

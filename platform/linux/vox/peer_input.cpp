@@ -50,7 +50,7 @@ void peer_connection::turn() {
     read_turn();
 }
 
-// Hot path: bench/vox_bench.cpp.
+// Hot path: bench/vox_cases.h.
 void peer_connection::read_turn() {
     // Without users nobody is to hear anything; cancelling is under way.
     const borrowed_reference reference(this);

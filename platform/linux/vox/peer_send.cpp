@@ -105,7 +105,7 @@ void peer_connection::run_finished_barriers() {
     }
 }
 
-// Hot path: bench/vox_bench.cpp.
+// Hot path: bench/vox_cases.h.
 int peer_connection::send(vox_object_t message, frame_type kind, std::uint64_t id,
                           waiting_reply* reply) {
     for (;;) {

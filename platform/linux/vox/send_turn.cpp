@@ -13,8 +13,12 @@
 namespace vox_link {
 namespace {
 
-constexpr std::int64_t kLongestDelay = 100'000;  // ns
-constexpr std::chrono::milliseconds kSweep(1);
+// How long frames wait for others of the turn: 100 µs; with many receivers about
+// as long as writing to each of them will take, so that an update to a thousand
+// of them is not written before the next one is known.
+constexpr std::int64_t kDelay = 100'000;             // ns
+constexpr std::int64_t kDelayForEachSender = 1'000;  // ns
+constexpr std::chrono::milliseconds kSweep(1);       // and never longer
 
 std::int64_t now() noexcept {
     return dispatch::time::now().nanoseconds();
@@ -115,6 +119,7 @@ void send_turn::add(peer_connection* sender) {
     sender->hold();
     const std::int64_t time = now();
     began_ = began_ == 0 ? time : began_;
+    ++senders_;
     {
         const lock_guard guard(own.lock);
         if (own.senders.empty())
@@ -125,13 +130,18 @@ void send_turn::add(peer_connection* sender) {
 }
 
 void send_turn::flush_if_due() {
-    if (began_ != 0 && now() - began_ >= kLongestDelay)
+    if (began_ == 0)
+        return;
+    const std::int64_t delay = std::clamp(senders_ * kDelayForEachSender, kDelay,
+                                          std::int64_t{std::chrono::nanoseconds(kSweep).count()});
+    if (now() - began_ >= delay)
         flush();
 }
 
 void send_turn::flush() {
     if (std::exchange(began_, 0) == 0)
         return;
+    senders_ = 0;
     thread_local std::vector<peer_connection*> taken;
     {
         const lock_guard guard(own.lock);

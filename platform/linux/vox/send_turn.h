@@ -8,9 +8,10 @@
 //
 // While more messages of the batch wait, frames for connections of the same
 // queue are put together, and written at the end of the turn or 100 µs after
-// the first: a burst of requests is answered with few system calls, a lone
-// request at once (bench/vox_bench.cpp). When a handler takes long or blocks,
-// another thread writes them after a millisecond or two.
+// the first (up to 1 ms when they go to many): a burst of requests is answered
+// with few system calls, a lone request at once (bench/vox_cases.h). When a
+// handler takes long or blocks, another thread writes them after a millisecond or
+// two.
 namespace vox_link {
 
 class peer_connection;
@@ -39,7 +40,8 @@ class send_turn {
     dispatch::detail::queue_core* queue_;
     send_turn* outer_;
     bool has_more_ = false;
-    std::int64_t began_ = 0;  // ns, when the first sender was added; 0: none was
+    std::int64_t began_ = 0;    // ns, when the first sender was added; 0: none was
+    std::int64_t senders_ = 0;  // added since then
 };
 
 }  // namespace vox_link
