@@ -54,7 +54,7 @@ int sequence_length(const std::uint8_t* at, const std::uint8_t* end) noexcept {
 
 }  // namespace
 
-// Hot path: bench/codec_bench.cpp.
+// Hot path: bench/vox_cases.h.
 bool is_utf8(std::span<const std::uint8_t> text) noexcept {
     const std::uint8_t* at = text.data();
     const std::uint8_t* const end = at + text.size();
