@@ -32,6 +32,7 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/queue.cpp
     platform/linux/dispatch/queue_core.cpp
     platform/linux/dispatch/queue_core.h
+    platform/linux/dispatch/queue_specific.cpp
     platform/linux/dispatch/run_list.h
     platform/linux/dispatch/source.cpp
     platform/linux/dispatch/spin_lock.h

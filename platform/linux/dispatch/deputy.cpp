@@ -1,4 +1,4 @@
-#include "deputy.h"
+#include "platform/linux/dispatch/deputy.h"
 
 #include <pthread.h>
 #include <signal.h>
@@ -6,8 +6,8 @@
 #include <algorithm>
 #include <chrono>
 
-#include "futex.h"
-#include "pool.h"
+#include "platform/linux/dispatch/futex.h"
+#include "platform/linux/dispatch/pool.h"
 
 namespace dispatch::detail {
 namespace {

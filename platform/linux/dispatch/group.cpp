@@ -4,10 +4,10 @@
 #include <cstdint>
 #include <vector>
 
-#include "futex.h"
+#include "platform/linux/dispatch/futex.h"
+#include "platform/linux/dispatch/pool.h"
+#include "platform/linux/dispatch/spin_lock.h"
 #include "plr/base/assert.h"
-#include "pool.h"
-#include "spin_lock.h"
 
 namespace dispatch {
 namespace detail {

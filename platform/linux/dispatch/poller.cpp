@@ -1,4 +1,4 @@
-#include "poller.h"
+#include "platform/linux/dispatch/poller.h"
 
 #include <sys/epoll.h>
 #include <sys/eventfd.h>
@@ -7,10 +7,10 @@
 #include <cerrno>
 #include <new>
 
-#include "deputy.h"
+#include "platform/linux/dispatch/deputy.h"
+#include "platform/linux/dispatch/pool.h"
+#include "platform/linux/dispatch/queue_core.h"
 #include "plr/base/assert.h"
-#include "pool.h"
-#include "queue_core.h"
 
 namespace dispatch::detail {
 namespace {

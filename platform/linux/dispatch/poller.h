@@ -3,9 +3,9 @@
 #include <cstdint>
 #include <vector>
 
-#include "io_watch.h"
-#include "spin_lock.h"
-#include "timer_queue.h"
+#include "platform/linux/dispatch/io_watch.h"
+#include "platform/linux/dispatch/spin_lock.h"
+#include "platform/linux/dispatch/timer_queue.h"
 
 // The one epoll instance: descriptor events, timers and the interruption of the
 // idle worker that waits here. Never destroyed.

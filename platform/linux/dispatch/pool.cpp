@@ -1,4 +1,4 @@
-#include "pool.h"
+#include "platform/linux/dispatch/pool.h"
 
 #include <pthread.h>
 #include <sched.h>
@@ -7,14 +7,13 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
-#include <mutex>
 
-#include "deputy.h"
-#include "io_watch.h"
+#include "platform/linux/dispatch/deputy.h"
+#include "platform/linux/dispatch/io_watch.h"
+#include "platform/linux/dispatch/poller.h"
+#include "platform/linux/dispatch/queue_core.h"
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
-#include "poller.h"
-#include "queue_core.h"
 
 namespace dispatch::detail {
 namespace {

@@ -8,8 +8,8 @@
 #include <vector>
 
 #include "dispatch/queue.h"
-#include "run_list.h"
-#include "spin_lock.h"
+#include "platform/linux/dispatch/run_list.h"
+#include "platform/linux/dispatch/spin_lock.h"
 
 // The process-wide pool of workers.
 //

@@ -1,10 +1,10 @@
 #include "dispatch/queue.h"
 
+#include "platform/linux/dispatch/poller.h"
+#include "platform/linux/dispatch/pool.h"
+#include "platform/linux/dispatch/queue_core.h"
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
-#include "poller.h"
-#include "pool.h"
-#include "queue_core.h"
 
 namespace dispatch {
 namespace detail {

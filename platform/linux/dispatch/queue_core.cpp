@@ -1,14 +1,13 @@
-#include "queue_core.h"
+#include "platform/linux/dispatch/queue_core.h"
 
 #include <sched.h>
 
 #include <cstring>
-#include <memory>
-#include <mutex>
+#include <utility>
 
+#include "platform/linux/dispatch/pool.h"
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
-#include "pool.h"
 
 namespace dispatch::detail {
 namespace {
@@ -43,8 +42,6 @@ item* linger(item* last, unsigned ran) noexcept {
     }
     return nullptr;
 }
-
-spin_lock specifics_lock;
 
 }  // namespace
 
@@ -391,39 +388,6 @@ void queue_core::resume() noexcept {
     std::uint32_t expected = kParked;
     if (suspension_.compare_exchange_strong(expected, 0, std::memory_order_acq_rel))
         activate();
-}
-
-// ---- Specifics -----------------------------------------------------------------------------
-
-void queue_core::set_specific(const void* key, void* value, void (*destructor)(void*)) {
-    auto fresh = std::unique_ptr<specific>(new specific{key, value, destructor, nullptr});
-    void* replaced = nullptr;
-    void (*replaced_destructor)(void*) = nullptr;
-    {
-        scoped_lock guard(specifics_lock);
-        specific* entry = specifics_.load(std::memory_order_relaxed);
-        while (entry && entry->key != key)
-            entry = entry->next;
-        if (entry) {
-            replaced = entry->value.exchange(value, std::memory_order_acq_rel);
-            replaced_destructor = std::exchange(entry->destructor, destructor);
-        } else if (value) {
-            fresh->next = specifics_.load(std::memory_order_relaxed);
-            specifics_.store(fresh.release(), std::memory_order_release);
-        }
-    }
-    if (replaced && replaced_destructor)
-        replaced_destructor(replaced);
-}
-
-void* queue_core::get_specific(const void* key) const noexcept {
-    for (const queue_core* level = this; level; level = level->target_)
-        for (const specific* entry = level->specifics_.load(std::memory_order_acquire); entry;
-             entry = entry->next)
-            if (entry->key == key)
-                if (void* value = entry->value.load(std::memory_order_acquire))
-                    return value;
-    return nullptr;
 }
 
 }  // namespace dispatch::detail

@@ -5,8 +5,8 @@
 #include <string_view>
 
 #include "dispatch/queue.h"
-#include "io_watch.h"
-#include "spin_lock.h"
+#include "platform/linux/dispatch/io_watch.h"
+#include "platform/linux/dispatch/spin_lock.h"
 
 // The state of one queue.
 //

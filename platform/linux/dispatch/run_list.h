@@ -5,7 +5,7 @@
 #include <atomic>
 
 #include "dispatch/queue.h"
-#include "futex.h"
+#include "platform/linux/dispatch/futex.h"
 
 namespace dispatch::detail {
 

@@ -9,11 +9,11 @@
 #include <memory>
 #include <system_error>
 
-#include "io_watch.h"
+#include "platform/linux/dispatch/io_watch.h"
+#include "platform/linux/dispatch/poller.h"
+#include "platform/linux/dispatch/pool.h"
+#include "platform/linux/dispatch/queue_core.h"
 #include "plr/base/assert.h"
-#include "poller.h"
-#include "pool.h"
-#include "queue_core.h"
 
 namespace dispatch {
 namespace detail {

@@ -4,7 +4,7 @@
 
 #include <atomic>
 
-#include "futex.h"
+#include "platform/linux/dispatch/futex.h"
 #include "plr/base/thread_annotations.h"
 
 namespace dispatch::detail {

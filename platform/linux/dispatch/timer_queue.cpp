@@ -1,4 +1,4 @@
-#include "timer_queue.h"
+#include "platform/linux/dispatch/timer_queue.h"
 
 #include <sys/epoll.h>
 #include <sys/timerfd.h>

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "dispatch/time.h"
-#include "spin_lock.h"
+#include "platform/linux/dispatch/spin_lock.h"
 
 // All pending timers: per clock a 4-ary heap over one timerfd, which is armed for
 // the earliest deadline only. The wall clock's descriptor is told of clock steps
