@@ -75,8 +75,9 @@ TEST(VoxSlowPeer, OneMessageOfAnySizeIsTakenWhenNothingWaits) {
     EXPECT_EQ(peer.readFrame().first.length >> 20, 4u);
     EXPECT_EQ(peer.readFrame().first.type, frame_type::dropped);
     // The peer may have read it before the writer came back from the kernel.
-    EXPECT_TRUE(plr::test::eventually(
-        [&] { return vox_connection_send_message(connection, message(3, 4u << 20)) == 0; }));
+    EXPECT_TRUE(plr::test::eventually([&sender = connection] {
+        return vox_connection_send_message(sender, message(3, 4u << 20)) == 0;
+    }));
     vox_connection_cancel(connection);
     EXPECT_TRUE(inbox.waitForError());
 }
@@ -127,8 +128,9 @@ TEST(VoxSlowPeer, LearnsHowManyMessagesWereDroppedWhenThatIsThePolicy) {
     EXPECT_EQ(received, accepted);
     EXPECT_EQ(told, dropped);
     // Now that there is room again, messages pass.
-    EXPECT_TRUE(plr::test::eventually(
-        [&] { return vox_connection_send_message(connection, message(kSent)) == 0; }));
+    EXPECT_TRUE(plr::test::eventually([&sender = connection] {
+        return vox_connection_send_message(sender, message(kSent)) == 0;
+    }));
     while (peer.readFrame().first.type == frame_type::dropped) {
     }
     vox_connection_cancel(connection);
