@@ -21,6 +21,7 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
   SOURCES
     platform/linux/dispatch/deputy.cpp
     platform/linux/dispatch/deputy.h
+    platform/linux/dispatch/detached_thread.h
     platform/linux/dispatch/futex.h
     platform/linux/dispatch/group.cpp
     platform/linux/dispatch/io_watch.h

@@ -1,11 +1,11 @@
 #include "platform/linux/dispatch/deputy.h"
 
 #include <pthread.h>
-#include <signal.h>
 
 #include <algorithm>
 #include <chrono>
 
+#include "platform/linux/dispatch/detached_thread.h"
 #include "platform/linux/dispatch/futex.h"
 #include "platform/linux/dispatch/pool.h"
 
@@ -28,20 +28,10 @@ void deputy::start() noexcept {
         futex_wake(watching_, 1);
         return;
     }
-    sigset_t all;
-    sigset_t before;
-    sigfillset(&all);
-    ::pthread_sigmask(SIG_SETMASK, &all, &before);
-    pthread_attr_t attributes;
-    ::pthread_attr_init(&attributes);
-    ::pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
-    pthread_t thread;
-    if (::pthread_create(&thread, &attributes, &deputy::main, nullptr) != 0) {
+    if (start_detached(&deputy::main, nullptr) != 0) {
         made.store(false);
         watching_.store(0, std::memory_order_release);  // the next call tries again
     }
-    ::pthread_attr_destroy(&attributes);
-    ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
 }
 
 void* deputy::main(void*) noexcept {

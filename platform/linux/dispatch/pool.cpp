@@ -2,13 +2,13 @@
 
 #include <pthread.h>
 #include <sched.h>
-#include <signal.h>
 
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
 
 #include "platform/linux/dispatch/deputy.h"
+#include "platform/linux/dispatch/detached_thread.h"
 #include "platform/linux/dispatch/io_watch.h"
 #include "platform/linux/dispatch/poller.h"
 #include "platform/linux/dispatch/queue_core.h"
@@ -107,18 +107,7 @@ bool pool::add_worker() noexcept {
     searching_.fetch_add(1, std::memory_order_seq_cst);
 
     auto* made = new worker;
-    // Signals are for the program's own threads.
-    sigset_t all;
-    sigset_t before;
-    sigfillset(&all);
-    ::pthread_sigmask(SIG_SETMASK, &all, &before);
-    pthread_attr_t attributes;
-    ::pthread_attr_init(&attributes);
-    ::pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
-    pthread_t thread;
-    const int error = ::pthread_create(&thread, &attributes, &pool::main, made);
-    ::pthread_attr_destroy(&attributes);
-    ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
+    const int error = start_detached(&pool::main, made);
     if (error == 0)
         return true;
     delete made;

@@ -1,0 +1,25 @@
+#pragma once
+
+#include <pthread.h>
+#include <signal.h>
+
+namespace dispatch::detail {
+
+// Starts a thread that nobody joins, with all signals blocked: they are for the
+// program's own threads. Returns 0 or an error number.
+inline int start_detached(void* (*function)(void*) noexcept, void* context) noexcept {
+    sigset_t all;
+    sigset_t before;
+    sigfillset(&all);
+    ::pthread_sigmask(SIG_SETMASK, &all, &before);
+    pthread_attr_t attributes;
+    ::pthread_attr_init(&attributes);
+    ::pthread_attr_setdetachstate(&attributes, PTHREAD_CREATE_DETACHED);
+    pthread_t thread;
+    const int error = ::pthread_create(&thread, &attributes, function, context);
+    ::pthread_attr_destroy(&attributes);
+    ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
+    return error;
+}
+
+}  // namespace dispatch::detail
