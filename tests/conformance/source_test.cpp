@@ -83,6 +83,29 @@ TEST(TimerSource, PeriodsAddUpWithoutDrift) {
     drain(serial);
 }
 
+TEST(TimerSource, RepeatsOnEveryClockUntilCancelled) {
+    const auto serial = queue::create("serial");
+    for (const auto on :
+         {dispatch::clock::monotonic, dispatch::clock::boot, dispatch::clock::wall}) {
+        const auto timer = source::timer(serial);
+        Event third;
+        Event cancelled;
+        int calls = 0;
+        timer.set_event_handler(block<void()>([&] {
+            if (++calls == 3) {
+                timer.cancel();
+                third.signal();
+            }
+        }));
+        timer.set_cancel_handler(block<void()>([&] { cancelled.signal(); }));
+        timer.set_timer(dispatch::time::after(1ms, on), 1ms);
+        timer.resume();
+        EXPECT_TRUE(third.wait()) << static_cast<int>(on);
+        EXPECT_TRUE(cancelled.wait());
+        EXPECT_EQ(calls, 3);
+    }
+}
+
 // Returns whether all timers were armed before the first was due; only then
 // does their order say something.
 bool manyFireInOrder(std::chrono::milliseconds lead) {
