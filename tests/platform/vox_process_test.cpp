@@ -1,17 +1,14 @@
 // Vox between real processes: this program is also the service, when it is
 // called with arguments.
-#include <fcntl.h>
 #include <gtest/gtest.h>
-#include <spawn.h>
 #include <sys/time.h>
-#include <sys/wait.h>
 
 #include <csignal>
-#include <cstdio>
 #include <memory>
 #include <string>
 #include <vector>
 
+#include "support/service_process.h"
 #include "support/vox_service.h"
 
 namespace {
@@ -20,10 +17,10 @@ using plr::test::Event;
 using plr::test::Inbox;
 using plr::test::message;
 using plr::test::Ref;
+using plr::test::ServiceProcess;
 using plr::test::TestClient;
 
 constexpr const char* kName = "net.example.process";
-std::string program;
 
 // What the service does with a request: its "n".
 enum Wish : std::int64_t {
@@ -70,47 +67,8 @@ void serve(vox_connection_t listener, vox_connection_t hidden) {
     const vox_connection_t hidden = vox_connection_create_anonymous_listener(nullptr);
     serve(hidden, nullptr);
     serve(vox_connection_create_listener(kName, nullptr), hidden);
-    std::puts("ready");
-    std::fflush(stdout);
-    for (;;)
-        ::pause();
+    plr::test::serviceIsReady();
 }
-
-// A running service process; killed at the end.
-class Service {
-  public:
-    Service() {
-        int ends[2];
-        EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
-        posix_spawn_file_actions_t actions;
-        posix_spawn_file_actions_init(&actions);
-        posix_spawn_file_actions_adddup2(&actions, ends[1], 1);
-        std::string role = "service";
-        char* arguments[] = {program.data(), role.data(), nullptr};
-        EXPECT_EQ(::posix_spawn(&pid_, program.c_str(), &actions, nullptr, arguments, environ), 0);
-        posix_spawn_file_actions_destroy(&actions);
-        ::close(ends[1]);
-        char byte = 0;
-        EXPECT_EQ(::read(ends[0], &byte, 1), 1) << "the service did not start";
-        ::close(ends[0]);
-    }
-    ~Service() { kill(); }
-    Service(const Service&) = delete;
-    Service& operator=(const Service&) = delete;
-    void kill() {
-        if (pid_ > 0)
-            ::kill(pid_, SIGKILL);
-        wait();
-    }
-    void wait() {
-        EXPECT_TRUE(pid_ < 0 || ::waitpid(pid_, nullptr, 0) == pid_);
-        pid_ = -1;
-    }
-    [[nodiscard]] pid_t pid() const { return pid_; }
-
-  private:
-    pid_t pid_ = -1;
-};
 
 class VoxProcess : public ::testing::Test {
   protected:
@@ -119,7 +77,7 @@ class VoxProcess : public ::testing::Test {
 };
 
 TEST_F(VoxProcess, ProcessesKnowEachOtherAndExchangeMessages) {
-    const Service service;
+    const ServiceProcess service;
     TestClient client(vox_connection_create(kName));
     EXPECT_TRUE(client.works());
     EXPECT_EQ(vox_connection_get_pid(client.connection()), service.pid());
@@ -136,7 +94,7 @@ TEST_F(VoxProcess, ProcessesKnowEachOtherAndExchangeMessages) {
 }
 
 TEST_F(VoxProcess, AKilledServiceTellsEveryRequestOnceAndMayComeBack) {
-    Service service;
+    ServiceProcess service;
     TestClient client(vox_connection_create(kName));
     ASSERT_TRUE(client.works());
     std::vector<Inbox> replies(100);
@@ -152,13 +110,13 @@ TEST_F(VoxProcess, AKilledServiceTellsEveryRequestOnceAndMayComeBack) {
         EXPECT_EQ(reply.all().size(), 1u);
     EXPECT_EQ(client.inbox().all().size(), 1u);
 
-    const Service again;
+    const ServiceProcess again;
     TestClient back(vox_connection_create(kName));
     EXPECT_TRUE(back.works());
 }
 
 TEST_F(VoxProcess, WhatWasSentBeforeTheEndArrives) {
-    Service service;
+    ServiceProcess service;
     TestClient client(vox_connection_create(kName));
     Inbox replies;
     for (std::int64_t n = 0; n < 200; ++n)
@@ -171,7 +129,7 @@ TEST_F(VoxProcess, WhatWasSentBeforeTheEndArrives) {
 }
 
 TEST_F(VoxProcess, AnEndpointConnectsAThirdPartyDirectly) {
-    const Service service;
+    const ServiceProcess service;
     TestClient client(vox_connection_create(kName));
     Inbox replies;
     plr::test::request(client.connection(), message(kEndpoint), queue, replies);
@@ -188,7 +146,7 @@ TEST_F(VoxProcess, AnEndpointConnectsAThirdPartyDirectly) {
 }
 
 TEST_F(VoxProcess, InterruptedSystemCallsAreRepeated) {
-    const Service service;
+    const ServiceProcess service;
     struct sigaction handler = {};
     handler.sa_handler = [](int) {};
     struct sigaction before = {};
@@ -214,9 +172,6 @@ TEST_F(VoxProcess, InterruptedSystemCallsAreRepeated) {
 int main(int count, char** arguments) {
     if (count == 2 && std::string(arguments[1]) == "service")
         serviceMain();
-    program = "/proc/self/exe";
-    std::error_code ignored;
-    program = std::filesystem::read_symlink(program, ignored).string();
     ::testing::InitGoogleTest(&count, arguments);
     return RUN_ALL_TESTS();
 }

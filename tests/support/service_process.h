@@ -49,12 +49,16 @@ class ServiceProcess {
 
     // Ends it at once, without a chance to say anything.
     void kill() {
-        if (pid_ <= 0)
-            return;
-        ::kill(pid_, SIGKILL);
-        EXPECT_EQ(::waitpid(pid_, nullptr, 0), pid_);
+        if (pid_ > 0)
+            ::kill(pid_, SIGKILL);
+        wait();
+    }
+    // Until it has ended by itself.
+    void wait() {
+        EXPECT_TRUE(pid_ < 0 || ::waitpid(pid_, nullptr, 0) == pid_);
         pid_ = -1;
     }
+    [[nodiscard]] pid_t pid() const { return pid_; }
 
   private:
     pid_t pid_ = -1;

@@ -33,6 +33,9 @@
 // Work that blocks: a worker that waits in sync() or group::wait() tells the
 // pool, which replaces it; a pool whose workers all block elsewhere (in read(),
 // on a mutex) grows while work waits. At most kMaximumWorkers threads exist.
+// What a worker submits as its last piece of work is expected to run on that
+// worker next: if the submitting piece goes on for long instead, another worker
+// takes it after some milliseconds.
 //
 // An exception that leaves submitted work ends the process.
 namespace dispatch {
