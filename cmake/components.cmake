@@ -117,6 +117,12 @@ pelorin_component(qf_core LEVEL 1 LIBRARY platform
     platform/linux/qf/value.cpp
     platform/linux/qf/value.h)
 
+pelorin_component(trel LEVEL 1 LIBRARY platform
+  HEADERS
+    platform/include/trel/trel.h
+  SOURCES
+    platform/linux/trel/trel.cpp)
+
 pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
   HEADERS
     include/plr/ipc/array.h

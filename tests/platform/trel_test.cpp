@@ -1,0 +1,59 @@
+#include "trel/trel.h"
+
+#include <gtest/gtest.h>
+
+#include <array>
+#include <string>
+#include <thread>
+
+namespace {
+
+TEST(Trel, EqualPairsShareAHandleWhateverElseDiffers) {
+    std::string subsystem = "test.pairs";
+    std::string category = "radio";
+    const trel_t handle = trel_create(subsystem.c_str(), category.c_str());
+    subsystem = "other";  // the texts were copied
+    category = "other";
+    EXPECT_EQ(trel_create("test.pairs", "radio"), handle);
+    EXPECT_STREQ(trel_get_subsystem(handle), "test.pairs");
+    EXPECT_STREQ(trel_get_category(handle), "radio");
+    EXPECT_NE(trel_create("test.pairs", "sms"), handle);
+    EXPECT_NE(trel_create("radio", "test.pairs"), handle);
+    EXPECT_EQ(trel_create(nullptr, nullptr), trel_create("", ""));
+}
+
+TEST(Trel, LivesOnWhenReleasedMoreOftenThanRetained) {
+    const trel_t handle = trel_create("test.count", "negative");
+    EXPECT_EQ(trel_get_reference_count(handle), 1);
+    EXPECT_EQ(trel_retain(handle), handle);
+    for (int i = 0; i < 5; i++)
+        trel_release(handle);
+    EXPECT_EQ(trel_get_reference_count(handle), -3);
+    EXPECT_STREQ(trel_get_category(handle), "negative");
+    EXPECT_EQ(trel_create("test.count", "negative"), handle);
+}
+
+TEST(Trel, NullIsNoHandle) {
+    EXPECT_EQ(trel_retain(nullptr), nullptr);
+    trel_release(nullptr);
+    EXPECT_STREQ(trel_get_subsystem(nullptr), "");
+    EXPECT_STREQ(trel_get_category(nullptr), "");
+    EXPECT_EQ(trel_get_reference_count(nullptr), 0);
+}
+
+TEST(Trel, ThreadsAgreeOnOneHandle) {
+    std::array<trel_t, 4> found{};
+    {
+        std::array<std::jthread, 4> threads;
+        for (std::size_t i = 0; i < threads.size(); i++)
+            threads[i] = std::jthread([&slot = found[i]] {
+                for (int turn = 0; turn < 1000; turn++)
+                    slot = trel_create("test.threads", std::to_string(turn % 7).c_str());
+            });
+    }
+    for (const trel_t handle : found)
+        EXPECT_EQ(handle, found[0]);
+    EXPECT_EQ(trel_get_reference_count(found[0]), 4 * 143);  // turns 5, 12, … of each thread
+}
+
+}  // namespace
