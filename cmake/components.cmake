@@ -13,12 +13,14 @@ pelorin_component(base LEVEL 0 LIBRARY platform
 pelorin_component(dispatch LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/dispatch/block.h
+    platform/include/dispatch/calendar.h
     platform/include/dispatch/dispatch.h
     platform/include/dispatch/group.h
     platform/include/dispatch/queue.h
     platform/include/dispatch/source.h
     platform/include/dispatch/time.h
   SOURCES
+    platform/linux/dispatch/calendar.cpp
     platform/linux/dispatch/deputy.cpp
     platform/linux/dispatch/deputy.h
     platform/linux/dispatch/detached_thread.h
@@ -142,13 +144,27 @@ pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
 pelorin_component(concurrency_core LEVEL 2 LIBRARY pelorin
   HEADERS
     include/plr/concurrency/async_dispatch_callback.h
+    include/plr/concurrency/clock.h
     include/plr/concurrency/qf_shared_ref.h
     include/plr/concurrency/queue_role.h
     include/plr/concurrency/shared_ref.h
     include/plr/concurrency/shared_synchronizable.h
     include/plr/concurrency/while_alive.h
   SOURCES
-    src/concurrency/async_dispatch_callback.cpp)
+    src/concurrency/async_dispatch_callback.cpp
+    src/concurrency/clock.cpp)
+
+pelorin_component(log_values LEVEL 2 LIBRARY pelorin
+  HEADERS
+    include/plr/log/log_level.h
+    include/plr/log/log_message.h
+    include/plr/log/log_message_buffer.h
+    include/plr/log/log_tag.h
+  SOURCES
+    src/log/log_level.cpp
+    src/log/log_message.cpp
+    src/log/log_message_buffer.cpp
+    src/log/log_tag.cpp)
 
 pelorin_component(ipc_endpoints LEVEL 3 LIBRARY pelorin
   HEADERS
