@@ -2,6 +2,7 @@
 
 // Objects that own a serial queue, and what goes with them.
 #include "plr/concurrency/async_dispatch_callback.h"
+#include "plr/concurrency/clock.h"
 #include "plr/concurrency/qf_shared_ref.h"
 #include "plr/concurrency/queue_role.h"
 #include "plr/concurrency/shared_ref.h"

@@ -2,6 +2,7 @@
 
 // Everything of namespace dispatch.
 #include "dispatch/block.h"
+#include "dispatch/calendar.h"
 #include "dispatch/group.h"
 #include "dispatch/queue.h"
 #include "dispatch/source.h"

@@ -16,7 +16,7 @@ namespace dispatch {
 enum class clock : std::uint8_t {
     monotonic = 0,  // CLOCK_MONOTONIC: stands still while the system sleeps
     boot = 1,       // CLOCK_BOOTTIME: counts the time asleep
-    wall = 2,       // CLOCK_REALTIME: follows changes of the system time at once
+    wall = 2,       // the calendar (calendar.h): follows changes of the system time at once
 };
 
 class time {
@@ -34,6 +34,7 @@ class time {
     // Now plus `delay`; a negative delay is a deadline already past.
     PLR_EXPORT static time after(std::chrono::nanoseconds delay,
                                  clock on = clock::monotonic) noexcept;
+    // A wall clock that cannot be read gives its start.
     PLR_EXPORT static time now(clock on = clock::monotonic) noexcept;
 
     // All 64 bits, for storage and comparison with `forever`.

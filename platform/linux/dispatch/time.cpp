@@ -2,12 +2,16 @@
 
 #include <ctime>
 
+#include "dispatch/calendar.h"
+
 namespace dispatch {
 
 time time::now(clock on) noexcept {
-    static constexpr clockid_t kClocks[] = {CLOCK_MONOTONIC, CLOCK_BOOTTIME, CLOCK_REALTIME};
-    timespec reading{};
-    ::clock_gettime(kClocks[static_cast<unsigned>(on)], &reading);
+    std::timespec reading{};
+    if (on != clock::wall)
+        ::clock_gettime(on == clock::boot ? CLOCK_BOOTTIME : CLOCK_MONOTONIC, &reading);
+    else if (calendar::shared().read(reading) != 0)
+        return at(on, 0);
     return at(on, reading.tv_sec * std::int64_t{1'000'000'000} + reading.tv_nsec);
 }
 

@@ -1,0 +1,47 @@
+#include "plr/concurrency/clock.h"
+
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <string>
+
+#include "plr/base/report.h"
+#include "support/manual_calendar.h"
+
+namespace {
+
+using plr::Clock;
+using plr::test::ManualCalendar;
+using namespace std::chrono_literals;
+
+std::string reported;
+
+TEST(Clock, CountsTheNanosecondsOfTheCalendar) {
+    ManualCalendar calendar(1'700'000'000s + 5ns);
+    EXPECT_EQ(Clock::now_in_nanoseconds(), 1'700'000'000'000'000'005u);
+    calendar.step(1ms);
+    EXPECT_EQ(Clock::now_in_nanoseconds(), 1'700'000'000'001'000'005u);
+    calendar.step(-2s);
+    EXPECT_EQ(Clock::now_in_nanoseconds(), 1'699'999'998'001'000'005u);
+}
+
+TEST(Clock, FollowsTheSystemsTime) {
+    const auto before = std::chrono::system_clock::now().time_since_epoch() / 1ns;
+    const auto read = Clock::now_in_nanoseconds();
+    const auto after = std::chrono::system_clock::now().time_since_epoch() / 1ns;
+    EXPECT_GE(read, static_cast<std::uint64_t>(before));
+    EXPECT_LE(read, static_cast<std::uint64_t>(after));
+}
+
+TEST(Clock, AFailureIsLoggedAndGivesZero) {
+    ManualCalendar calendar;
+    calendar.fail(EINVAL);
+    const auto hook = plr::setReportHook([](const char* line) noexcept { reported = line; });
+    EXPECT_EQ(Clock::now_in_nanoseconds(), 0u);
+    plr::setReportHook(hook);
+    EXPECT_EQ(reported, "Failed to get time, 0x16\n");
+    calendar.fail(0);
+    EXPECT_NE(Clock::now_in_nanoseconds(), 0u);
+}
+
+}  // namespace
