@@ -125,6 +125,10 @@ pelorin_component(trel LEVEL 1 LIBRARY platform
   SOURCES
     platform/linux/trel/trel.cpp)
 
+pelorin_component(kel LEVEL 1 LIBRARY platform
+  HEADERS
+    platform/include/kel/kel.h)
+
 pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
   HEADERS
     include/plr/ipc/array.h
@@ -166,6 +170,25 @@ pelorin_component(log_values LEVEL 2 LIBRARY pelorin
     src/log/log_message_buffer.cpp
     src/log/log_tag.cpp)
 
+pelorin_component(log_core LEVEL 3 LIBRARY pelorin
+  HEADERS
+    include/plr/log/logger.h
+    include/plr/log/logger_base.h
+    include/plr/log/logger_common_base.h
+    include/plr/log/logger_tree.h
+    include/plr/log/staged_logger.h
+    include/plr/log/static_logger.h
+    include/plr/log/tracked_logger.h
+    include/plr/log/trel_context.h
+  SOURCES
+    src/log/logger.cpp
+    src/log/logger_base.cpp
+    src/log/logger_common_base.cpp
+    src/log/logger_tree.cpp
+    src/log/staged_logger.cpp
+    src/log/static_logger.cpp
+    src/log/tracked_logger.cpp)
+
 pelorin_component(ipc_endpoints LEVEL 3 LIBRARY pelorin
   HEADERS
     include/plr/ipc/vox_client.h
@@ -177,6 +200,11 @@ pelorin_component(ipc_endpoints LEVEL 3 LIBRARY pelorin
     src/ipc/vox_client_helper.cpp
     src/ipc/vox_server.cpp
     src/ipc/vox_server_helper.cpp)
+
+pelorin_component(log_loggable LEVEL 4 LIBRARY pelorin
+  HEADERS
+    include/plr/log/loggable.h
+    include/plr/log/shared_loggable.h)
 
 pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
   HEADERS
