@@ -8,6 +8,7 @@ pelorin_component(base LEVEL 0 LIBRARY platform
     include/plr/base/thread_annotations.h
   SOURCES
     src/base/assert.cpp
+    src/base/brief_mutex.h
     src/base/report.cpp)
 
 pelorin_component(dispatch LEVEL 1 LIBRARY platform
@@ -172,19 +173,34 @@ pelorin_component(log_values LEVEL 2 LIBRARY pelorin
 
 pelorin_component(log_core LEVEL 3 LIBRARY pelorin
   HEADERS
+    include/plr/log/crash_drain.h
+    include/plr/log/log_server.h
+    include/plr/log/log_writer.h
     include/plr/log/logger.h
     include/plr/log/logger_base.h
     include/plr/log/logger_common_base.h
     include/plr/log/logger_tree.h
+    include/plr/log/memory_buffered_log_writer.h
+    include/plr/log/scoped_log_flusher.h
     include/plr/log/staged_logger.h
     include/plr/log/static_logger.h
     include/plr/log/tracked_logger.h
     include/plr/log/trel_context.h
   SOURCES
+    src/log/crash_drain.cpp
+    src/log/crash_drain.h
+    src/log/level_table.cpp
+    src/log/level_table.h
+    src/log/log_delivery.cpp
+    src/log/log_delivery.h
+    src/log/log_server.cpp
+    src/log/log_writer.cpp
     src/log/logger.cpp
     src/log/logger_base.cpp
     src/log/logger_common_base.cpp
     src/log/logger_tree.cpp
+    src/log/memory_buffered_log_writer.cpp
+    src/log/scoped_log_flusher.cpp
     src/log/staged_logger.cpp
     src/log/static_logger.cpp
     src/log/tracked_logger.cpp)

@@ -38,6 +38,8 @@ class PLR_EXPORT MemoryBufferedLogWriter : public LogWriter {
     [[nodiscard]] std::int64_t getDroppedMessageCount() const noexcept { return dropped_; }
 
   private:
+    friend class LogDelivery;  // reads the messages in a crash
+
     std::deque<std::shared_ptr<LogMessage>> messages_;  // oldest first
     const std::int64_t maxMessages_;
     const std::int64_t maxBytes_;

@@ -1,0 +1,317 @@
+#include "src/log/log_delivery.h"
+
+#include <pthread.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <utility>
+
+#include "plr/log/log_message.h"
+#include "plr/log/log_message_buffer.h"
+#include "plr/log/log_writer.h"
+#include "plr/log/memory_buffered_log_writer.h"
+#include "plr/log/static_logger.h"
+
+namespace plr {
+namespace {
+
+// How long messages may wait while others keep coming; bench/log_cases.h.
+constexpr std::chrono::microseconds kLinger{100};
+// So many that wait are delivered at once.
+constexpr std::size_t kPromptMessages = 256;
+// Room that is kept for the next burst, in messages: 1 MiB of pointers.
+constexpr std::size_t kKeptCapacity = 65536;
+
+// For a thread that came too late: the process is about to end.
+[[noreturn]] void restForEver() noexcept {
+    for (;;)
+        ::pause();
+}
+
+bool isUrgent(LogLevel level) noexcept {
+    return level == LogLevel::Error || level == LogLevel::Fatal;
+}
+
+}  // namespace
+
+// While one exists, writers may be in any state: a crash waits until it is gone,
+// or, on the same thread, carries on behind it.
+class LogDelivery::AtWork {
+  public:
+    explicit AtWork(LogDelivery& owner) noexcept : owner_(owner) {
+        owner_.worker_.store(::pthread_self(), std::memory_order_relaxed);
+        owner_.atWork_.store(true, std::memory_order_release);
+        if (owner_.crashing_.load(std::memory_order_acquire)) [[unlikely]] {
+            owner_.atWork_.store(false, std::memory_order_release);
+            restForEver();
+        }
+    }
+    ~AtWork() { owner_.atWork_.store(false, std::memory_order_release); }
+    AtWork(const AtWork&) = delete;
+    AtWork& operator=(const AtWork&) = delete;
+
+  private:
+    LogDelivery& owner_;
+};
+
+LogDelivery::LogDelivery(LogServer& server, const std::string& name,
+                         std::unique_ptr<MemoryBufferedLogWriter> startupBuffer)
+    : server_(server),
+      writersQueue_(dispatch::queue::create("logmaster::" + name + "::writers")),
+      startupBuffer_(std::move(startupBuffer)) {}
+
+LogDelivery::~LogDelivery() = default;
+
+// Queued work holds the server, which holds this object.
+template <class Work>
+void LogDelivery::runOnWriters(Work&& work) {
+    writersQueue_.queue().async(
+        [server = server_.shared_from_this(), this, work = std::forward<Work>(work)]() mutable {
+            writersQueue_.assertCurrent();
+            deliverPending();
+            work();
+        });
+}
+
+template <class Work>
+auto LogDelivery::syncOnWriters(Work&& work) {
+    return writersQueue_.queue().sync([&] {
+        writersQueue_.assertCurrent();
+        deliverPending();
+        return work();
+    });
+}
+
+// ---- From any thread ----
+
+// Hot path: bench/log_cases.h.
+void LogDelivery::log(MessagePtr&& message) {
+    const LogLevel level = message->getLevel();
+    lock_.lock();
+    if (limit_ != 0 && pending_.size() >= limit_ && !makeRoom()) [[unlikely]] {
+        lock_.unlock();
+        return;
+    }
+    pending_.push_back(std::move(message));
+    const bool wake = mustSchedule(level);
+    lock_.unlock();
+    if (wake)
+        schedule();
+}
+
+// Returns with the lock held, as it came, and whether there is room now.
+bool LogDelivery::makeRoom() {
+    while (limit_ != 0 && pending_.size() >= limit_) {
+        if (whenFull_ == LogServer::WhenFull::Drop) {
+            ++dropped_;
+            return false;
+        }
+        if (writersQueue_.queue().is_current())
+            return true;
+        const std::uint32_t seen = room_.load();
+        const bool wake = std::exchange(state_, State::Scheduled) != State::Scheduled;
+        lock_.unlock();
+        if (wake)
+            schedule();
+        room_.wait(seen);
+        lock_.lock();
+    }
+    return true;
+}
+
+bool LogDelivery::mustSchedule(LogLevel level) {
+    const bool wake =
+        state_ == State::Idle ||
+        (state_ == State::Lingering && (pending_.size() >= kPromptMessages || isUrgent(level)));
+    if (wake)
+        state_ = State::Scheduled;
+    return wake;
+}
+
+void LogDelivery::schedule() {
+    // Without an owner the server is on its way out: nobody is left to write for.
+    if (auto server = ownerOfServer())
+        writersQueue_.queue().async([server = std::move(server), this] {
+            writersQueue_.assertCurrent();
+            deliverScheduled();
+        });
+}
+
+std::shared_ptr<LogServer> LogDelivery::ownerOfServer() const noexcept {
+    return server_.std::enable_shared_from_this<LogServer>::weak_from_this().lock();
+}
+
+void LogDelivery::limitPending(std::size_t messages, LogServer::WhenFull policy) {
+    {
+        const detail::BriefLock guard(lock_);
+        limit_ = messages;
+        whenFull_ = policy;
+    }
+    announceRoom();
+}
+
+void LogDelivery::announceRoom() noexcept {
+    room_.fetch_add(1);
+    room_.notify_all();
+}
+
+void LogDelivery::addWriter(std::shared_ptr<LogWriter>&& writer) {
+    runOnWriters([this, writer = std::move(writer)] {
+        writersQueue_.assertCurrent();
+        writers_.push_back({writer, dynamic_cast<BatchLogWriter*>(writer.get())});
+    });
+}
+
+void LogDelivery::flush(dispatch::group_session session) {
+    runOnWriters([this, session = std::move(session)] {
+        writersQueue_.assertCurrent();
+        const AtWork guard(*this);
+        for (const Writer& to : writers_)
+            to.writer->flush(session);
+    });
+}
+
+void LogDelivery::close() {
+    runOnWriters([this] {
+        writersQueue_.assertCurrent();
+        const AtWork guard(*this);
+        for (const Writer& to : writers_)
+            to.writer->close();
+    });
+}
+
+void LogDelivery::flushStartupMessages() {
+    syncOnWriters([this] {
+        writersQueue_.assertCurrent();
+        writeStartupMessages();
+    });
+}
+
+void LogDelivery::debugFlush() {
+    syncOnWriters([] {});
+}
+
+vox::array LogDelivery::describeWriters(Report report) {
+    return syncOnWriters([this, report] {
+        writersQueue_.assertCurrent();
+        const AtWork guard(*this);
+        const vox::array descriptions = vox::array::create();
+        for (const Writer& asked : writers_) {
+            const vox::dict description(report == Report::Full ? asked.writer->getFullConfig()
+                                                               : asked.writer->getSimpleConfig());
+            if (description)
+                descriptions.append(description);
+        }
+        return descriptions;
+    });
+}
+
+// ---- On the writers queue ----
+
+void LogDelivery::deliverScheduled() {
+    const bool delivered = deliverPending();
+    State next{};
+    {
+        const detail::BriefLock guard(lock_);
+        next = !pending_.empty() ? State::Scheduled : delivered ? State::Lingering : State::Idle;
+        state_ = next;
+    }
+    // More goes behind what others have queued here meanwhile.
+    if (next == State::Scheduled)
+        schedule();
+    else if (next == State::Lingering)
+        linger();
+}
+
+void LogDelivery::linger() {
+    if (std::exchange(timerIsSet_, true))
+        return;
+    writersQueue_.queue().after(dispatch::time::after(kLinger),
+                                dispatch::block<void()>([server = ownerOfServer(), this] {
+                                    writersQueue_.assertCurrent();
+                                    lookAgain();
+                                }));
+}
+
+void LogDelivery::lookAgain() {
+    timerIsSet_ = false;
+    {
+        const detail::BriefLock guard(lock_);
+        if (state_ != State::Lingering)
+            return;
+        state_ = State::Scheduled;
+    }
+    deliverScheduled();
+}
+
+// Returns whether there was anything.
+bool LogDelivery::deliverPending() {
+    if (!takePending())
+        return false;
+    writeBatch();
+    return true;
+}
+
+bool LogDelivery::takePending() {
+    std::uint64_t dropped = 0;
+    bool limited = false;
+    {
+        const detail::BriefLock guard(lock_);
+        if (pending_.empty())
+            return false;
+        batch_.swap(pending_);
+        dropped = std::exchange(dropped_, 0);
+        limited = limit_ != 0;
+    }
+    if (limited)
+        announceRoom();
+    if (dropped != 0)
+        batch_.push_back(note(dropped, " log messages dropped, too many were waiting"));
+    return true;
+}
+
+// Hot path: bench/log_cases.h.
+void LogDelivery::writeBatch() {
+    for (std::size_t i = 0; i < batch_.size(); ++i) {
+        const AtWork guard(*this);
+        MessagePtr& message = batch_[i];
+        if (startupBuffer_)
+            startupBuffer_->write(message);
+        for (const Writer& to : writers_)
+            if (!startupBuffer_)
+                to.writer->write(message);
+        next_.store(i + 1, std::memory_order_release);
+        message.reset();
+    }
+    const AtWork guard(*this);
+    for (const Writer& to : writers_)
+        if (to.batching)
+            to.batching->endBatch();
+    batch_.clear();
+    next_.store(0, std::memory_order_release);
+    if (batch_.capacity() > kKeptCapacity)
+        batch_ = Batch();
+}
+
+void LogDelivery::writeStartupMessages() {
+    if (!startupBuffer_)
+        return;
+    const std::unique_ptr<MemoryBufferedLogWriter> buffer = std::move(startupBuffer_);
+    std::deque<MessagePtr> held = buffer->drain();
+    const std::int64_t dropped = buffer->getDroppedMessageCount();
+    if (dropped >= 1)
+        held.push_front(
+            note(static_cast<std::uint64_t>(dropped), " log messages dropped prior to log start"));
+    batch_.assign(std::make_move_iterator(held.begin()), std::make_move_iterator(held.end()));
+    writeBatch();
+}
+
+LogDelivery::MessagePtr LogDelivery::note(std::uint64_t count, const char* what) const {
+    const StaticLogger logger(server_.getName(), ownerOfServer());
+    LogMessageBuffer text;
+    text << "Note: " << count << what;
+    return logger.buildMessage(LogLevel::Info, std::move(text));
+}
+
+}  // namespace plr

@@ -1,0 +1,116 @@
+#pragma once
+
+#include <pthread.h>
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "dispatch/group.h"
+#include "dispatch/queue.h"
+#include "plr/concurrency/queue_role.h"
+#include "plr/ipc/array.h"
+#include "plr/log/log_server.h"
+#include "src/base/brief_mutex.h"
+
+// How messages get from log() to the writers.
+//
+// Threads: log() on any; the rest on the writers queue, or queueing there.
+// State:   Idle: nothing waits, the next message schedules a delivery.
+//          Scheduled: a delivery is queued or running.
+//          Lingering: a delivery has just run; a timer looks again soon, so
+//          that messages that follow each other wake nobody, one by one.
+// Whatever else runs on the writers queue delivers first what waits.
+namespace plr {
+
+class BatchLogWriter;
+
+class LogDelivery {
+  public:
+    using MessagePtr = std::shared_ptr<LogMessage>;
+
+    LogDelivery(LogServer& server, const std::string& name,
+                std::unique_ptr<MemoryBufferedLogWriter> startupBuffer);
+    ~LogDelivery();
+
+    void log(MessagePtr&& message);
+    void limitPending(std::size_t messages, LogServer::WhenFull policy);
+
+    void addWriter(std::shared_ptr<LogWriter>&& writer);
+    void flush(dispatch::group_session session);
+    void close();
+    // These wait for the writers queue.
+    void flushStartupMessages();
+    void debugFlush();
+    enum class Report { Simple, Full };
+    [[nodiscard]] vox::array describeWriters(Report report);
+
+    // In a signal handler of a dying process: stops the writers queue and writes
+    // what it did not get to. Async-signal-safe.
+    void drainInCrash() noexcept;
+
+  private:
+    using Batch = std::vector<MessagePtr>;
+    enum class State : std::uint8_t { Idle, Scheduled, Lingering };
+    struct Writer {
+        std::shared_ptr<LogWriter> writer;
+        BatchLogWriter* batching;  // the same one, or null
+    };
+
+    // From any thread.
+    [[nodiscard]] bool makeRoom() PLR_REQUIRES(lock_);
+    [[nodiscard]] bool mustSchedule(LogLevel level) PLR_REQUIRES(lock_);
+    void schedule();
+    void announceRoom() noexcept;
+    [[nodiscard]] std::shared_ptr<LogServer> ownerOfServer() const noexcept;
+    template <class Work>
+    void runOnWriters(Work&& work);
+    template <class Work>
+    auto syncOnWriters(Work&& work);
+
+    // On the writers queue.
+    void deliverScheduled() PLR_ON(writersQueue_);
+    void lookAgain() PLR_ON(writersQueue_);
+    void linger() PLR_ON(writersQueue_);
+    bool deliverPending() PLR_ON(writersQueue_);
+    [[nodiscard]] bool takePending() PLR_ON(writersQueue_);
+    void writeBatch() PLR_ON(writersQueue_);
+    void writeStartupMessages() PLR_ON(writersQueue_);
+    [[nodiscard]] MessagePtr note(std::uint64_t count, const char* what) const;
+
+    class AtWork;
+
+    // In a signal handler.
+    void stopWriters() noexcept;
+    void writeInCrash(const LogMessage& message) noexcept;
+    void writeBatchInCrash() noexcept;
+    void writePendingInCrash() noexcept;
+
+    LogServer& server_;
+    const QueueRole writersQueue_;
+
+    detail::BriefMutex lock_;
+    Batch pending_ PLR_GUARDED_BY(lock_);
+    State state_ PLR_GUARDED_BY(lock_) = State::Idle;
+    std::size_t limit_ PLR_GUARDED_BY(lock_) = 0;  // messages; 0 for none
+    LogServer::WhenFull whenFull_ PLR_GUARDED_BY(lock_) = LogServer::WhenFull::Wait;
+    std::uint64_t dropped_ PLR_GUARDED_BY(lock_) = 0;  // behind what is in pending_
+    std::atomic<std::uint32_t> room_{0};               // counts times that pending_ was taken
+
+    std::unique_ptr<MemoryBufferedLogWriter> startupBuffer_ PLR_CONFINED_TO(writersQueue_);
+    std::vector<Writer> writers_ PLR_CONFINED_TO(writersQueue_);
+    Batch batch_ PLR_CONFINED_TO(writersQueue_);
+    bool timerIsSet_ PLR_CONFINED_TO(writersQueue_)
+    = false;
+
+    // What a crash must know about the writers queue.
+    std::atomic<std::size_t> next_{0};   // in batch_: the first that is not written
+    std::atomic<bool> atWork_{false};    // a writer is being called
+    std::atomic<pthread_t> worker_{0};   // the thread that calls it
+    std::atomic<bool> crashing_{false};  // writers are not to be called any more
+};
+
+}  // namespace plr
