@@ -1,0 +1,239 @@
+#include "plr/log/logger.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <thread>
+
+#include "plr/ipc/values.h"
+#include "plr/log/log_message.h"
+#include "plr/log/staged_logger.h"
+#include "plr/log/static_logger.h"
+#include "support/log_fixture.h"
+#include "support/manual_calendar.h"
+#include "support/waiting.h"
+
+namespace {
+
+using enum plr::LogLevel;
+using plr::LoggerCommonBase;
+using plr::LogLevel;
+using plr::LogMessageBuffer;
+using plr::LogServer;
+using plr::MetaData;
+using plr::StagedLogger;
+using plr::StaticLogger;
+using plr::TrelContext;
+using plr::TrelLogger;
+using plr::test::LogFixture;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using ServerLogger = plr::LoggerBase<std::shared_ptr<LogServer>>;
+
+TEST(LoggerCommonBase, LetsThroughWhatIsAtLeastItsLevel) {
+    struct Row {
+        LogLevel local, inherited, effective;
+    };
+    const Row rows[] = {{Unset, Info, Info},     {Trace, Info, Trace},
+                        {Fatal, Info, Fatal},    {Unset, Unset, Unset},
+                        {Debug, Never, Never},   {Never, Debug, Never},
+                        {Unset, Always, Always}, {LogLevel{30}, Warn, LogLevel{30}}};
+    for (const Row& row : rows) {
+        SCOPED_TRACE(testing::Message() << row.local << " below " << row.inherited);
+        LoggerCommonBase logger("domain", nullptr);
+        logger.setLogLevel(row.local);
+        logger.setInheritedLogLevel(row.inherited);
+        EXPECT_EQ(logger.getLogLevel(), row.effective);
+        EXPECT_EQ(logger.getLocalLogLevel(), row.local);
+        EXPECT_EQ(logger.getInheritedLogLevel(), row.inherited);
+        for (int level = 0; level <= 255; ++level)
+            EXPECT_EQ(logger.enabled(static_cast<LogLevel>(level)),
+                      level >= static_cast<int>(row.effective))
+                << level;
+    }
+}
+
+TEST(LoggerCommonBase, IsReadWhileBothItsLevelsAreSet) {
+    LoggerCommonBase logger("domain", nullptr);
+    logger.setLogLevel(Warn);
+    const auto set = [&logger](void (LoggerCommonBase::*setter)(LogLevel), LogLevel last) {
+        for (int i = 0; i < 20'000; ++i)
+            (logger.*setter)(i % 2 ? Debug : Error);
+        (logger.*setter)(last);
+    };
+    {
+        const std::jthread local(set, &LoggerCommonBase::setLogLevel, Unset);
+        const std::jthread inherited(set, &LoggerCommonBase::setInheritedLogLevel, Notice);
+        for (int i = 0; i < 20'000; ++i)
+            ASSERT_TRUE(logger.enabled(Fatal));
+    }
+    EXPECT_EQ(logger.getLogLevel(), Notice);
+}
+
+// Counts of a handle of the test's own: what they are, above the start, while the
+// objects live, and afterwards.
+TEST(LoggerHandles, AreCountedOddly) {
+    const trel_t handle = trel_create("test", "counts");
+    long start = 0;
+    long alive = 0;
+    const auto count = [&] { return trel_get_reference_count(handle) - start; };
+    const auto look = [&](const auto&...) { alive = count(); };
+    const auto context = [] { return TrelContext("test", "counts"); };
+    struct Row {
+        const char* name;
+        std::function<void()> run;
+        long alive, gone;
+    };
+    const Row rows[] = {
+        {"context of a pair", [&] { look(context()); }, 1, 0},
+        {"context of a handle", [&] { look(TrelContext(handle, "name")); }, 1, 0},
+        {"handle alone", [&] { look(TrelLogger("test", "counts")); }, 1, 0},
+        {"copied and moved contexts",
+         [&] {
+             TrelContext one = context();
+             TrelContext two = one;
+             TrelContext three = std::move(one);
+             three = two;
+             two = std::move(three);
+             EXPECT_EQ(three.handle(), nullptr);
+             look(two);
+         },
+         1, 0},
+        {"base of a handle", [&] { look(LoggerCommonBase("domain", handle)); }, 1, 0},
+        {"base of a context", [&] { look(LoggerCommonBase(context())); }, 1, 0},
+        {"base moved and assigned",
+         [&] {
+             LoggerCommonBase one("domain", handle);
+             LoggerCommonBase two(std::move(one));
+             LoggerCommonBase three("other", nullptr);
+             three = two;
+             two = std::move(three);
+             look(two);
+         },
+         1, 0},
+        // The copy releases what it should have retained, and once more at its end.
+        {"base copied",
+         [&] {
+             const LoggerCommonBase one("domain", handle);
+             const LoggerCommonBase two(one);
+             look(two);
+         },
+         0, -2},
+        // Never retained, and yet released in the end.
+        {"logger of a context", [&] { look(ServerLogger(context(), nullptr)); }, 0, -1},
+        {"logger copied",
+         [&] {
+             const ServerLogger one(context(), nullptr);
+             look(StaticLogger(one));
+         },
+         -1, -3},
+    };
+    for (const Row& row : rows) {
+        start = trel_get_reference_count(handle);
+        row.run();
+        EXPECT_EQ(alive, row.alive) << row.name << ", alive";
+        EXPECT_EQ(count(), row.gone) << row.name << ", gone";
+    }
+}
+
+using Loggers = LogFixture;
+
+TEST_F(Loggers, BuildMessagesFromTheBuffersContents) {
+    const plr::test::ManualCalendar calendar(std::chrono::nanoseconds(1'234'567'890));
+    const StaticLogger logger("radio.modem", server_);
+    LogMessageBuffer buffer;
+    buffer << "cell " << 7 << MetaData("band=3");
+    const auto message = logger.buildMessage(Notice, std::move(buffer));
+    EXPECT_EQ(message->getTimeStamp(), 1'234'567'890);
+    EXPECT_EQ(message->getLevel(), Notice);
+    EXPECT_EQ(message->getDomain(), "radio.modem");
+    EXPECT_EQ(message->getText(), "cell 7");
+    EXPECT_THAT(message->getMetaData(), ElementsAre("band=3"));
+    EXPECT_TRUE(buffer.empty());  // NOLINT(bugprone-use-after-move): promised
+}
+
+TEST_F(Loggers, LogWhateverTheLevelButOnlyToAServer) {
+    StaticLogger logger("radio", server_);
+    logger.setLogLevel(Never);
+    logger.forceLog(Trace, LogMessageBuffer() << "forced");
+    logger.setLogServer(nullptr);
+    logger.forceLog(Fatal, LogMessageBuffer() << "to nobody");
+    EXPECT_THAT(takeLines(), ElementsAre("T radio forced"));
+}
+
+TEST_F(Loggers, WithoutAQueueLearnTheirLevelWhenMadeAndWhenTold) {
+    configure("radio", Debug);
+    StaticLogger logger(TrelContext("test", "radio.modem"), server_);
+    EXPECT_EQ(logger.getLogLevel(), Debug);
+    configure("radio", Warn);
+    logger.setLogDomain("other");
+    EXPECT_EQ(logger.getLogLevel(), Debug);
+    logger.updateLogLevel();
+    EXPECT_EQ(logger.getLogLevel(), Info);
+
+    EXPECT_EQ(StaticLogger(logger).getLogDomain(), "other");
+    StaticLogger nobodys;
+    nobodys.updateLogLevel();
+    EXPECT_EQ(nobodys.getLogLevel(), Unset);
+}
+
+TEST_F(Loggers, StageLinesForOneMessageAtTheHighestLevel) {
+    struct Line {
+        LogLevel level;
+        const char* text;
+    };
+    struct Row {
+        const char* name;
+        std::vector<Line> lines;
+        std::vector<std::string> logged;
+    };
+    const Row rows[] = {
+        {"none", {}, {}},
+        {"an empty one", {{Error, ""}}, {}},
+        {"two", {{Info, "x"}, {Error, "y"}}, {"E radio x\ny"}},
+        {"the highest first", {{Fatal, "x"}, {Trace, "y"}}, {"F radio x\ny"}},
+        {"empty ones between",
+         {{Info, ""}, {Info, "x"}, {Warn, ""}, {Info, "y"}},
+         {"W radio x\ny"}},
+    };
+    for (const Row& row : rows) {
+        {
+            const StagedLogger logger("radio", server_);
+            for (const Line& line : row.lines)
+                logger.forceLog(line.level, LogMessageBuffer() << line.text);
+            EXPECT_THAT(takeLines(), IsEmpty()) << row.name;
+        }
+        EXPECT_EQ(takeLines(), row.logged) << row.name;
+    }
+}
+
+TEST_F(Loggers, WithAQueueAreTrackedThere) {
+    configure("radio", Debug);
+    const dispatch::queue queue = dispatch::queue::create("loggers");
+    queue.suspend();
+    auto logger = plr::Logger::create(queue, server_, "first", TrelContext("test", "radio.modem"));
+    server_->debugFlush();
+    EXPECT_EQ(logger->getInheritedLogLevel(), Unset) << "its queue has not run";
+    queue.resume();
+    plr::test::drain(queue);
+    EXPECT_EQ(logger->getInheritedLogLevel(), Debug);
+
+    configure("radio", Warn);
+    plr::test::drain(queue);
+    EXPECT_FALSE(logger->enabled(Notice));
+    logger->setLogLevel(Trace);
+    EXPECT_EQ(logger->getName(), "first");
+    EXPECT_EQ(logger->getTrackedLoggerName(), "first");
+    EXPECT_EQ(logger->getTrackedLogLevel(), Trace);
+    EXPECT_EQ(logger->getLogDomain(), "radio.modem");
+
+    const std::weak_ptr<plr::Logger> end = logger;
+    logger.reset();
+    configure("radio", Error);  // nobody is there to be told
+    EXPECT_TRUE(end.expired());
+    EXPECT_EQ(plr::Logger::create(queue, nullptr, "lone", TrelContext("test", "x"))->getLogLevel(),
+              Unset);
+}
+
+}  // namespace
