@@ -9,6 +9,7 @@ pelorin_component(base LEVEL 0 LIBRARY platform
   SOURCES
     src/base/assert.cpp
     src/base/brief_mutex.h
+    src/base/magazines.h
     src/base/report.cpp)
 
 pelorin_component(dispatch LEVEL 1 LIBRARY platform
@@ -42,7 +43,9 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/spin_lock.h
     platform/linux/dispatch/time.cpp
     platform/linux/dispatch/timer_queue.cpp
-    platform/linux/dispatch/timer_queue.h)
+    platform/linux/dispatch/timer_queue.h
+    platform/linux/dispatch/timer_wheel.cpp
+    platform/linux/dispatch/timer_wheel.h)
 
 pelorin_component(vox_values LEVEL 1 LIBRARY platform
   HEADERS
@@ -128,7 +131,29 @@ pelorin_component(trel LEVEL 1 LIBRARY platform
 
 pelorin_component(kel LEVEL 1 LIBRARY platform
   HEADERS
-    platform/include/kel/kel.h)
+    platform/include/kel/kel.h
+  SOURCES
+    platform/linux/kel/backlog.cpp
+    platform/linux/kel/backlog.h
+    platform/linux/kel/client.cpp
+    platform/linux/kel/client.h
+    platform/linux/kel/destination.cpp
+    platform/linux/kel/destination.h
+    platform/linux/kel/escape.cpp
+    platform/linux/kel/escape.h
+    platform/linux/kel/kel.cpp
+    platform/linux/kel/lock.h
+    platform/linux/kel/message.cpp
+    platform/linux/kel/message.h
+    platform/linux/kel/native.cpp
+    platform/linux/kel/native.h
+    platform/linux/kel/record.cpp
+    platform/linux/kel/record.h
+    platform/linux/kel/send_now.cpp
+    platform/linux/kel/sender.cpp
+    platform/linux/kel/sender.h
+    platform/linux/kel/socket_io.cpp
+    platform/linux/kel/socket_io.h)
 
 pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
   HEADERS

@@ -80,9 +80,9 @@ PLR_EXPORT void kel_free(kel_message_t message);
 // the client may go on or follow. Returns the number of messages given up.
 PLR_EXPORT size_t kel_close(kel_client_t client);
 
-// Waits until nothing waits in the backlog, at most `milliseconds`. Returns
-// whether it is empty.
-PLR_EXPORT int kel_flush(kel_client_t client, unsigned milliseconds);
+// Waits until nothing waits in the backlog, at most `bound` milliseconds.
+// Returns whether nothing does.
+PLR_EXPORT int kel_flush(kel_client_t client, unsigned bound);
 
 // What happened to the messages given to kel_send(); messages that the client
 // made itself are not counted. sent + dropped + waiting is all of them.
@@ -103,10 +103,10 @@ struct kel_limits {
     size_t bytes;
     unsigned patience_ms;
 };
-#define KEL_DEFAULT_MESSAGES ((size_t)131072)
-#define KEL_DEFAULT_BYTES ((size_t)64 << 20)
+#define KEL_DEFAULT_MESSAGES 131072u
+#define KEL_DEFAULT_BYTES 67108864u
 #define KEL_DEFAULT_PATIENCE_MS 10000u
-#define KEL_MESSAGE_OVERHEAD ((size_t)96)
+#define KEL_MESSAGE_OVERHEAD 96u
 PLR_EXPORT void kel_set_limits(kel_client_t client, struct kel_limits limits);
 
 // A message of the library's own, without a client: "Message" is formatted like
@@ -122,8 +122,8 @@ PLR_EXPORT void kel_vlog(int priority, const char* format, va_list arguments)
 // `domain` ("Facility") may be null. At most KEL_SEND_NOW_BYTES of the text count,
 // KEL_SEND_NOW_LINE where there is no journal. Not counted in the statistics.
 // Returns whether the kernel took it.
-#define KEL_SEND_NOW_BYTES ((size_t)32768)
-#define KEL_SEND_NOW_LINE ((size_t)1024)
+#define KEL_SEND_NOW_BYTES 32768u
+#define KEL_SEND_NOW_LINE 1024u
 PLR_EXPORT int kel_send_now(kel_client_t client, int priority, const char* domain, const char* text,
                             size_t length);
 
