@@ -1,5 +1,6 @@
 #include "plr/log/log_message_buffer.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cstdio>
 #include <iterator>
@@ -11,15 +12,49 @@ namespace {
 // Texts of up to this length are formatted in one pass.
 constexpr std::size_t kFirstAttempt = 64;
 
-// Without a stream, numbers are written here as a new stream would: in the
-// global locale, which may group digits or have a comma for a point.
-bool numbersAreClassic() {
-    return std::locale() == std::locale::classic();
+// Texts start with room for this many bytes, and keep it for the thread's next
+// buffer unless they grew beyond the second.
+constexpr std::size_t kRoom = 128;
+constexpr std::size_t kKeptRoom = 1024;
+
+// What a thread's last buffer left for its next.
+struct Spares {
+    std::string text;
+    std::unique_ptr<std::ostringstream> stream;
+    ~Spares();
+};
+[[gnu::tls_model("initial-exec")]] thread_local constinit bool sparesEnded = false;
+[[gnu::tls_model("initial-exec")]] thread_local Spares spares;
+Spares::~Spares() {
+    sparesEnded = true;
+}
+
+std::unique_ptr<std::ostringstream> takeStream() {
+    if (sparesEnded || !spares.stream)
+        return std::make_unique<std::ostringstream>();
+    return std::move(spares.stream);
+}
+
+// Leaves nothing that could be told from a new stream.
+void keepStream(std::unique_ptr<std::ostringstream> used) {
+    static const std::ios pristine(nullptr);
+    std::ios& base = *used;
+    if (sparesEnded || spares.stream || base.rdbuf() != used->rdbuf() ||
+        used->view().size() > kKeptRoom)
+        return;
+    base.exceptions(std::ios_base::goodbit);
+    base.clear();
+    base.copyfmt(pristine);
+    used->str({});
+    spares.stream = std::move(used);
 }
 
 }  // namespace
 
-LogMessageBuffer::LogMessageBuffer() noexcept = default;
+LogMessageBuffer::LogMessageBuffer() noexcept {
+    if (!sparesEnded)
+        text_.swap(spares.text);
+}
 
 LogMessageBuffer LogMessageBuffer::vCreateWithFormat(const char* format, va_list arguments) {
     LogMessageBuffer buffer;
@@ -62,12 +97,18 @@ LogMessageBuffer& LogMessageBuffer::operator=(LogMessageBuffer other) noexcept {
     return *this;
 }
 
-LogMessageBuffer::~LogMessageBuffer() = default;
+LogMessageBuffer::~LogMessageBuffer() {
+    if (sparesEnded || text_.capacity() < kRoom || text_.capacity() > kKeptRoom)
+        return;
+    text_.clear();
+    spares.text.swap(text_);
+}
 
 void LogMessageBuffer::swap(LogMessageBuffer& other) noexcept {
     text_.swap(other.text_);
     stream_.swap(other.stream_);
     metaData_.swap(other.metaData_);
+    std::swap(numbers_, other.numbers_);
 }
 
 std::string_view LogMessageBuffer::content() const noexcept {
@@ -75,9 +116,10 @@ std::string_view LogMessageBuffer::content() const noexcept {
 }
 
 const std::string& LogMessageBuffer::str() {
+    numbers_ = Numbers::Unknown;
     if (stream_) {
         text_ = stream_->view();
-        stream_.reset();
+        keepStream(std::move(stream_));
     }
     return text_;
 }
@@ -92,7 +134,8 @@ std::vector<std::string>&& LogMessageBuffer::takeMetadata() noexcept {
 }
 
 std::ostream& LogMessageBuffer::makeStream() {
-    auto made = std::make_unique<std::ostringstream>();
+    auto made = takeStream();
+    made->imbue(std::locale());
     made->unsetf(std::ios_base::skipws);
     made->setf(std::ios_base::boolalpha);
     made->write(text_.data(), static_cast<std::streamsize>(text_.size()));
@@ -105,6 +148,8 @@ LogMessageBuffer::operator std::ostream&() {
 }
 
 void LogMessageBuffer::append(std::string_view text) {
+    if (text_.capacity() < kRoom) [[unlikely]]
+        text_.reserve(std::max(kRoom, text_.size() + text.size()));
     text_.append(text);
 }
 
@@ -146,10 +191,18 @@ void LogMessageBuffer::merge(LogMessageBuffer&& other) {
                      std::make_move_iterator(other.metaData_.end()));
 }
 
+// A new stream takes the global locale, which may group digits or have a comma
+// for a point. Asked once for each text: it is dearer than the digits.
+bool LogMessageBuffer::hasClassicNumbers() {
+    if (numbers_ == Numbers::Unknown)
+        numbers_ = std::locale() == std::locale::classic() ? Numbers::Classic : Numbers::Localised;
+    return numbers_ == Numbers::Classic;
+}
+
 // Hot path: bench/log_cases.h.
 template <class Number>
 void LogMessageBuffer::insert(Number number) {
-    if (stream_ || !numbersAreClassic()) {
+    if (stream_ || !hasClassicNumbers()) {
         static_cast<std::ostream&>(*this) << number;
         return;
     }

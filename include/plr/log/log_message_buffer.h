@@ -101,11 +101,15 @@ class PLR_EXPORT LogMessageBuffer {
     void append(std::string_view text);
     template <class Number>
     void insert(Number number);
+    [[nodiscard]] bool hasClassicNumbers();
     std::ostream& makeStream();
+
+    enum class Numbers : unsigned char { Unknown, Classic, Localised };
 
     std::string text_;  // stale while there is a stream
     std::unique_ptr<std::ostringstream> stream_;
     std::vector<std::string> metaData_;
+    Numbers numbers_ = Numbers::Unknown;  // how they are written without a stream
 };
 
 inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, const std::string& text) {

@@ -19,9 +19,8 @@ namespace plr {
 template <class T, class LoggerType = LoggerBase<std::shared_ptr<LogServer>>>
 class Loggable : public TrackedLogger {
   public:
-    // For those who log in this object's name, and for its local level.
+    // For helpers that log in this object's name.
     [[nodiscard]] const LoggerType& logger() const noexcept { return logger_; }
-    [[nodiscard]] LoggerType& logger() noexcept { return logger_; }
 
     void updateTrackedConfig(LogLevel level) override { logger_.setInheritedLogLevel(level); }
     using TrackedLogger::updateTrackedConfig;
@@ -44,6 +43,8 @@ class Loggable : public TrackedLogger {
     void forceLog(LogLevel level, LogMessageBuffer&& buffer) const {
         logger_.forceLog(level, std::move(buffer));
     }
+    // The logger's own level; Unset leaves it to the domain.
+    void setLogLevel(LogLevel level) noexcept { logger_.setLogLevel(level); }
 
     // Registers the logger, if there is a server. The object is owned already.
     // Called before anybody else can reach the object, on any thread.
