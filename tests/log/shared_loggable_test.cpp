@@ -31,6 +31,7 @@ class Radio : public plr::SharedLoggable<Radio> {
     }
     ~Radio() override { EXPECT_TRUE(ownQueue_.queue().is_current()); }
 
+    using Loggable::setLogLevel;
     void report(plr::LogLevel level, const char* text) const {
         if (enabled(level))
             forceLog(level, LogMessageBuffer() << text);
@@ -74,7 +75,7 @@ TEST_F(SharedLoggable, FollowsTheServerWithoutATurnOnItsQueue) {
         radio->report(Notice, "too little");
         radio->report(Warn, "enough");
     });
-    radio->logger().setLogLevel(Notice);
+    radio->setLogLevel(Notice);
     EXPECT_EQ(radio->getTrackedLogLevel(), Notice);
     radio->report(Notice, "now enough");
     EXPECT_THAT(takeLines(), ElementsAre("W radio enough", "N radio now enough"));
