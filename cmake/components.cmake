@@ -40,6 +40,8 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/queue_specific.cpp
     platform/linux/dispatch/run_list.h
     platform/linux/dispatch/source.cpp
+    platform/linux/dispatch/source_core.cpp
+    platform/linux/dispatch/source_core.h
     platform/linux/dispatch/spin_lock.h
     platform/linux/dispatch/time.cpp
     platform/linux/dispatch/timer_queue.cpp
@@ -128,6 +130,14 @@ pelorin_component(trel LEVEL 1 LIBRARY platform
     platform/include/trel/trel.h
   SOURCES
     platform/linux/trel/trel.cpp)
+
+pelorin_component(ob LEVEL 1 LIBRARY platform
+  HEADERS
+    platform/include/ob/ob.h
+  SOURCES
+    platform/linux/ob/format.cpp
+    platform/linux/ob/object.cpp
+    platform/linux/ob/object.h)
 
 pelorin_component(kel LEVEL 1 LIBRARY platform
   HEADERS
