@@ -19,6 +19,7 @@
 #define PLR_ACQUIRE(...) PLR_ATTRIBUTE(acquire_capability(__VA_ARGS__))
 #define PLR_TRY_ACQUIRE(...) PLR_ATTRIBUTE(try_acquire_capability(__VA_ARGS__))
 #define PLR_RELEASE(...) PLR_ATTRIBUTE(release_capability(__VA_ARGS__))
+#define PLR_RETURN_CAPABILITY(x) PLR_ATTRIBUTE(lock_returned(x))
 #define PLR_EXCLUDES(mutex) PLR_ATTRIBUTE(locks_excluded(mutex))
 #define PLR_ASSERT_CAPABILITY(x) PLR_ATTRIBUTE(assert_capability(x))
 #define PLR_NO_THREAD_SAFETY_ANALYSIS PLR_ATTRIBUTE(no_thread_safety_analysis)

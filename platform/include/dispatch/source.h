@@ -61,10 +61,12 @@ class source {
     PLR_EXPORT void set_cancel_handler(block<void()> handler) const;
 
     // First call at `start`, then every `interval` counted from it, so that no
-    // delay adds up; an interval of dispatch::kOnce means once. Firings that
-    // were missed arrive as one call, see data(). `leeway`: the delay that the
-    // caller would not mind; kept for callers' sake, timers are always as exact
-    // as the system. Setting again replaces. Timers only.
+    // delay adds up; an interval of dispatch::kOnce, as any that is not positive,
+    // means once. Firings that were missed arrive as one call, see data().
+    // `leeway`: the delay that the caller would not mind; kept for callers' sake,
+    // timers are always as exact as the system. Setting again replaces. Timers
+    // only. Cost: a few instructions, whatever else is pending; a system call
+    // only when it becomes the earliest of all (bench/timers_cases.h).
     PLR_EXPORT void set_timer(time start, std::chrono::nanoseconds interval,
                               std::chrono::nanoseconds leeway = {}) const;
 
@@ -92,7 +94,7 @@ class source {
     detail::source_core* core_ = nullptr;
 };
 
-// The interval of a timer that fires once.
-inline constexpr std::chrono::nanoseconds kOnce = std::chrono::nanoseconds::max();
+// The interval of a timer that fires once: all 64 bits set, as in forever.
+inline constexpr std::chrono::nanoseconds kOnce{-1};
 
 }  // namespace dispatch

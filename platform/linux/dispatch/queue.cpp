@@ -10,22 +10,25 @@ namespace dispatch {
 namespace detail {
 namespace {
 
-// One pending queue::after().
-struct delayed final : timer_entry {
+// One pending queue::after(): first a timer, then work on the queue.
+struct delayed final : timer_entry, embedded_item {
     delayed(queue_core* on, block<void()> what) noexcept
-        : timer_entry(&delayed::fire), target(queue::from_raw(on)), work(std::move(what)) {}
+        : timer_entry(&delayed::fire),
+          embedded_item(&delayed::call),
+          target(queue::from_raw(on)),
+          work(std::move(what)) {}
 
     static void fire(timer_entry* entry, std::uint64_t) noexcept {
         auto* self = static_cast<delayed*>(entry);
-        // The work takes the handle along: its release may destroy the queue.
-        queue_core* on = self->target.get();
-        queue::from_raw(on).async(
-            [held = std::move(self->target), work = std::move(self->work)] { work(); });
-        delete self;
+        submit(self->target.get(), self);
+    }
+    static void call(embedded_item* item) noexcept {
+        const std::unique_ptr<delayed> self(static_cast<delayed*>(item));
+        self->work();
     }
 
-    queue target;
-    block<void()> work;
+    const queue target;
+    const block<void()> work;
 };
 
 }  // namespace
@@ -67,9 +70,12 @@ void queue::after(time when, block<void()> work) const {
         async(std::move(work));
         return;
     }
-    auto pending = std::make_unique<detail::delayed>(core_, std::move(work));
-    detail::poller::shared().timers().arm(*pending, when, 0);
-    static_cast<void>(pending.release());
+    auto* pending = new detail::delayed(core_, std::move(work));
+    detail::timer_queue& timers = detail::poller::shared().timers();
+    {
+        detail::scoped_lock guard(timers.lock());
+        timers.arm(*pending, when, 0);
+    }
     detail::pool::shared().ensure_poller();
 }
 

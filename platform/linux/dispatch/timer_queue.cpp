@@ -8,15 +8,20 @@
 #include <cerrno>
 #include <cstring>
 
+#include "dispatch/calendar.h"
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
 
 namespace dispatch::detail {
 namespace {
 
-constexpr std::size_t kArity = 4;
-
 constexpr clockid_t kClocks[] = {CLOCK_MONOTONIC, CLOCK_BOOTTIME, CLOCK_REALTIME};
+
+// Fired before others get the lock.
+constexpr unsigned kBatch = 64;
+
+// Of deadlines; what a period takes past it never comes.
+constexpr std::int64_t kLatest = (std::int64_t{1} << 62) - 1;
 
 }  // namespace
 
@@ -35,116 +40,88 @@ timer_queue::timer_queue(int epoll, std::uint64_t first_tag) noexcept {
     }
 }
 
-void timer_queue::place(per_clock& clock, std::size_t position, slot moved) noexcept {
-    clock.heap[position] = moved;
-    moved.entry->position_ = position;
-}
-
-void timer_queue::sift_up(per_clock& clock, std::size_t position) noexcept {
-    const slot moved = clock.heap[position];
-    while (position > 0) {
-        const std::size_t parent = (position - 1) / kArity;
-        if (clock.heap[parent].deadline <= moved.deadline)
-            break;
-        place(clock, position, clock.heap[parent]);
-        position = parent;
-    }
-    place(clock, position, moved);
-}
-
-void timer_queue::sift_down(per_clock& clock, std::size_t position) noexcept {
-    const slot moved = clock.heap[position];
-    for (;;) {
-        const std::size_t first = position * kArity + 1;
-        if (first >= clock.heap.size())
-            break;
-        const std::size_t end = std::min(first + kArity, clock.heap.size());
-        std::size_t least = first;
-        for (std::size_t child = first + 1; child < end; ++child)
-            if (clock.heap[child].deadline < clock.heap[least].deadline)
-                least = child;
-        if (moved.deadline <= clock.heap[least].deadline)
-            break;
-        place(clock, position, clock.heap[least]);
-        position = least;
-    }
-    place(clock, position, moved);
-}
-
-void timer_queue::remove(per_clock& clock, std::size_t position) noexcept {
-    clock.heap[position].entry->position_ = timer_entry::kNowhere;
-    const slot last = clock.heap.back();
-    clock.heap.pop_back();
-    if (position == clock.heap.size())
-        return;
-    place(clock, position, last);
-    sift_up(clock, position);
-    sift_down(clock, last.entry->position_);
-}
-
 // Only an earlier deadline costs a system call: a later one is found out when
 // the descriptor fires.
 void timer_queue::set_descriptor(per_clock& clock, dispatch::clock which) noexcept {
-    if (clock.heap.empty())
+    std::int64_t wanted = std::max<std::int64_t>(clock.wheel.earliest(), 1);
+    if (clock.armed <= wanted)
         return;
-    const std::int64_t earliest = std::max<std::int64_t>(clock.heap.front().deadline, 1);
-    if (clock.armed != 0 && clock.armed <= earliest)
-        return;
-    itimerspec setting{};
-    setting.it_value.tv_sec = earliest / 1'000'000'000;
-    setting.it_value.tv_nsec = earliest % 1'000'000'000;
     int flags = TFD_TIMER_ABSTIME;
-    if (which == dispatch::clock::wall)
+    if (which == dispatch::clock::wall) {
         flags |= TFD_TIMER_CANCEL_ON_SET;
+        // A stand-in moves by hand only; what it says is due must wake the poller.
+        if (!calendar::shared().is_kernels()) {
+            if (wanted > time::now(which).nanoseconds())
+                return;
+            wanted = 1;
+        }
+    }
+    itimerspec setting{};
+    setting.it_value.tv_sec = wanted / 1'000'000'000;
+    setting.it_value.tv_nsec = wanted % 1'000'000'000;
     ::timerfd_settime(clock.descriptor, flags, &setting, nullptr);
-    clock.armed = earliest;
+    clock.armed = wanted;
 }
 
-void timer_queue::arm(timer_entry& entry, time deadline, std::int64_t interval) {
-    scoped_lock guard(lock_);
-    if (entry.position_ != timer_entry::kNowhere)
-        remove(clocks_[static_cast<unsigned>(entry.clock_)], entry.position_);
+// Hot path: bench/timers_cases.h.
+void timer_queue::arm(timer_entry& entry, time deadline, std::int64_t interval) noexcept {
+    disarm(entry);
     if (deadline.is_forever())
         return;
-    per_clock& clock = clocks_[static_cast<unsigned>(deadline.on())];
-    clock.heap.push_back({deadline.nanoseconds(), &entry});
-    entry.deadline_ = deadline.nanoseconds();
-    entry.interval_ = interval;
+    per_clock& clock = of(deadline.on());
     entry.clock_ = deadline.on();
-    sift_up(clock, clock.heap.size() - 1);
-    set_descriptor(clock, deadline.on());
+    entry.interval_ = interval;
+    clock.wheel.insert(entry, deadline.nanoseconds());
+    if (clock.armed > deadline.nanoseconds()) [[unlikely]]
+        set_descriptor(clock, deadline.on());
 }
 
-bool timer_queue::disarm(timer_entry& entry) noexcept {
-    scoped_lock guard(lock_);
-    if (entry.position_ == timer_entry::kNowhere)
-        return false;
-    remove(clocks_[static_cast<unsigned>(entry.clock_)], entry.position_);
-    return true;
+void timer_queue::disarm(timer_entry& entry) noexcept {
+    if (entry.is_pending())
+        of(entry.clock_).wheel.remove(entry);
 }
 
 void timer_queue::expire(clock on) noexcept {
-    scoped_lock guard(lock_);
-    per_clock& clock = clocks_[static_cast<unsigned>(on)];
-    std::uint64_t expirations;
-    // ECANCELED says that the wall clock was set; either way the heap decides.
-    static_cast<void>(!::read(clock.descriptor, &expirations, sizeof expirations));
-    clock.armed = 0;
-    const std::int64_t now = time::now(on).nanoseconds();
-    while (!clock.heap.empty() && clock.heap.front().deadline <= now) {
-        timer_entry& due = *clock.heap.front().entry;
-        std::uint64_t firings = 1;
-        if (due.interval_ > 0) {
-            firings += static_cast<std::uint64_t>((now - due.deadline_) / due.interval_);
-            due.deadline_ += static_cast<std::int64_t>(firings) * due.interval_;
-            clock.heap.front().deadline = due.deadline_;
-            sift_down(clock, 0);
-        } else {
-            remove(clock, 0);
-        }
-        due.fire_(&due, firings);
+    per_clock& clock = of(on);
+    std::int64_t now;
+    {
+        scoped_lock guard(lock_);
+        std::uint64_t expirations;
+        // ECANCELED says that the wall clock was set; either way the wheel decides.
+        static_cast<void>(!::read(clock.descriptor, &expirations, sizeof expirations));
+        clock.armed = timer_wheel::kNever;
+        now = time::now(on).nanoseconds();
+        clock.wheel.set_back(now);
     }
+    while (fire_some(clock, now)) {
+    }
+    scoped_lock guard(lock_);
     set_descriptor(clock, on);
+}
+
+// Returns whether more may be due.
+bool timer_queue::fire_some(per_clock& clock, std::int64_t now) noexcept {
+    scoped_lock guard(lock_);
+    for (unsigned fired = 0; fired < kBatch; ++fired) {
+        wheel_entry* due = clock.wheel.take_due(now);
+        if (!due)
+            return false;
+        fire(clock, *static_cast<timer_entry*>(due), now);
+    }
+    return true;
+}
+
+// The entry may be gone when its function returns.
+void timer_queue::fire(per_clock& clock, timer_entry& due, std::int64_t now) noexcept {
+    std::uint64_t firings = 1;
+    if (due.interval_ > 0) {
+        const std::int64_t missed = (now - due.deadline()) / due.interval_;
+        const std::int64_t last = due.deadline() + missed * due.interval_;
+        firings += static_cast<std::uint64_t>(missed);
+        if (due.interval_ <= kLatest - last)
+            clock.wheel.insert(due, last + due.interval_);
+    }
+    due.fire_(&due, firings);
 }
 
 }  // namespace dispatch::detail

@@ -1,0 +1,116 @@
+#include "platform/linux/dispatch/timer_wheel.h"
+
+#include <algorithm>
+#include <bit>
+
+namespace dispatch::detail {
+
+// Hot path: bench/timers_cases.h.
+void timer_wheel::insert(wheel_entry& entry, std::int64_t deadline) noexcept {
+    entry.deadline_ = deadline;
+    place(entry);
+}
+
+void timer_wheel::place(wheel_entry& entry) noexcept {
+    const std::int64_t deadline = std::max(entry.deadline_, base_);
+    // The lowest bit stands in for "equal", which has no highest bit.
+    const auto differing = static_cast<std::uint64_t>(deadline ^ base_) | 1;
+    const unsigned level = (63 - static_cast<unsigned>(std::countl_zero(differing))) / kBits;
+    const unsigned index = static_cast<unsigned>(deadline >> (level * kBits)) % kSlots;
+    const unsigned place = level * kSlots + index;
+    const std::uint64_t bit = std::uint64_t{1} << index;
+    slot& into = slots_[place];
+    entry.place_ = static_cast<std::uint16_t>(place);
+    entry.next_ = nullptr;
+    if (occupied_[level] & bit) {
+        entry.previous_ = into.last;
+        into.last->next_ = &entry;
+        into.last = &entry;
+        into.earliest = std::min(into.earliest, deadline);
+        return;
+    }
+    entry.previous_ = nullptr;
+    into = {&entry, &entry, deadline};
+    occupied_[level] |= bit;
+    levels_ |= 1u << level;
+}
+
+void timer_wheel::remove(wheel_entry& entry) noexcept {
+    slot& from = slots_[entry.place_];
+    if (entry.next_)
+        entry.next_->previous_ = entry.previous_;
+    else
+        from.last = entry.previous_;
+    if (entry.previous_)
+        entry.previous_->next_ = entry.next_;
+    else
+        from.first = entry.next_;
+    if (!from.first)
+        static_cast<void>(detach(entry.place_));
+    entry.place_ = wheel_entry::kNowhere;
+}
+
+// Empties a slot; returns what was in it, linked by `next_`.
+wheel_entry* timer_wheel::detach(unsigned place) noexcept {
+    const unsigned level = place / kSlots;
+    occupied_[level] &= ~(std::uint64_t{1} << place % kSlots);
+    if (occupied_[level] == 0)
+        levels_ &= ~(1u << level);
+    return slots_[place].first;
+}
+
+unsigned timer_wheel::first_place() const noexcept {
+    const auto level = static_cast<unsigned>(std::countr_zero(levels_));
+    return level * kSlots + static_cast<unsigned>(std::countr_zero(occupied_[level]));
+}
+
+std::int64_t timer_wheel::earliest() const noexcept {
+    return levels_ == 0 ? kNever : slots_[first_place()].earliest;
+}
+
+wheel_entry* timer_wheel::take_due(std::int64_t now) noexcept {
+    while (levels_ != 0) {
+        const unsigned place = first_place();
+        const slot& first = slots_[place];
+        if (first.earliest > now)
+            return nullptr;
+        base_ = std::max(base_, first.earliest);
+        wheel_entry* entry = first.first;
+        if (place < kSlots || (!entry->next_ && entry->deadline_ <= now)) {
+            remove(*entry);
+            return entry;
+        }
+        entry = detach(place);
+        while (entry) {
+            wheel_entry* next = entry->next_;
+            if (next)
+                __builtin_prefetch(next->next_, 1);
+            this->place(*entry);
+            entry = next;
+        }
+    }
+    // Nothing is pending: what comes next is near.
+    base_ = std::max(base_, now);
+    return nullptr;
+}
+
+void timer_wheel::set_back(std::int64_t now) noexcept {
+    if (now >= base_)
+        return;
+    wheel_entry* all = nullptr;
+    wheel_entry* last = nullptr;
+    while (levels_ != 0) {
+        const unsigned place = first_place();
+        wheel_entry* first = detach(place);
+        (last ? last->next_ : all) = first;
+        last = slots_[place].last;
+    }
+    base_ = std::max<std::int64_t>(now, 0);
+    while (all) {
+        wheel_entry* next = all->next_;
+        place(*all);
+        all = next;
+    }
+}
+
+}  // namespace dispatch::detail

@@ -1,0 +1,191 @@
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <thread>
+
+#include "dispatch/dispatch.h"
+#include "support/manual_calendar.h"
+#include "support/waiting.h"
+
+namespace {
+
+using dispatch::block;
+using dispatch::queue;
+using dispatch::source;
+using plr::test::drain;
+using plr::test::Event;
+using plr::test::ManualCalendar;
+using namespace std::chrono_literals;
+
+struct WallTimer {
+    explicit WallTimer(std::chrono::nanoseconds delay,
+                       std::chrono::nanoseconds interval = dispatch::kOnce) {
+        timer.set_event_handler(block<void()>([this] {
+            periods += timer.data();
+            fired.signal();
+        }));
+        timer.set_timer(dispatch::time::after(delay, dispatch::clock::wall), interval);
+        timer.resume();
+    }
+    ~WallTimer() {
+        timer.cancel();
+        drain(serial);
+    }
+    // How often it has fired, all that was due being delivered.
+    std::uint64_t count() {
+        return serial.sync([this] { return periods; });
+    }
+
+    queue serial = queue::create("serial");
+    source timer = source::timer(serial);
+    std::uint64_t periods = 0;
+    Event fired;
+};
+
+TEST(WallClock, ATimerFollowsStepsForwardsAndBackwards) {
+    ManualCalendar calendar;
+    WallTimer hour(1h);
+    WallTimer minute(1min);
+    calendar.step(1h - 1ns);
+    EXPECT_EQ(hour.count(), 0u);
+    EXPECT_EQ(minute.count(), 1u);
+    calendar.step(-30min);
+    WallTimer later(10min);  // before what was due already
+    calendar.step(10min - 1ns);
+    EXPECT_EQ(later.count(), 0u);
+    calendar.step(1ns);
+    EXPECT_EQ(later.count(), 1u);
+    EXPECT_EQ(hour.count(), 0u);
+    calendar.step(20min + 1ns);
+    EXPECT_EQ(hour.count(), 1u);
+    EXPECT_EQ(minute.count(), 1u);
+}
+
+TEST(WallClock, APeriodicTimerCountsThePeriodsOfAStep) {
+    ManualCalendar calendar;
+    WallTimer timer(1s, 1s);
+    calendar.step(999ms);
+    EXPECT_EQ(timer.count(), 0u);
+    calendar.step(1h);
+    EXPECT_EQ(timer.count(), 3600u);
+    // Its next deadline is a time of day: back by two hours, nothing for as long.
+    calendar.step(-2h);
+    EXPECT_EQ(timer.count(), 3600u);
+    calendar.step(2h + 1s);
+    EXPECT_EQ(timer.count(), 3601u);
+}
+
+TEST(WallClock, WhatIsDueWhenArmedFiresWithoutAStep) {
+    ManualCalendar calendar;
+    WallTimer past(-1s);
+    EXPECT_TRUE(past.fired.wait());
+}
+
+TEST(WallClock, TimersGoBackToTheKernelsClock) {
+    std::unique_ptr<WallTimer> timer;
+    {
+        ManualCalendar calendar(std::chrono::system_clock::now().time_since_epoch() - 1h);
+        timer = std::make_unique<WallTimer>(1h);
+    }
+    EXPECT_TRUE(timer->fired.wait());
+}
+
+TEST(TimerSource, AnIntervalThatIsNotPositiveMeansOnce) {
+    for (const auto interval : {0ns, -1'000'000ns}) {
+        ManualCalendar calendar;
+        WallTimer timer(1s, interval);
+        calendar.step(1s);
+        calendar.step(1s);
+        EXPECT_EQ(timer.count(), 1u) << interval.count();
+    }
+}
+
+TEST(TimerSource, AnEndlessPeriodDoesNotComeBack) {
+    ManualCalendar calendar;
+    WallTimer timer(1s, std::chrono::nanoseconds::max());
+    calendar.step(1h);
+    calendar.step(1h);
+    EXPECT_EQ(timer.count(), 1u);
+}
+
+// Also for a concurrent queue; what comes meanwhile makes one more call.
+TEST(TimerSource, HandlersNeverRunTwoAtOnce) {
+    ManualCalendar calendar;
+    const auto timer = source::timer(queue::global());
+    std::atomic<int> inside{0};
+    std::uint64_t periods = 0;
+    Event entered;
+    Event proceed;
+    timer.set_event_handler(block<void()>([&] {
+        EXPECT_EQ(++inside, 1);
+        periods += timer.data();
+        entered.signal();
+        EXPECT_TRUE(proceed.wait());
+        --inside;
+    }));
+    Event cancelled;
+    timer.set_cancel_handler(block<void()>([&] {
+        EXPECT_EQ(inside, 0);
+        cancelled.signal();
+    }));
+    timer.set_timer(dispatch::time::after(1s, dispatch::clock::wall), 1s);
+    timer.resume();
+    calendar.step(1s);
+    ASSERT_TRUE(entered.wait());
+    calendar.step(1s);
+    calendar.step(3s);
+    proceed.signal();
+    ASSERT_TRUE(entered.wait());
+    EXPECT_EQ(periods, 5u);
+    timer.cancel();
+    proceed.signal();
+    EXPECT_TRUE(cancelled.wait());
+}
+
+TEST(Source, SuspendedFiringsAreDeliveredOnResumeAsOne) {
+    ManualCalendar calendar;
+    WallTimer timer(1s, 1s);
+    timer.timer.suspend();
+    calendar.step(1s);
+    calendar.step(1s);
+    EXPECT_EQ(timer.count(), 0u);
+    timer.timer.resume();
+    EXPECT_TRUE(timer.fired.wait());
+    EXPECT_EQ(timer.count(), 2u);
+}
+
+// Handles, arming and cancelling on several threads, firing meanwhile: the
+// cancel handler runs once each and everything is freed.
+TEST(Source, ManyThreadsMakeArmAndCancel) {
+    constexpr int kThreads = 4;
+    constexpr int kRounds = 2'000;
+    std::atomic<int> cancelled{0};
+    const auto serial = queue::create("serial");
+    const dispatch::group all;
+    std::vector<std::thread> threads;
+    for (int i = 0; i < kThreads; ++i)
+        threads.emplace_back([&, i] {
+            for (int round = 0; round < kRounds; ++round) {
+                const auto& on = i % 2 == 0 ? serial : queue::global();
+                const auto timer = source::timer(on);
+                all.enter();
+                timer.set_event_handler(block<void()>([timer] { timer.cancel(); }));
+                timer.set_cancel_handler(block<void()>([&] {
+                    ++cancelled;
+                    all.leave();
+                }));
+                timer.set_timer(dispatch::time::after(std::chrono::microseconds(round % 64)), 1us);
+                timer.resume();
+                if (round % 3 == 0)
+                    timer.suspend();
+                if (round % 3 != 1)
+                    timer.cancel();
+            }
+        });
+    for (auto& thread : threads)
+        thread.join();
+    EXPECT_EQ(all.wait(dispatch::time::after(plr::test::kBound)), 0);
+    EXPECT_EQ(cancelled, kThreads * kRounds);
+}
+
+}  // namespace
