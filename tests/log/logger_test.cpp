@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <functional>
+#include <latch>
 #include <thread>
 
 #include "plr/ipc/values.h"
@@ -54,19 +55,25 @@ TEST(LoggerCommonBase, LetsThroughWhatIsAtLeastItsLevel) {
     }
 }
 
-TEST(LoggerCommonBase, IsReadWhileBothItsLevelsAreSet) {
+// Each setter finds what it set, whatever the other one does meanwhile.
+TEST(LoggerCommonBase, KeepsWhatTwoThreadsSetAtOnce) {
     LoggerCommonBase logger("domain", nullptr);
-    logger.setLogLevel(Warn);
-    const auto set = [&logger](void (LoggerCommonBase::*setter)(LogLevel), LogLevel last) {
-        for (int i = 0; i < 20'000; ++i)
-            (logger.*setter)(i % 2 ? Debug : Error);
+    std::latch start(2);
+    const auto set = [&logger, &start](auto setter, auto getter, LogLevel last) {
+        start.arrive_and_wait();
+        for (int i = 0; i < 300'000; ++i) {
+            const LogLevel level = i % 2 ? Debug : Error;
+            (logger.*setter)(level);
+            ASSERT_EQ((logger.*getter)(), level);
+            ASSERT_TRUE(logger.enabled(Fatal));
+        }
         (logger.*setter)(last);
     };
     {
-        const std::jthread local(set, &LoggerCommonBase::setLogLevel, Unset);
-        const std::jthread inherited(set, &LoggerCommonBase::setInheritedLogLevel, Notice);
-        for (int i = 0; i < 20'000; ++i)
-            ASSERT_TRUE(logger.enabled(Fatal));
+        const std::jthread local(set, &LoggerCommonBase::setLogLevel,
+                                 &LoggerCommonBase::getLocalLogLevel, Unset);
+        const std::jthread inherited(set, &LoggerCommonBase::setInheritedLogLevel,
+                                     &LoggerCommonBase::getInheritedLogLevel, Notice);
     }
     EXPECT_EQ(logger.getLogLevel(), Notice);
 }
@@ -172,7 +179,8 @@ TEST_F(Loggers, WithoutAQueueLearnTheirLevelWhenMadeAndWhenTold) {
     logger.updateLogLevel();
     EXPECT_EQ(logger.getLogLevel(), Info);
 
-    EXPECT_EQ(StaticLogger(logger).getLogDomain(), "other");
+    const ServerLogger other("radio", server_);
+    EXPECT_EQ(StaticLogger(other).getLogLevel(), Warn);
     StaticLogger nobodys;
     nobodys.updateLogLevel();
     EXPECT_EQ(nobodys.getLogLevel(), Unset);

@@ -200,6 +200,20 @@ TEST(LoggerTree, ListsWhatIsConfiguredOrEverythingThatLives) {
                       {"kLoggers", full}}));
 }
 
+TEST(LoggerTree, ForgetsLoggersThatAreGoneWhenAnotherComes) {
+    LoggerTree root = infoRoot();
+    // Lives as long as anything refers to the logger, also weakly.
+    auto token = std::make_shared<int>();
+    const std::weak_ptr<int> remembered = token;
+    root.insertAt("a", std::shared_ptr<FakeTrackedLogger>(
+                           new FakeTrackedLogger,
+                           [token](const FakeTrackedLogger* logger) { delete logger; }));
+    token.reset();
+    EXPECT_FALSE(remembered.expired());
+    insertNew(root, "a");
+    EXPECT_TRUE(remembered.expired());
+}
+
 // A configuration comes from outside: no path of it may exhaust the stack, or
 // memory out of proportion.
 TEST(LoggerTree, APathOfAHundredThousandNamesIsOneLikeOthers) {
