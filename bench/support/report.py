@@ -23,7 +23,7 @@ BEGIN, END = "<!-- bench/run: begin -->", "<!-- bench/run: end -->"
 
 
 def run_program(programs, cell, folder):
-    """The cell's value. Raises RuntimeError when the program fails."""
+    """The values that the cell's program prints. Raises RuntimeError when it fails."""
     command = [str(programs / cell.program), *cell.arguments]
     # A session of its own: what the program starts ends with it.
     process = subprocess.Popen(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
@@ -38,8 +38,7 @@ def run_program(programs, cell, folder):
         raise
     if process.returncode != 0:
         raise RuntimeError(f"{' '.join(command)}: status {process.returncode}\n{errors}")
-    values = dict(line.split() for line in output.splitlines())
-    return float(values[cell.key]) * cell.scale
+    return dict(line.split() for line in output.splitlines())
 
 
 def progress(text):
@@ -48,13 +47,13 @@ def progress(text):
         print(f"\r\033[K{text}", end="", file=sys.stderr, flush=True)
 
 
-def measure(measurement, rounds, programs, folder):
+def measure(measurement, rounds, run):
     """A list of values for each peer."""
     values = {peer: [] for peer in measurement.cells}
     for number in range(rounds):
         for peer, cell in measurement.cells.items():
             progress(f"{measurement.title}: round {number + 1}, {peer}")
-            values[peer].append(run_program(programs, cell, folder))
+            values[peer].append(float(run(number, cell)[cell.key]) * cell.scale)
     progress("")
     return values
 
@@ -62,7 +61,7 @@ def measure(measurement, rounds, programs, folder):
 def judge(bar, measurement, medians):
     """The verdict on one bar: "ok" or by what factor it was missed."""
     best = max if measurement.big_is_good else min
-    rival = best(medians[peer] for peer in bar.peers)
+    rival = best(medians[peer] for peer in bar.peers) if bar.peers else 1.0
     ratio = medians[suites.OURS] / rival
     missed = bar.limit / ratio if measurement.big_is_good else ratio / bar.limit
     return "ok" if missed <= 1.0 else f"MISSED by {missed:.2f}x"
@@ -77,7 +76,7 @@ def rows_of(measurement, values):
     medians = {peer: statistics.median(list_of) for peer, list_of in values.items()}
     for peer, measured in values.items():
         bars = [f"{bar.text}: {judge(bar, measurement, medians)}"
-                for bar in measurement.bars if bar.peers[-1] == peer]
+                for bar in measurement.bars if (bar.peers or (suites.OURS,))[-1] == peer]
         yield (f"{measurement.title}, {measurement.unit}" if peer == suites.OURS else "", peer,
                shown(medians[peer]), f"{shown(min(measured))} – {shown(max(measured))}",
                "" if peer == suites.OURS else f"{medians[suites.OURS] / medians[peer]:.2f}", "; ".join(bars))
@@ -130,11 +129,19 @@ def main():
     chosen = [m for name in options.suites or suites.SUITES for m in suites.SUITES[name]()
               if options.only in m.title]
     folder = tempfile.mkdtemp(prefix="pelorin-bench-")
-    rows, failures = [], []
+    rows, failures, runs = [], [], {}
+
+    def run(number, cell):
+        """What one run printed serves all measurements that read it."""
+        key = (number, cell.program, cell.arguments)
+        if key not in runs:
+            runs[key] = run_program(options.programs, cell, folder)
+        return runs[key]
+
     try:
         for measurement in chosen:
             try:
-                rows += rows_of(measurement, measure(measurement, rounds, options.programs, folder))
+                rows += rows_of(measurement, measure(measurement, rounds, run))
             except (RuntimeError, KeyError, ValueError, OSError) as reason:
                 failures.append(f"{measurement.title}: {reason}")
     finally:

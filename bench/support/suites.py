@@ -3,7 +3,7 @@
 A Measurement has one cell a peer, ours first: a program, its arguments and the
 key of the result line to read. Bars compare our median with a peer's (the best
 of several): `limit` is what the ratio ours/peer must not exceed when small is
-good, or must reach when big is good.
+good, or must reach when big is good. A bar without peers holds our median itself.
 """
 
 from dataclasses import dataclass, field
@@ -48,6 +48,10 @@ ZEROMQ = "ZeroMQ"
 RELAY = "raw relay"
 RELAY_BATCHED = "raw relay, batched"
 MOSQUITTO = "mosquitto"
+SPDLOG = "spdlog"
+BOOST_LOG = "Boost.Log"
+LOG4CPLUS = "log4cplus"
+EMPTY_LOOP = "the loop alone"
 
 
 def dispatch():
@@ -111,4 +115,29 @@ def fanout():
                           held, big_is_good=True)
 
 
-SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout}
+def log():
+    programs = {OURS: "log_pelorin", SPDLOG: "log_spdlog", BOOST_LOG: "log_boost", LOG4CPLUS: "log_log4cplus"}
+
+    def cells(key, *arguments):
+        return {peer: Cell(program, arguments, key) for peer, program in programs.items()}
+
+    def threads(count):
+        return "1 thread" if count == 1 else f"{count} threads"
+
+    held = {"p50": (Bar((SPDLOG,), 1 / 2, "at most half"),), "mean": (Bar((SPDLOG,), 1 / 3, "at most a third"),)}
+    for pace, count in (("paced", 1), ("paced", 2), ("brisk", 1), ("flooded", 1), ("flooded", 2)):
+        bars = held if pace != "flooded" and count == 1 else {}
+        for figure in ("p50", "p99", "mean"):
+            yield Measurement("log", f"log call {figure}, {threads(count)}, {pace}", "ns",
+                              cells(f"{figure}_ns", pace, str(count)), bars.get(figure, ()))
+    for count, factor in ((1, 1.5), (2, 3.0)):
+        yield Measurement("log", f"to a file, {threads(count)}", "million/s",
+                          cells("million_per_s", "flooded", str(count)),
+                          (Bar((SPDLOG,), factor, f"at least {factor:g} times"),), big_is_good=True)
+    yield Measurement("log", "disabled message", "ns",
+                      {**cells("ns", "disabled"), EMPTY_LOOP: Cell("log_pelorin", ("empty",), "ns")},
+                      (Bar((), 0.6, "under 0.6"),))
+    yield Measurement("log", "memory of a waiting message", "bytes", cells("bytes", "memory"))
+
+
+SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log}
