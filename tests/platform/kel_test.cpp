@@ -13,28 +13,9 @@
 namespace {
 
 using plr::test::FakeLog;
+using Client = plr::test::LogClient;
 using plr::test::JournalFields;
 using plr::test::LogPlaces;
-
-struct Client {
-    explicit Client(const char* ident = "test", const char* facility = nullptr)
-        : handle(kel_open(ident, facility, 0)) {}
-    ~Client() { kel_close(handle); }
-    Client(const Client&) = delete;
-    Client& operator=(const Client&) = delete;
-
-    void send(const std::vector<std::pair<std::string, std::string>>& fields) const {
-        const kel_message_t message = kel_new(0);
-        for (const auto& [key, value] : fields)
-            EXPECT_EQ(kel_set_bytes(message, key.c_str(), value.data(), value.size()), 0);
-        kel_send(handle, message);
-        kel_free(message);
-    }
-    void send(const std::string& text) const { send({{"Message", text}}); }
-    [[nodiscard]] kel_statistics statistics() const { return kel_get_statistics(handle); }
-
-    const kel_client_t handle;
-};
 
 TEST(Kel, KeysAndLevelsBecomeFieldsByTheDocumentedRules) {
     LogPlaces places;

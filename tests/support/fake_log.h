@@ -14,9 +14,9 @@
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
-#include <map>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "kel/kel.h"
 #include "support/journal_fields.h"
@@ -126,7 +126,10 @@ class LogPlaces {
 
     [[nodiscard]] std::string journal() const { return folder_ + "/journal"; }
     [[nodiscard]] std::string syslog() const { return folder_ + "/log"; }
-    [[nodiscard]] int consoleEnd() const { return console_[0]; }
+    [[nodiscard]] bool hasConsoleText() const {
+        pollfd ready{console_[0], POLLIN, 0};
+        return ::poll(&ready, 1, 0) == 1;
+    }
     // What the console has so far, at least a line.
     [[nodiscard]] std::string readConsole() const {
         std::string text(1 << 17, '\0');
@@ -141,6 +144,27 @@ class LogPlaces {
   private:
     std::string folder_;
     int console_[2] = {-1, -1};
+};
+
+// A client for the length of a test.
+struct LogClient {
+    explicit LogClient(const char* ident = "test", const char* facility = nullptr)
+        : handle(kel_open(ident, facility, 0)) {}
+    ~LogClient() { kel_close(handle); }
+    LogClient(const LogClient&) = delete;
+    LogClient& operator=(const LogClient&) = delete;
+
+    void send(const std::vector<std::pair<std::string, std::string>>& fields) const {
+        const kel_message_t message = kel_new(0);
+        for (const auto& [key, value] : fields)
+            EXPECT_EQ(kel_set_bytes(message, key.c_str(), value.data(), value.size()), 0);
+        kel_send(handle, message);
+        kel_free(message);
+    }
+    void send(const std::string& text) const { send({{"Message", text}}); }
+    [[nodiscard]] kel_statistics statistics() const { return kel_get_statistics(handle); }
+
+    const kel_client_t handle;
 };
 
 }  // namespace plr::test

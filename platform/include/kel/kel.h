@@ -127,6 +127,13 @@ PLR_EXPORT void kel_vlog(int priority, const char* format, va_list arguments)
 PLR_EXPORT int kel_send_now(kel_client_t client, int priority, const char* domain, const char* text,
                             size_t length);
 
+// The same for what waits in the backlog: each message is tried once, in order.
+// To be called once, in a process that ends: the client cannot be used
+// afterwards but for kel_send_now(). A message that another thread was sending
+// may appear twice. Gives up when the crash hit a thread that was changing the
+// backlog. Returns whether everything was handed over.
+PLR_EXPORT int kel_flush_now(kel_client_t client);
+
 // Where clients opened from now on find the logs; for tests. A null path or a
 // negative descriptor restores the default: "/run/systemd/journal/socket",
 // "/dev/log", standard error. There is no environment variable for it, because

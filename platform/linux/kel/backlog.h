@@ -25,6 +25,7 @@ class backlog {
 
     [[nodiscard]] bool empty() const noexcept { return waiting_.empty(); }
     [[nodiscard]] std::size_t size() const noexcept { return waiting_.size(); }
+    [[nodiscard]] const std::deque<record>& all() const noexcept { return waiting_; }
     // The oldest; stays where it is while others are pushed.
     [[nodiscard]] const record& first() const noexcept { return waiting_.front(); }
     void pop() noexcept;

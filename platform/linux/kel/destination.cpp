@@ -31,6 +31,7 @@ void destination::close() noexcept {
         ::close(socket);
 }
 
+// A line that the console has in part is whole in the log that is there again.
 bool destination::connect(log_kind to) noexcept {
     if (fd() < 0)
         fd_.store(make_socket());
@@ -38,6 +39,9 @@ bool destination::connect(log_kind to) noexcept {
         return false;
     kind_.store(to, std::memory_order_release);
     absent_since_ = 0;
+    broken_off_ = broken_off_ || written_ > 0;
+    line_.clear();
+    written_ = 0;
     return true;
 }
 
@@ -70,7 +74,7 @@ void destination::look_for_better() {
 }
 
 outcome destination::deliver(const record& message, std::chrono::milliseconds patience) {
-    if (line_.empty() && kind() != log_kind::journal && absent_since_ == 0)
+    if (kind() != log_kind::journal && absent_since_ == 0)
         look_for_better();
     const outcome result = attempt(message);
     if (result != outcome::absent || !find_log(patience))
@@ -101,7 +105,7 @@ outcome destination::send_line(const record& message) {
 
 outcome destination::write_line(const record& message) {
     if (line_.empty())
-        line_ = console_line(message, sender_);
+        line_ = (std::exchange(broken_off_, false) ? "\n" : "") + console_line(message, sender_);
     std::string_view rest = std::string_view(line_).substr(written_);
     const outcome result = write_ready(where_.console, rest);
     written_ = line_.size() - rest.size();

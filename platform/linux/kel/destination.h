@@ -58,6 +58,7 @@ class destination {
     std::int64_t looked_ = 0;        // monotonic ns, the last look for a better log
     std::string line_;               // for the console, being written
     std::size_t written_ = 0;        // of line_
+    bool broken_off_ = false;        // the console's last line has no end
 };
 
 }  // namespace kel

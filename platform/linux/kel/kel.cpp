@@ -22,7 +22,8 @@ kel_client_t ownClient() {
     return client;
 }
 
-void sendFormatted(int priority, const char* format, va_list arguments) {
+[[gnu::format(printf, 2, 0)]] void sendFormatted(int priority, const char* format,
+                                                 va_list arguments) {
     static constexpr const char* kLevels[] = {"Emergency", "Alert",  "Critical", "Error",
                                               "Warning",   "Notice", "Info",     "Debug"};
     char* text = nullptr;
@@ -96,6 +97,10 @@ void kel_vlog(int priority, const char* format, va_list arguments) {
 int kel_send_now(kel_client_t client, int priority, const char* domain, const char* text,
                  size_t length) {
     return client && client->sender->send_now(std::clamp(priority, 0, 7), domain, {text, length});
+}
+
+int kel_flush_now(kel_client_t client) {
+    return !client || client->sender->flush_now();
 }
 
 void kel_set_places(const char* journal, const char* syslog, int console) {

@@ -11,6 +11,7 @@ namespace kel {
 class PLR_CAPABILITY("mutex") mutex {
   public:
     void lock() noexcept PLR_ACQUIRE() { held_.lock(); }
+    [[nodiscard]] bool try_lock() noexcept PLR_TRY_ACQUIRE(true) { return held_.try_lock(); }
     void unlock() noexcept PLR_RELEASE() { held_.unlock(); }
 
   private:

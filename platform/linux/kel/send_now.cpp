@@ -1,6 +1,8 @@
 // Messages of crash handlers: only stack and system calls.
+#include <sched.h>
 #include <sys/socket.h>
 #include <sys/uio.h>
+#include <syslog.h>
 
 #include <algorithm>
 #include <array>
@@ -102,30 +104,59 @@ void make_line(line& out, int priority, const identity& who, std::string_view do
     out.add_escaped(text);
 }
 
+// Another thread holds a lock for a moment only; this one may hold it for ever.
+bool try_hard(mutex& lock) noexcept PLR_TRY_ACQUIRE(true, lock) {
+    for (unsigned tries = 0; tries < 1000; tries++) {
+        if (lock.try_lock())
+            return true;
+        ::sched_yield();
+    }
+    return false;
+}
+
 }  // namespace
 
 bool sender::send_now(int priority, const char* domain, std::string_view text) const noexcept {
     const int kept = errno;
-    const std::string_view place = domain ? domain : who_.domain;
-    const log_kind kind = destination_.kind();
-    bool sent;
-    if (kind == log_kind::journal) {
-        sent = send_fields(destination_.fd(), who_, priority, place,
-                           text.substr(0, KEL_SEND_NOW_BYTES));
-    } else {
-        const int facility = kind == log_kind::syslog ? std::max(who_.facility, 1) : 0;
-        line out;
-        make_line(out, facility << 3 | priority, who_, place, text);
-        if (kind == log_kind::syslog) {
-            sent = send_datagram(destination_.fd(), out.view()) == outcome::sent;
-        } else {
-            out.end();
-            std::string_view rest = out.view();
-            sent = write_ready(destination_.where().console, rest) == outcome::sent;
-        }
-    }
+    const std::string_view place = domain ? std::string_view(domain) : who_.domain;
+    const bool sent = destination_.kind() == log_kind::journal
+                          ? send_fields(destination_.fd(), who_, priority, place,
+                                        text.substr(0, KEL_SEND_NOW_BYTES))
+                          : send_line_now(priority, place, text);
     errno = kept;
     return sent;
+}
+
+// For the logs that take lines.
+bool sender::send_line_now(int priority, std::string_view domain,
+                           std::string_view text) const noexcept {
+    line out;
+    if (destination_.kind() == log_kind::syslog) {
+        const int facility = who_.facility < 0 ? LOG_USER >> 3 : who_.facility;
+        make_line(out, facility << 3 | priority, who_, domain, text);
+        return send_datagram(destination_.fd(), out.view()) == outcome::sent;
+    }
+    make_line(out, priority, who_, domain, text);
+    out.end();
+    std::string_view rest = out.view();
+    return write_ready(destination_.where().console, rest) == outcome::sent;
+}
+
+bool sender::send_record_now(const record& message) const noexcept {
+    if (destination_.kind() == log_kind::journal)
+        return send_native(destination_.fd(), message.bytes) == outcome::sent;
+    return send_line_now(message.priority, message.view(message.domain),
+                         message.view(message.text));
+}
+
+bool sender::flush_now() noexcept {
+    const int kept = errno;
+    bool all_sent = try_hard(lock_);
+    if (all_sent)
+        for (const record& message : backlog_.all())
+            all_sent = send_record_now(message) && all_sent;
+    errno = kept;
+    return all_sent;
 }
 
 }  // namespace kel

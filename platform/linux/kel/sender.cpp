@@ -191,7 +191,7 @@ bool sender::send_all(waiting& waits) noexcept {
     waits_ = waiting::no;
     send_waiting(kMostOnQueue);
     waits = waits_;
-    return backlog_.empty();
+    return backlog_.empty() && !sending_ && waits_ == waiting::no;
 }
 
 bool sender::flush(milliseconds bound) noexcept {

@@ -33,9 +33,10 @@ class sender : public std::enable_shared_from_this<sender> {
     ~sender() = default;
 
     void send(const kel_message& message) noexcept;
-    // See kel_send_now().
+    // See kel_send_now() and kel_flush_now().
     [[nodiscard]] bool send_now(int priority, const char* domain,
                                 std::string_view text) const noexcept;
+    [[nodiscard]] bool flush_now() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS;  // keeps the lock
 
     int set_filter(int mask) noexcept { return filter_.exchange(mask & 0xff); }
     void set_limits(const kel_limits& limits) noexcept;
@@ -47,6 +48,9 @@ class sender : public std::enable_shared_from_this<sender> {
   private:
     enum class waiting { no, for_room, for_time };
 
+    [[nodiscard]] bool send_line_now(int priority, std::string_view domain,
+                                     std::string_view text) const noexcept;
+    [[nodiscard]] bool send_record_now(const record& message) const noexcept;
     void send_waiting(unsigned most) noexcept PLR_REQUIRES(lock_);
     bool send_first() noexcept PLR_REQUIRES(lock_);
     bool tell_gap() noexcept PLR_REQUIRES(lock_);
