@@ -43,7 +43,7 @@ class PLR_EXPORT LoggerCommonBase {
     [[nodiscard]] trel_t getTrelHandle() const noexcept { return handle_; }
 
     // Whether messages of that level go out; ask before composing one.
-    // Hot path: one load, one comparison; bench/log.
+    // Hot path: one load, one comparison; bench/log_pelorin.cpp.
     [[nodiscard]] bool enabled(LogLevel level) const noexcept {
         return load() < (std::uint64_t{asByte(level)} + 1) << kEffectiveShift;
     }
