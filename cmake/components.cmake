@@ -208,7 +208,9 @@ pelorin_component(log_values LEVEL 2 LIBRARY pelorin
 
 pelorin_component(log_core LEVEL 3 LIBRARY pelorin
   HEADERS
+    include/plr/log/console_log_writer.h
     include/plr/log/crash_drain.h
+    include/plr/log/file_log_writer.h
     include/plr/log/log_server.h
     include/plr/log/log_writer.h
     include/plr/log/logger.h
@@ -222,12 +224,19 @@ pelorin_component(log_core LEVEL 3 LIBRARY pelorin
     include/plr/log/tracked_logger.h
     include/plr/log/trel_context.h
   SOURCES
+    src/log/console_device.cpp
+    src/log/console_device.h
+    src/log/console_log_writer.cpp
     src/log/crash_drain.cpp
     src/log/crash_drain.h
+    src/log/crash_sink.h
+    src/log/file_log_writer.cpp
     src/log/level_table.cpp
     src/log/level_table.h
     src/log/log_delivery.cpp
     src/log/log_delivery.h
+    src/log/log_file.cpp
+    src/log/log_file.h
     src/log/log_server.cpp
     src/log/log_writer.cpp
     src/log/logger.cpp
@@ -235,9 +244,20 @@ pelorin_component(log_core LEVEL 3 LIBRARY pelorin
     src/log/logger_common_base.cpp
     src/log/logger_tree.cpp
     src/log/memory_buffered_log_writer.cpp
+    src/log/record_buffer.cpp
+    src/log/record_buffer.h
+    src/log/record_format.h
+    src/log/record_output.cpp
+    src/log/record_output.h
+    src/log/record_text.cpp
+    src/log/record_text.h
+    src/log/record_writer.h
     src/log/scoped_log_flusher.cpp
+    src/log/signal_block.h
     src/log/staged_logger.cpp
     src/log/static_logger.cpp
+    src/log/time_text.cpp
+    src/log/time_text.h
     src/log/tracked_logger.cpp)
 
 pelorin_component(ipc_endpoints LEVEL 3 LIBRARY pelorin
@@ -269,6 +289,18 @@ pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
     src/rest/message.cpp
     src/rest/operation.cpp
     src/rest/value_coding.cpp)
+
+pelorin_component(timers LEVEL 5 LIBRARY pelorin
+  HEADERS
+    include/plr/concurrency/dispatch_timer.h
+    include/plr/concurrency/dispatch_timer_service.h
+    include/plr/concurrency/timer.h
+    include/plr/concurrency/timer_delay.h
+    include/plr/concurrency/timer_service.h
+  SOURCES
+    src/concurrency/dispatch_timer.cpp
+    src/concurrency/dispatch_timer_service.cpp
+    src/concurrency/timer_service.cpp)
 
 pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
   HEADERS
