@@ -66,16 +66,16 @@ void LogDelivery::writeBatchInCrash() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
     if (startupBuffer_)
         for (const MessagePtr& message : startupBuffer_->messages_)
             writeInCrash(*message);
-    for (std::size_t i = next_.load(); i < batch_.size(); ++i)
-        if (batch_[i])
-            writeInCrash(*batch_[i]);
+    for (std::size_t i = next_.load(); i < batch_.messages.size(); ++i)
+        if (const MessagePtr& message = batch_.messages[i])
+            writeInCrash(*message);
 }
 
 void LogDelivery::writePendingInCrash() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
     // Held for good: nobody else is to change the list any more.
     if (!waitUntil([this]() noexcept { return lock_.tryLock(); }))
         return;
-    for (const MessagePtr& message : pending_)
+    for (const MessagePtr& message : pending_.messages)
         writeInCrash(*message);
 }
 

@@ -63,17 +63,6 @@ LogDelivery::LogDelivery(LogServer& server, const std::string& name,
 
 LogDelivery::~LogDelivery() = default;
 
-// Queued work holds the server, which holds this object.
-template <class Work>
-void LogDelivery::runOnWriters(Work&& work) {
-    writersQueue_.queue().async(
-        [server = server_.shared_from_this(), this, work = std::forward<Work>(work)]() mutable {
-            writersQueue_.assertCurrent();
-            deliverPending();
-            work();
-        });
-}
-
 template <class Work>
 auto LogDelivery::syncOnWriters(Work&& work) {
     return writersQueue_.queue().sync([&] {
@@ -89,11 +78,11 @@ auto LogDelivery::syncOnWriters(Work&& work) {
 void LogDelivery::log(MessagePtr&& message) {
     const LogLevel level = message->getLevel();
     lock_.lock();
-    if (limit_ != 0 && pending_.size() >= limit_ && !makeRoom()) [[unlikely]] {
+    if (limit_ != 0 && pending_.messages.size() >= limit_ && !makeRoom()) [[unlikely]] {
         lock_.unlock();
         return;
     }
-    pending_.push_back(std::move(message));
+    pending_.messages.push_back(std::move(message));
     const bool wake = mustSchedule(level);
     lock_.unlock();
     if (wake)
@@ -102,7 +91,7 @@ void LogDelivery::log(MessagePtr&& message) {
 
 // Returns with the lock held, as it came, and whether there is room now.
 bool LogDelivery::makeRoom() {
-    while (limit_ != 0 && pending_.size() >= limit_) {
+    while (limit_ != 0 && pending_.messages.size() >= limit_) {
         if (whenFull_ == LogServer::WhenFull::Drop) {
             ++dropped_;
             return false;
@@ -122,8 +111,8 @@ bool LogDelivery::makeRoom() {
 
 bool LogDelivery::mustSchedule(LogLevel level) {
     const bool wake =
-        state_ == State::Idle ||
-        (state_ == State::Lingering && (pending_.size() >= kPromptMessages || isUrgent(level)));
+        state_ == State::Idle || (state_ == State::Lingering &&
+                                  (pending_.messages.size() >= kPromptMessages || isUrgent(level)));
     if (wake)
         state_ = State::Scheduled;
     return wake;
@@ -156,29 +145,36 @@ void LogDelivery::announceRoom() noexcept {
     room_.notify_all();
 }
 
+void LogDelivery::queueOperation(dispatch::block<void()>&& operation) {
+    lock_.lock();
+    pending_.operations.push_back({pending_.messages.size(), std::move(operation)});
+    const bool wake = std::exchange(state_, State::Scheduled) != State::Scheduled;
+    lock_.unlock();
+    if (wake)
+        schedule();
+}
+
 void LogDelivery::addWriter(std::shared_ptr<LogWriter>&& writer) {
-    runOnWriters([this, writer = std::move(writer)] {
+    queueOperation(dispatch::block<void()>([this, writer = std::move(writer)] {
         writersQueue_.assertCurrent();
         writers_.push_back({writer, dynamic_cast<BatchLogWriter*>(writer.get())});
-    });
+    }));
 }
 
 void LogDelivery::flush(dispatch::group_session session) {
-    runOnWriters([this, session = std::move(session)] {
+    queueOperation(dispatch::block<void()>([this, session = std::move(session)] {
         writersQueue_.assertCurrent();
-        const AtWork guard(*this);
         for (const Writer& to : writers_)
             to.writer->flush(session);
-    });
+    }));
 }
 
 void LogDelivery::close() {
-    runOnWriters([this] {
+    queueOperation(dispatch::block<void()>([this] {
         writersQueue_.assertCurrent();
-        const AtWork guard(*this);
         for (const Writer& to : writers_)
             to.writer->close();
-    });
+    }));
 }
 
 void LogDelivery::flushStartupMessages() {
@@ -260,37 +256,50 @@ bool LogDelivery::takePending() {
         const detail::BriefLock guard(lock_);
         if (pending_.empty())
             return false;
-        batch_.swap(pending_);
+        std::swap(batch_, pending_);
         dropped = std::exchange(dropped_, 0);
         limited = limit_ != 0;
     }
     if (limited)
         announceRoom();
     if (dropped != 0)
-        batch_.push_back(note(dropped, " log messages dropped, too many were waiting"));
+        batch_.messages.push_back(note(dropped, " log messages dropped, too many were waiting"));
     return true;
 }
 
 // Hot path: bench/log_cases.h.
 void LogDelivery::writeBatch() {
-    for (std::size_t i = 0; i < batch_.size(); ++i) {
+    auto operation = batch_.operations.begin();
+    const auto lastOperation = batch_.operations.end();
+    for (std::size_t i = 0; i <= batch_.messages.size(); ++i) {
         const AtWork guard(*this);
-        MessagePtr& message = batch_[i];
-        if (startupBuffer_)
-            startupBuffer_->write(message);
-        for (const Writer& to : writers_)
-            if (!startupBuffer_)
-                to.writer->write(message);
+        for (; operation != lastOperation && operation->position == i; ++operation)
+            std::exchange(operation->run, nullptr)();
+        if (i == batch_.messages.size())
+            break;
+        write(batch_.messages[i]);
         next_.store(i + 1, std::memory_order_release);
-        message.reset();
+        batch_.messages[i].reset();
     }
+    endBatch();
+}
+
+void LogDelivery::write(const MessagePtr& message) {
+    if (startupBuffer_)
+        return startupBuffer_->write(message);
+    for (const Writer& to : writers_)
+        to.writer->write(message);
+}
+
+void LogDelivery::endBatch() {
     const AtWork guard(*this);
     for (const Writer& to : writers_)
         if (to.batching)
             to.batching->endBatch();
-    batch_.clear();
+    batch_.operations.clear();
+    batch_.messages.clear();
     next_.store(0, std::memory_order_release);
-    if (batch_.capacity() > kKeptCapacity)
+    if (batch_.messages.capacity() > kKeptCapacity)
         batch_ = Batch();
 }
 
@@ -303,7 +312,8 @@ void LogDelivery::writeStartupMessages() {
     if (dropped >= 1)
         held.push_front(
             note(static_cast<std::uint64_t>(dropped), " log messages dropped prior to log start"));
-    batch_.assign(std::make_move_iterator(held.begin()), std::make_move_iterator(held.end()));
+    batch_.messages.assign(std::make_move_iterator(held.begin()),
+                           std::make_move_iterator(held.end()));
     writeBatch();
 }
 

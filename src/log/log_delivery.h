@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "dispatch/block.h"
 #include "dispatch/group.h"
 #include "dispatch/queue.h"
 #include "plr/concurrency/queue_role.h"
@@ -19,11 +20,12 @@
 // How messages get from log() to the writers.
 //
 // Threads: log() on any; the rest on the writers queue, or queueing there.
+// Order:   messages and operations on writers wait in one list, so that an
+//          operation comes exactly between what was logged before and after it.
 // State:   Idle: nothing waits, the next message schedules a delivery.
 //          Scheduled: a delivery is queued or running.
 //          Lingering: a delivery has just run; a timer looks again soon, so
 //          that messages that follow each other wake nobody, one by one.
-// Whatever else runs on the writers queue delivers first what waits.
 namespace plr {
 
 class BatchLogWriter;
@@ -53,7 +55,16 @@ class LogDelivery {
     void drainInCrash() noexcept;
 
   private:
-    using Batch = std::vector<MessagePtr>;
+    // Runs before the message at `position`.
+    struct Operation {
+        std::size_t position;
+        dispatch::block<void()> run;
+    };
+    struct Batch {
+        std::vector<MessagePtr> messages;
+        std::vector<Operation> operations;
+        [[nodiscard]] bool empty() const noexcept { return messages.empty() && operations.empty(); }
+    };
     enum class State : std::uint8_t { Idle, Scheduled, Lingering };
     struct Writer {
         std::shared_ptr<LogWriter> writer;
@@ -66,8 +77,7 @@ class LogDelivery {
     void schedule();
     void announceRoom() noexcept;
     [[nodiscard]] std::shared_ptr<LogServer> ownerOfServer() const noexcept;
-    template <class Work>
-    void runOnWriters(Work&& work);
+    void queueOperation(dispatch::block<void()>&& operation);
     template <class Work>
     auto syncOnWriters(Work&& work);
 
@@ -78,6 +88,8 @@ class LogDelivery {
     bool deliverPending() PLR_ON(writersQueue_);
     [[nodiscard]] bool takePending() PLR_ON(writersQueue_);
     void writeBatch() PLR_ON(writersQueue_);
+    void write(const MessagePtr& message) PLR_ON(writersQueue_);
+    void endBatch() PLR_ON(writersQueue_);
     void writeStartupMessages() PLR_ON(writersQueue_);
     [[nodiscard]] MessagePtr note(std::uint64_t count, const char* what) const;
 
@@ -107,7 +119,7 @@ class LogDelivery {
     = false;
 
     // What a crash must know about the writers queue.
-    std::atomic<std::size_t> next_{0};   // in batch_: the first that is not written
+    std::atomic<std::size_t> next_{0};   // message of batch_ that is not written
     std::atomic<bool> atWork_{false};    // a writer is being called
     std::atomic<pthread_t> worker_{0};   // the thread that calls it
     std::atomic<bool> crashing_{false};  // writers are not to be called any more

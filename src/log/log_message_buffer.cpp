@@ -209,12 +209,25 @@ void LogMessageBuffer::insert(Number number) {
     char digits[32];
     std::to_chars_result end{};
     if constexpr (std::is_floating_point_v<Number>)
-        end = std::to_chars(digits, std::end(digits), number, std::chars_format::general, 6);
+        end = std::to_chars(digits, std::end(digits), static_cast<double>(number),
+                            std::chars_format::general, 6);
     else
         end = std::to_chars(digits, std::end(digits), number);
     append(std::string_view(digits, static_cast<std::size_t>(end.ptr - digits)));
 }
 
+void LogMessageBuffer::appendNumber(int number) {
+    insert(number);
+}
+void LogMessageBuffer::appendNumber(unsigned int number) {
+    insert(number);
+}
+void LogMessageBuffer::appendNumber(long number) {
+    insert(number);
+}
+void LogMessageBuffer::appendNumber(unsigned long number) {
+    insert(number);
+}
 void LogMessageBuffer::appendNumber(long long number) {
     insert(number);
 }
@@ -222,7 +235,7 @@ void LogMessageBuffer::appendNumber(unsigned long long number) {
     insert(number);
 }
 void LogMessageBuffer::appendNumber(float number) {
-    insert(static_cast<double>(number));
+    insert(number);
 }
 void LogMessageBuffer::appendNumber(double number) {
     insert(number);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <concepts>
 #include <cstdarg>
 #include <memory>
 #include <ostream>
@@ -89,7 +90,12 @@ class PLR_EXPORT LogMessageBuffer {
     void merge(const LogMessageBuffer& other);
     void merge(LogMessageBuffer&& other);
 
-    // As a stream would write them.
+    // As a stream would write them; a stream that exists may show a number of each
+    // type in another way (std::hex).
+    void appendNumber(int number);
+    void appendNumber(unsigned int number);
+    void appendNumber(long number);
+    void appendNumber(unsigned long number);
     void appendNumber(long long number);
     void appendNumber(unsigned long long number);
     void appendNumber(float number);
@@ -134,19 +140,19 @@ inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, bool value) {
     return buffer;
 }
 inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, int number) {
-    buffer.appendNumber(static_cast<long long>(number));
+    buffer.appendNumber(number);
     return buffer;
 }
 inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, unsigned int number) {
-    buffer.appendNumber(static_cast<unsigned long long>(number));
+    buffer.appendNumber(number);
     return buffer;
 }
 inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, long number) {
-    buffer.appendNumber(static_cast<long long>(number));
+    buffer.appendNumber(number);
     return buffer;
 }
 inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, unsigned long number) {
-    buffer.appendNumber(static_cast<unsigned long long>(number));
+    buffer.appendNumber(number);
     return buffer;
 }
 inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, long long number) {
@@ -195,12 +201,13 @@ inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, LogMessageBuffer&&
 PLR_EXPORT LogMessageBuffer& operator<<(LogMessageBuffer& buffer, ObString* string);
 PLR_EXPORT LogMessageBuffer& operator<<(LogMessageBuffer& buffer, ObNumber* number);
 
-// Whatever else a standard stream takes: std::setw(), your own types.
-template <class T>
+// Whatever else a standard stream takes: std::setw(), your own types. (The buffer's
+// type is deduced so that asking a stream for its operators does not end up here.)
+template <std::same_as<LogMessageBuffer> Buffer, class T>
 requires((std::is_class_v<T> || std::is_enum_v<T>)&&requires(std::ostream& stream, const T& value) {
     stream << value;
-}) LogMessageBuffer&
-operator<<(LogMessageBuffer& buffer, const T& value) {
+}) Buffer&
+operator<<(Buffer& buffer, const T& value) {
     static_cast<std::ostream&>(buffer) << value;
     return buffer;
 }

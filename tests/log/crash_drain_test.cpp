@@ -1,0 +1,131 @@
+#include "plr/log/crash_drain.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <exception>
+#include <functional>
+#include <stdexcept>
+#include <thread>
+
+#include "plr/base/assert.h"
+#include "plr/base/report.h"
+#include "plr/log/log_message_buffer.h"
+#include "plr/log/log_server.h"
+#include "plr/log/log_writer.h"
+#include "plr/log/memory_buffered_log_writer.h"
+#include "plr/log/static_logger.h"
+
+namespace {
+
+using plr::LogLevel;
+using plr::LogMessage;
+using plr::LogServer;
+
+void print(const std::string& text) noexcept {
+    static_cast<void>(!::write(STDERR_FILENO, text.data(), text.size()));
+}
+
+// Prints "<text>" for every message; what it gathers goes out with the burst.
+class PrintingWriter : public plr::BatchLogWriter {
+  public:
+    void close() override {}
+    using LogWriter::write;
+    void write(const LogMessage& message) override {
+        if (message.getText() == "crash in the writer")
+            ::raise(SIGSEGV);
+        gathered_ += "<" + message.getText() + ">";
+    }
+    void endBatch() override { flushInCrash(); }
+    void flushInCrash() noexcept override {
+        print(gathered_);
+        gathered_.clear();
+    }
+    void writeInCrash(const LogMessage& message) noexcept override {
+        print("<");
+        print(message.getText());
+        print(">");
+    }
+
+  private:
+    std::string gathered_;
+};
+
+// Logs "0" to "499", and ends the process in the given way on the way.
+void crashAfterLogging(const std::function<void(const plr::StaticLogger&)>& crash, bool start) {
+    const auto server =
+        LogServer::create("s", start ? nullptr : plr::MemoryBufferedLogWriter::create(-1, -1));
+    server->addWriter(std::make_shared<PrintingWriter>());
+    if (start)
+        server->start();
+    else
+        server->debugFlush();
+    plr::drainLogsOnCrash(server);
+    const plr::StaticLogger logger(std::string("d"), server);
+    for (int i = 0; i < 500; ++i)
+        logger.forceLog(LogLevel::Info, plr::LogMessageBuffer() << i);
+    crash(logger);
+    ::pause();
+}
+
+std::string allLines() {
+    std::string lines;
+    for (int i = 0; i < 500; ++i)
+        lines += "<" + std::to_string(i) + ">";
+    return lines;
+}
+
+TEST(CrashDrainDeathTest, WritesWhatWasLoggedBefore) {
+    struct Row {
+        const char* name;
+        std::function<void(const plr::StaticLogger&)> crash;
+        bool start = true;
+    };
+    const Row rows[] = {
+        {"abort", [](const auto&) { std::abort(); }},
+        {"a failed assertion",
+         [](const auto&) {
+             plr::setReportHook([](const char*) noexcept {});
+             PLR_ASSERT(false, "as it should");
+         }},
+        {"a signal on another thread",
+         [](const auto&) { std::thread([] { ::raise(SIGSEGV); }).join(); }},
+        {"an uncaught exception",
+         [](const auto&) {
+             std::set_terminate([] { std::abort(); });  // the usual one, without its text
+             std::thread([] { throw std::runtime_error("uncaught"); }).join();
+         }},
+        {"a crash in a writer",
+         [](const auto& logger) {
+             logger.forceLog(LogLevel::Error, plr::LogMessageBuffer() << "crash in the writer");
+         }},
+        {"before the start", [](const auto&) { std::abort(); }, false},
+        {"a handler from before", [](const auto&) { ::raise(SIGBUS); }},
+    };
+    testing::FLAGS_gtest_death_test_style = "threadsafe";
+    for (const Row& row : rows) {
+        SCOPED_TRACE(row.name);
+        EXPECT_DEATH(
+            {
+                ::signal(SIGBUS, [](int) {
+                    print("the old handler");
+                    ::_exit(1);
+                });
+                crashAfterLogging(row.crash, row.start);
+            },
+            testing::HasSubstr(allLines()));
+    }
+    EXPECT_DEATH(
+        {
+            ::signal(SIGBUS, [](int) {
+                print("the old handler");
+                ::_exit(1);
+            });
+            crashAfterLogging([](const auto&) { ::raise(SIGBUS); }, true);
+        },
+        "the old handler");
+}
+
+}  // namespace

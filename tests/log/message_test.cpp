@@ -1,0 +1,288 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <iomanip>
+#include <limits>
+#include <locale>
+#include <random>
+#include <sstream>
+#include <thread>
+
+#include "plr/log/log_level.h"
+#include "plr/log/log_message.h"
+#include "plr/log/log_message_buffer.h"
+#include "plr/log/log_tag.h"
+
+namespace {
+
+using plr::LogLevel;
+using plr::LogMessage;
+using plr::LogMessageBuffer;
+using plr::LogTag;
+using plr::MetaData;
+using testing::ElementsAre;
+
+TEST(LogLevel, HasNamesLettersAndAnOrder) {
+    struct Row {
+        int value;
+        const char* name;
+        char letter;
+    };
+    const Row rows[] = {{0, "Unset", '?'},  {1, "Always", '?'}, {10, "Trace", 'T'},
+                        {20, "Debug", 'D'}, {40, "Info", 'I'},  {50, "Notice", 'N'},
+                        {70, "Warn", 'W'},  {80, "Error", 'E'}, {100, "Fatal", 'F'},
+                        {255, "Never", '?'}};
+    for (int value = 0; value <= 255; ++value) {
+        const auto* row = std::find_if(std::begin(rows), std::end(rows),
+                                       [value](const Row& each) { return each.value == value; });
+        const auto level = static_cast<LogLevel>(value);
+        EXPECT_STREQ(asString(level), row == std::end(rows) ? "???" : row->name) << value;
+        EXPECT_EQ(asChar(level), row == std::end(rows) ? '?' : row->letter) << value;
+    }
+    using enum LogLevel;
+    EXPECT_EQ(combine(Never, Debug), Never);
+    EXPECT_EQ(combine(Info, Unset), Info);
+    EXPECT_EQ(combine(Unset, Warn), Warn);
+    EXPECT_EQ(combine(Debug, Never), Never);
+    EXPECT_EQ(plr::max(Unset, Never), Never);
+    EXPECT_EQ(plr::max(Warn, LogLevel{30}), Warn);
+}
+
+// What a buffer's text is held against: a standard stream, made anew whenever
+// the buffer's stream ends.
+class ModelBuffer {
+  public:
+    ModelBuffer() { renew(); }
+    std::ostream& stream() { return *stream_; }
+    std::string str() {
+        const std::string text = stream_->str();
+        renew();
+        *stream_ << text;
+        return text;
+    }
+
+  private:
+    void renew() {
+        stream_ = std::make_unique<std::ostringstream>();
+        stream_->unsetf(std::ios_base::skipws);
+        stream_->setf(std::ios_base::boolalpha);
+    }
+    std::unique_ptr<std::ostringstream> stream_;
+};
+
+// Every operation on both; formatting only reaches what goes through the stream.
+class Writer {
+  public:
+    explicit Writer(unsigned seed) : random_(seed) {}
+
+    void step(LogMessageBuffer& buffer, ModelBuffer& model) {
+        static constexpr double kDoubles[] = {0.0,
+                                              -0.0,
+                                              1.0 / 3,
+                                              1e100,
+                                              123456789.0,
+                                              -2.5e-7,
+                                              std::numeric_limits<double>::infinity(),
+                                              std::numeric_limits<double>::quiet_NaN()};
+        const auto bits = static_cast<long long>(random_());
+        switch (random_() % 14) {
+            case 0:
+                return both(buffer, model, static_cast<int>(bits));
+            case 1:
+                return both(buffer, model, static_cast<unsigned>(bits));
+            case 2:
+                return both(buffer, model, static_cast<long>(bits));
+            case 3:
+                return both(buffer, model, bits);
+            case 4:
+                return both(buffer, model, static_cast<unsigned long long>(bits));
+            case 5:
+                return both(buffer, model, kDoubles[random_() % std::size(kDoubles)]);
+            case 6:
+                return both(buffer, model, static_cast<float>(bits % 1000) / 7);
+            case 7:
+                return both(buffer, model, reinterpret_cast<const void*>(bits % 3));
+            case 8:
+                buffer << std::hex << std::showbase;
+                model.stream() << std::hex << std::showbase;
+                return;
+            case 9:
+                buffer << std::setprecision(3) << std::setfill('*') << std::setw(9) << bits;
+                model.stream() << std::setprecision(3) << std::setfill('*') << std::setw(9) << bits;
+                return;
+            case 10:
+                return text(buffer, model, bits % 2 == 0 ? "true" : "false", bits % 2 == 0);
+            case 11:
+                return text(buffer, model, "x", 'x');
+            case 12:
+                return text(buffer, model, "some text", std::string("some text"));
+            default:
+                EXPECT_EQ(buffer.str(), model.str());
+        }
+    }
+
+  private:
+    template <class Value>
+    static void both(LogMessageBuffer& buffer, ModelBuffer& model, Value value) {
+        buffer << value;
+        model.stream() << value;
+    }
+    template <class Value>
+    static void text(LogMessageBuffer& buffer, ModelBuffer& model, std::string_view text,
+                     const Value& value) {
+        buffer << value;
+        model.stream().write(text.data(), static_cast<std::streamsize>(text.size()));
+    }
+    std::mt19937_64 random_;
+};
+
+struct Grouping : std::numpunct<char> {
+    char do_thousands_sep() const override { return '\''; }
+    std::string do_grouping() const override { return "\3"; }
+    char do_decimal_point() const override { return ','; }
+};
+
+TEST(LogMessageBuffer, WritesWhatAStandardStreamWouldWrite) {
+    const std::locale grouped(std::locale::classic(), new Grouping);
+    for (unsigned seed = 0; seed < 400; ++seed) {
+        SCOPED_TRACE(seed);
+        const std::locale before = std::locale::global(seed % 4 == 0 ? grouped : std::locale());
+        Writer writer(seed);
+        LogMessageBuffer buffer;
+        ModelBuffer model;
+        for (int i = 0; i < 20; ++i)
+            writer.step(buffer, model);
+        EXPECT_EQ(buffer.str(), model.str());
+        std::locale::global(before);
+    }
+}
+
+TEST(LogMessageBuffer, GivesEachBufferAStreamWithoutAPast) {
+    {
+        LogMessageBuffer used;
+        std::ostream& stream = used;
+        stream.imbue(std::locale(std::locale::classic(), new Grouping));
+        stream << std::hex << std::setfill('#') << std::setw(7) << 0xABCDEF;
+        stream.iword(0) = 5;
+        stream.setstate(std::ios_base::failbit);
+        stream.width(12);
+        EXPECT_EQ(used.str(), "abc'def");
+    }
+    LogMessageBuffer buffer;
+    std::ostream& stream = buffer;
+    EXPECT_EQ(stream.flags(), std::ios_base::dec | std::ios_base::boolalpha);
+    EXPECT_TRUE(stream.good());
+    EXPECT_EQ(stream.iword(0), 0);
+    stream << 1234567 << ' ' << 0.5;
+    EXPECT_EQ(buffer.str(), "1234567 0.5");
+}
+
+TEST(LogMessageBuffer, FormatsTextsOfAnyLength) {
+    for (const int length : {0, 1, 62, 63, 64, 65, 127, 128, 5000}) {
+        LogMessageBuffer buffer = LogMessageBuffer::createWithFormat("%*s", length, "");
+        EXPECT_EQ(buffer.str(), std::string(static_cast<std::size_t>(length), ' '));
+    }
+}
+
+TEST(LogMessageBuffer, CountsAsFilledOnceItHasAStream) {
+    LogMessageBuffer buffer;
+    EXPECT_TRUE(buffer.empty());
+    static_cast<void>(static_cast<std::ostream&>(buffer));
+    EXPECT_FALSE(buffer.empty());
+    buffer.str();
+    EXPECT_TRUE(buffer.empty());
+}
+
+TEST(LogMessageBuffer, CopiesMovesAndMergesTextAndMetadata) {
+    LogMessageBuffer one;
+    one << std::hex << 255 << MetaData("a");
+    LogMessageBuffer copy(one);
+    copy << 16;  // decimal: a copy has no stream
+    EXPECT_EQ(copy.str(), "ff16");
+    one << 16;
+    LogMessageBuffer two;
+    two << "two" << MetaData("b") << MetaData("c");
+    one << two << '+' << std::move(two);
+    EXPECT_EQ(one.takeString(), "ff10two+two");
+    EXPECT_THAT(one.takeMetadata(), ElementsAre("a", "b", "c", "b", "c"));
+
+    LogMessageBuffer moved = LogMessageBuffer() << "in one " << 1 << ' ' << LogLevel::Warn << true;
+    moved.merge(moved);
+    EXPECT_EQ(moved.str(), "in one 1 Warntruein one 1 Warntrue");
+}
+
+TEST(LogMessage, LeavesNothingToTheNextOne) {
+    std::string text(2000, 'x');
+    std::vector<std::string> metaData{"m"};
+    for (int i = 0; i < 200; ++i) {
+        auto message = LogMessage::create(7, LogLevel::Warn, "a.domain.that.is.not.short",
+                                          std::move(text), std::move(metaData));
+        const std::weak_ptr<LogMessage> late = message;
+        const LogMessage copy(*message);
+        message = nullptr;
+        EXPECT_TRUE(late.expired());
+        EXPECT_EQ(copy.getDomain(), "a.domain.that.is.not.short");
+        EXPECT_EQ(copy.getText().size(), i == 0 ? 2000U : 3U);
+        EXPECT_EQ(copy.getMetaData().size(), i == 0 ? 1U : 0U);
+        EXPECT_EQ(copy.getTimeStamp(), 7);
+        EXPECT_EQ(copy.getExtra(), "");
+        text = "new";
+        metaData.clear();
+    }
+}
+
+TEST(LogTag, NumbersQueuesInTheOrderOfTheCalls) {
+    const auto first = dispatch::queue::create("first");
+    const auto second = dispatch::queue::create("second");
+    const auto numberOf = [](const dispatch::queue& queue) {
+        return reinterpret_cast<std::uintptr_t>(queue.get_specific(plr::kLoggingTagKey));
+    };
+    plr::reset_last_tag();
+    plr::maybe_add_logging_tag(first);
+    plr::maybe_add_logging_tag(first);
+    EXPECT_EQ(numberOf(first), 1U);
+    plr::add_logging_tag(second);
+    plr::add_logging_tag(first);
+    EXPECT_EQ(numberOf(second), 2U);
+    EXPECT_EQ(numberOf(first), 3U);
+    plr::last_tag = std::numeric_limits<std::uint32_t>::max();
+    plr::add_logging_tag(first);
+    EXPECT_EQ(numberOf(first), 1U) << "0 is no tag";
+}
+
+TEST(LogTag, ShowsTheQueuesThatAThreadIsIn) {
+    plr::reset_last_tag();
+    const auto queues = {dispatch::queue::create("1"), dispatch::queue::create("2")};
+    for (const auto& queue : queues)
+        plr::add_logging_tag(queue);
+    std::thread([&] {
+        EXPECT_EQ(plr::get_current_logging_tag(), "");
+        queues.begin()[0].sync([&] {
+            const LogTag outer;
+            queues.begin()[1].sync([] {
+                const LogTag inner;
+                EXPECT_EQ(plr::get_current_logging_tag(), "1+,2+");
+                EXPECT_EQ(plr::get_current_logging_tag(), "1,2");
+                const LogTag again;
+                EXPECT_EQ(plr::get_current_logging_tag(), "1,2,2+");
+            });
+            EXPECT_EQ(plr::get_current_logging_tag(), "1");
+        });
+        EXPECT_EQ(plr::get_current_logging_tag(), "");
+    }).join();
+}
+
+TEST(LogTag, LeavesItsEntryBehindWhenAnotherIsMovedIntoIt) {
+    const auto queue = dispatch::queue::create("tagged");
+    plr::add_logging_tag(queue);
+    std::thread([] {
+        {
+            LogTag kept;
+            LogTag moved;
+            kept = std::move(moved);
+        }
+        EXPECT_EQ(plr::get_current_logging_tag(), "0+") << "outside of queues, and one too many";
+    }).join();
+}
+
+}  // namespace

@@ -1,0 +1,344 @@
+#include "plr/log/log_server.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <functional>
+#include <thread>
+#include <vector>
+
+#include "plr/ipc/read.h"
+#include "plr/ipc/values.h"
+#include "plr/log/log_message_buffer.h"
+#include "plr/log/log_writer.h"
+#include "plr/log/memory_buffered_log_writer.h"
+#include "plr/log/scoped_log_flusher.h"
+#include "plr/log/static_logger.h"
+#include "support/fake_tracked_logger.h"
+#include "support/log_fixture.h"
+#include "support/waiting.h"
+
+namespace {
+
+using namespace std::chrono_literals;
+using plr::LogLevel;
+using plr::LogMessage;
+using plr::LogMessageBuffer;
+using plr::LogServer;
+using plr::MemoryBufferedLogWriter;
+using plr::StaticLogger;
+using plr::test::Event;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+// A writer made of a function, run on the writers queue.
+class FunctionWriter : public plr::LogWriter {
+  public:
+    using Function = std::function<void(const LogMessage&)>;
+    explicit FunctionWriter(Function function) : function_(std::move(function)) {}
+    void close() override { closed_ = true; }
+    using LogWriter::write;
+    void write(const LogMessage& message) override { function_(message); }
+    vox::object getFullConfig() override { return config_; }
+
+    bool closed_ = false;
+    vox::object config_;
+
+  private:
+    const Function function_;
+};
+
+void log(const StaticLogger& logger, const std::string& text, LogLevel level = LogLevel::Info) {
+    logger.forceLog(level, LogMessageBuffer() << text);
+}
+
+std::vector<std::string> textsOf(MemoryBufferedLogWriter& writer) {
+    std::vector<std::string> texts;
+    for (const auto& message : writer.drain())
+        texts.push_back(message->getText());
+    return texts;
+}
+
+TEST(MemoryBufferedLogWriter, DropsTheOldestBeyondItsLimits) {
+    struct Row {
+        const char* name;
+        long maxMessages, maxBytes;
+        std::vector<std::string> left;  // of 4 messages of 8 bytes
+    };
+    const Row rows[] = {{"no limits", -1, MemoryBufferedLogWriter::UNLIMITED, {"0", "1", "2", "3"}},
+                        {"messages", 3, 0, {"1", "2", "3"}},
+                        {"bytes, exceeded by one message", 0, 10, {"2", "3"}},
+                        {"bytes, exactly", 0, 16, {"2", "3"}},
+                        {"less than a message", 0, 1, {"3"}}};
+    for (const Row& row : rows) {
+        SCOPED_TRACE(row.name);
+        const auto writer = MemoryBufferedLogWriter::create(row.maxMessages, row.maxBytes);
+        for (char i = '0'; i < '4'; ++i)
+            writer->write(std::make_shared<LogMessage>(
+                0, LogLevel::Info, "d", std::string(1, i) + "       ", std::vector<std::string>()));
+        std::vector<std::string> left = textsOf(*writer);
+        for (std::string& text : left)
+            text.resize(1);
+        EXPECT_EQ(left, row.left);
+        EXPECT_EQ(writer->getDroppedMessageCount(), 4 - static_cast<long>(row.left.size()));
+    }
+}
+
+TEST(MemoryBufferedLogWriter, StillCountsTheBytesThatWereDrained) {
+    const auto writer = MemoryBufferedLogWriter::create(0, 8);
+    const auto message = std::make_shared<LogMessage>(0, LogLevel::Info, "d", "12345678",
+                                                      std::vector<std::string>());
+    writer->write(message);
+    EXPECT_EQ(textsOf(*writer).size(), 1U);
+    writer->write(message);
+    EXPECT_EQ(textsOf(*writer).size(), 1U) << "nothing is left to drop for the new one";
+    EXPECT_EQ(writer->getDroppedMessageCount(), 0);
+}
+
+TEST(LogServer, DeliversWhatTheStartupBufferHeldBehindANoteOfWhatItDropped) {
+    const auto server = LogServer::create("early", MemoryBufferedLogWriter::create(2, -1));
+    const auto writer = std::make_shared<MemoryBufferedLogWriter>(-1, -1);
+    server->addWriter(writer);
+    const StaticLogger logger(std::string("domain"), server);
+    EXPECT_EQ(logger.getLogLevel(), LogLevel::Unset) << "no levels before the start";
+    for (const char* text : {"1", "2", "3", "4", "5"})
+        log(logger, text);
+    server->debugFlush();
+    EXPECT_THAT(textsOf(*writer), IsEmpty());
+    server->start();
+    const auto messages = writer->drain();
+    ASSERT_EQ(messages.size(), 3U);
+    EXPECT_EQ(messages[0]->getText(), "Note: 3 log messages dropped prior to log start");
+    EXPECT_EQ(messages[0]->getDomain(), "early");
+    EXPECT_EQ(messages[0]->getLevel(), LogLevel::Info);
+    EXPECT_EQ(messages[1]->getText() + messages[2]->getText(), "45");
+    log(logger, "6");
+    server->debugFlush();
+    EXPECT_THAT(textsOf(*writer), ElementsAre("6"));
+}
+
+class ConfiguredServer : public plr::test::LogFixture {};
+
+TEST_F(ConfiguredServer, FindsTheLevelOfTheNearestConfiguredDomain) {
+    const std::pair<const char*, LogLevel> configured[] = {{"a", LogLevel::Debug},
+                                                           {"a-b", LogLevel::Fatal},
+                                                           {"a.b.c.d", LogLevel::Error},
+                                                           {".dotted", LogLevel::Trace},
+                                                           {"quiet", LogLevel::Never}};
+    for (const auto& [domain, level] : configured)
+        configure(domain, level);
+    const std::pair<const char*, LogLevel> rows[] = {
+        {"a.b.c", LogLevel::Debug},    {"a.b.c.d.e", LogLevel::Error}, {"a.b", LogLevel::Debug},
+        {"a-b.c", LogLevel::Fatal},    {"ab", LogLevel::Info},         {"", LogLevel::Info},
+        {"dotted.x", LogLevel::Trace}, {"quiet.x", LogLevel::Never},   {"z", LogLevel::Info}};
+    for (const auto& [domain, level] : rows) {
+        EXPECT_EQ(server_->getCurrentLogLevel(domain), level) << domain;
+        EXPECT_EQ(server_->getCurrentLogLevelSlow(domain), level) << domain;
+    }
+    configure("a", LogLevel::Unset);
+    EXPECT_EQ(server_->getCurrentLogLevel("a.b"), LogLevel::Info);
+    server_->updateConfig(vox::dict());
+    server_->updateConfig(vox::dict::create());
+    server_->debugFlush();
+    EXPECT_EQ(server_->getCurrentLogLevel("a-b"), LogLevel::Fatal);
+}
+
+TEST_F(ConfiguredServer, TellsANewLoggerItsLevelAtOnceAndThenFromTheTree) {
+    configure("radio", LogLevel::Debug);
+    const auto logger = std::make_shared<plr::test::FakeTrackedLogger>();
+    server_->registerLogger("radio.sms", logger);
+    server_->debugFlush();
+    EXPECT_THAT(logger->takeTold(), ElementsAre(LogLevel::Debug, LogLevel::Debug));
+    configure("radio", LogLevel::Warn);
+    EXPECT_THAT(logger->takeTold(), ElementsAre(LogLevel::Warn));
+}
+
+TEST_F(ConfiguredServer, ReportsLoggersAndTheWritersThatHaveSomethingToTell) {
+    configure("radio", LogLevel::Debug);
+    const auto logger = std::make_shared<plr::test::FakeTrackedLogger>("sms", LogLevel::Trace);
+    server_->registerLogger("radio.sms", logger);
+    const auto writer = std::make_shared<FunctionWriter>([](const LogMessage&) {});
+    const vox::dict described = vox::dict::create();
+    described["path"] = vox::string("/log");
+    writer->config_ = described;
+    server_->addWriter(writer);
+    const vox::dict config = server_->getSimpleConfig();
+    const std::pair<const char*, const char*> rows[] = {
+        {"kDomainLogLevels", "{\n\t\"radio\": 20\n}"},
+        {"kLoggers.0.kLoggerName", "sms"},
+        {"kLoggers.0.kLoggerLevel", "10"},
+        {"kLoggers.0.kLoggerDomain", "radio.sms"},
+        {"kLoggers.1", "null"},
+        {"kLogWriters.0.path", "/log"},
+        {"kLogWriters.1", "null"}};
+    for (const auto& [path, value] : rows) {
+        const vox::object found = vox::get_subpath(config, path);
+        EXPECT_EQ(vox::dyn_cast_or_default(found, found.to_string()), value) << path;
+    }
+    const vox::dict levels = server_->getConfig()["kDomainLogLevels"];
+    EXPECT_EQ(levels.count(), 3U) << "the root, radio and radio.sms";
+}
+
+TEST(LogServer, WritesToWhoeverIsThereWhenAMessageIsLogged) {
+    const auto server = LogServer::create("s");
+    const StaticLogger logger(std::string("d"), server);
+    const auto first = std::make_shared<MemoryBufferedLogWriter>(-1, -1);
+    std::vector<std::string> seen;
+    const auto second = std::make_shared<FunctionWriter>(
+        [&](const LogMessage& message) { seen.push_back(message.getText()); });
+    server->addWriter(first);
+    log(logger, "1");
+    server->addWriter(second);
+    log(logger, "2");
+    server->close();
+    ASSERT_EQ(server->flush().wait(dispatch::time::after(plr::test::kBound)), 0);
+    EXPECT_TRUE(second->closed_);
+    EXPECT_THAT(seen, ElementsAre("2"));
+    EXPECT_THAT(textsOf(*first), ElementsAre("1", "2"));
+}
+
+// Nobody flushes here: delivery starts by itself, at once and again.
+TEST(LogServer, DeliversEveryMessageByItself) {
+    const auto server = LogServer::create("s");
+    const StaticLogger logger(std::string("d"), server);
+    Event written;
+    server->addWriter(
+        std::make_shared<FunctionWriter>([&](const LogMessage&) { written.signal(); }));
+    for (int burst = 0; burst < 200; ++burst) {
+        for (int i = 0; i < burst % 3 + 1; ++i)
+            log(logger, "x", burst % 7 == 0 ? LogLevel::Error : LogLevel::Info);
+        for (int i = 0; i < burst % 3 + 1; ++i)
+            ASSERT_TRUE(written.wait());
+    }
+}
+
+TEST(LogServer, LivesUntilWhatWasLoggedIsWritten) {
+    Event go;
+    Event written;
+    auto server = LogServer::create("s");
+    const std::weak_ptr<LogServer> late = server;
+    server->addWriter(std::make_shared<FunctionWriter>([&](const LogMessage&) {
+        EXPECT_TRUE(go.wait());
+        EXPECT_FALSE(late.expired());
+        written.signal();
+    }));
+    server->log(
+        std::make_shared<LogMessage>(0, LogLevel::Info, "d", "x", std::vector<std::string>()));
+    server = nullptr;
+    go.signal();
+    EXPECT_TRUE(written.wait());
+}
+
+TEST(ScopedLogFlusher, WaitsForTheWritersButNotForEver) {
+    { const plr::ScopedLogFlusher nothing(nullptr); }
+    const auto server = LogServer::create("s");
+    Event go;
+    std::atomic<int> written{0};
+    server->addWriter(std::make_shared<FunctionWriter>([&](const LogMessage&) {
+        EXPECT_TRUE(go.wait());
+        ++written;
+    }));
+    const StaticLogger logger(std::string("d"), server);
+    log(logger, "held up");
+    { const plr::ScopedLogFlusher flusher(server, 1ms); }
+    EXPECT_EQ(written, 0);
+    go.signal();
+    { const plr::ScopedLogFlusher flusher(server); }
+    EXPECT_EQ(written, 1);
+}
+
+TEST(LogServer, DropsBeyondItsLimitAndSaysHowMuchAtTheGap) {
+    const auto server = LogServer::create("s");
+    const StaticLogger logger(std::string("d"), server);
+    Event started;
+    Event go;
+    std::vector<std::string> seen;
+    server->addWriter(std::make_shared<FunctionWriter>([&](const LogMessage& message) {
+        if (message.getText() == "first") {
+            started.signal();
+            EXPECT_TRUE(go.wait());
+        }
+        seen.push_back(message.getText());
+    }));
+    server->limitPending(2, LogServer::WhenFull::Drop);
+    log(logger, "first");
+    ASSERT_TRUE(started.wait());
+    for (int i = 0; i < 7; ++i)
+        log(logger, std::to_string(i));
+    go.signal();
+    server->debugFlush();
+    log(logger, "last");
+    server->debugFlush();
+    EXPECT_THAT(seen, ElementsAre("first", "0", "1",
+                                  "Note: 5 log messages dropped, too many were waiting", "last"));
+}
+
+// Writers that log are not held up by their own queue.
+TEST(LogServer, HasCallersWaitAtItsLimit) {
+    const auto server = LogServer::create("s");
+    const StaticLogger logger(std::string("d"), server);
+    server->limitPending(3, LogServer::WhenFull::Wait);
+    int written = 0;
+    server->addWriter(std::make_shared<FunctionWriter>([&](const LogMessage& message) {
+        ++written;
+        if (message.getText() == "0")
+            for (int i = 0; i < 10; ++i)
+                log(logger, "from the writer");
+    }));
+    for (int i = 0; i < 1000; ++i)
+        log(logger, std::to_string(i));
+    server->debugFlush();
+    server->debugFlush();
+    EXPECT_EQ(written, 1010);
+}
+
+struct Seen {
+    std::uint64_t orderHash = 0;
+    std::vector<int> nextOfThread;
+    long count = 0;
+    bool inOrder = true;
+
+    void add(const LogMessage& message) {
+        const int thread = std::stoi(message.getDomain());
+        const int number = std::stoi(message.getText());
+        inOrder = inOrder && nextOfThread[static_cast<std::size_t>(thread)]++ == number;
+        orderHash = orderHash * 1099511628211U + static_cast<std::uint64_t>(thread);
+        ++count;
+    }
+};
+
+TEST_F(ConfiguredServer, GivesAllWritersOneOrderWhateverHappens) {
+    constexpr int kThreads = 16;
+    constexpr int kMessages = 100'000;
+    Seen seen[2];
+    for (Seen& by : seen) {
+        by.nextOfThread.resize(kThreads);
+        server_->addWriter(std::make_shared<FunctionWriter>(
+            [&by](const LogMessage& message) { by.add(message); }));
+    }
+    std::atomic<int> running{kThreads};
+    std::vector<std::jthread> threads;
+    for (int thread = 0; thread < kThreads; ++thread)
+        threads.emplace_back([&, thread] {
+            StaticLogger logger(std::to_string(thread), server_);
+            for (int i = 0; i < kMessages; ++i) {
+                logger.forceLog(LogLevel::Error, LogMessageBuffer() << i);
+                if (i % 64 == 0)
+                    logger.updateLogLevel();
+            }
+            --running;
+        });
+    for (int i = 0; running != 0; ++i)
+        configure(std::to_string(i % kThreads).c_str(),
+                  i % 3 == 0 ? LogLevel::Trace : LogLevel::Warn);
+    threads.clear();
+    server_->debugFlush();
+    for (const Seen& by : seen) {
+        EXPECT_EQ(by.count, long{kThreads} * kMessages);
+        EXPECT_TRUE(by.inOrder);
+    }
+    EXPECT_EQ(seen[0].orderHash, seen[1].orderHash);
+}
+
+}  // namespace
