@@ -211,6 +211,7 @@ pelorin_component(log_core LEVEL 3 LIBRARY pelorin
     include/plr/log/console_log_writer.h
     include/plr/log/crash_drain.h
     include/plr/log/file_log_writer.h
+    include/plr/log/kel_log_writer.h
     include/plr/log/log_server.h
     include/plr/log/log_writer.h
     include/plr/log/logger.h
@@ -231,6 +232,7 @@ pelorin_component(log_core LEVEL 3 LIBRARY pelorin
     src/log/crash_drain.h
     src/log/crash_sink.h
     src/log/file_log_writer.cpp
+    src/log/kel_log_writer.cpp
     src/log/level_table.cpp
     src/log/level_table.h
     src/log/log_delivery.cpp

@@ -2,15 +2,14 @@
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <cstdint>
-#include <limits>
-#include <map>
 #include <memory>
 #include <string>
 #include <utility>
 
-#include "plr/concurrency/clock.h"
 #include "support/fake_log.h"
+#include "support/manual_calendar.h"
 
 namespace {
 
@@ -82,10 +81,10 @@ TEST_F(KelLogWriterTest, ElapsedTimeIsSecondsAndMicroseconds) {
 }
 
 TEST_F(KelLogWriterTest, AStartTimeOfMinusOneIsNow) {
+    const plr::test::ManualCalendar calendar{std::chrono::nanoseconds(kStart)};
     const auto writer = KelLogWriter::create(nullptr, nullptr, -1);
-    const auto now = static_cast<std::int64_t>(plr::Clock::now_in_nanoseconds());
-    writer->write(message(now));
-    EXPECT_EQ(journal_.receiveField("ZTSTARTTIME").substr(0, 5), "     ");
+    writer->write(message(kStart + 2'000'000'000));
+    EXPECT_EQ(journal_.receiveField("ZTSTARTTIME"), "     2.000000");
 }
 
 TEST_F(KelLogWriterTest, AClosedWriterIgnoresEverything) {
