@@ -3,16 +3,18 @@
 #include <ctime>
 
 #include "dispatch/calendar.h"
-#include "plr/base/report.h"
+#include "kel/kel.h"
 
 namespace plr {
 namespace {
 
 constexpr std::uint64_t kNanosecondsPerSecond = 1'000'000'000;
 
+constexpr int kErrorPriority = 3;  // RFC 5424
+
 [[gnu::cold, gnu::noinline]] void complain(int error) noexcept {
-    report("Failed to get time, %p\n",
-           reinterpret_cast<void*>(static_cast<std::uintptr_t>(static_cast<unsigned>(error))));
+    const auto code = static_cast<std::uintptr_t>(static_cast<unsigned>(error));
+    kel_log(kErrorPriority, "Failed to get time, %p\n", reinterpret_cast<void*>(code));
 }
 
 }  // namespace

@@ -1,20 +1,21 @@
 #include "plr/concurrency/clock.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cerrno>
-#include <string>
+#include <utility>
 
-#include "plr/base/report.h"
+#include "support/fake_log.h"
 #include "support/manual_calendar.h"
 
 namespace {
 
 using plr::Clock;
+using plr::test::FakeLog;
+using plr::test::LogPlaces;
 using plr::test::ManualCalendar;
 using namespace std::chrono_literals;
-
-std::string reported;
 
 TEST(Clock, CountsTheNanosecondsOfTheCalendar) {
     ManualCalendar calendar(1'700'000'000s + 5ns);
@@ -34,12 +35,14 @@ TEST(Clock, FollowsTheSystemsTime) {
 }
 
 TEST(Clock, AFailureIsLoggedAndGivesZero) {
+    LogPlaces places;
+    FakeLog journal(places.journal());
     ManualCalendar calendar;
     calendar.fail(EINVAL);
-    const auto hook = plr::setReportHook([](const char* line) noexcept { reported = line; });
     EXPECT_EQ(Clock::now_in_nanoseconds(), 0u);
-    plr::setReportHook(hook);
-    EXPECT_EQ(reported, "Failed to get time, 0x16\n");
+    const auto fields = journal.receiveFields();
+    EXPECT_THAT(fields, testing::Contains(std::pair("MESSAGE", "Failed to get time, 0x16\n")));
+    EXPECT_THAT(fields, testing::Contains(std::pair("PRIORITY", "3")));
     calendar.fail(0);
     EXPECT_NE(Clock::now_in_nanoseconds(), 0u);
 }
