@@ -49,26 +49,6 @@ class Thing : public plr::SharedSynchronizable<Thing> {
     End& end_;
 };
 
-class DerivedThing : public Thing {
-  public:
-    DerivedThing(End& end, bool& destroyed) : Thing(end), destroyed_(destroyed) {}
-    ~DerivedThing() override { destroyed_ = true; }
-
-  private:
-    bool& destroyed_;
-};
-
-TEST(SharedSynchronizable, RunsWorkInTheOrderOfSubmission) {
-    End end;
-    const auto thing = Thing::create(end);
-    std::vector<int> order;  // touched on the queue only
-    for (int i = 0; i < 3; ++i)
-        thing->execute_wrapped([&order, i] { order.push_back(i); });
-    thing->execute_wrapped(dispatch::block<void()>([&order] { order.push_back(3); }));
-    EXPECT_EQ(thing->execute_wrapped_sync([&order] { return order; }),
-              (std::vector<int>{0, 1, 2, 3}));
-}
-
 TEST(SharedSynchronizable, WrappedWorkKeepsTheObjectAlive) {
     End end;
     auto thing = Thing::create(end);
@@ -112,62 +92,47 @@ TEST(SharedSynchronizable, DroppingTheLastOwnerOnTheQueueDestroysBehindTheQueued
     EXPECT_TRUE(end.onItsQueue);
 }
 
-TEST(SharedSynchronizable, RefusesWorkOnceTheLastOwnerIsGone) {
+TEST(SharedSynchronizable, RefusesWorkWhileNobodyOwnsIt) {
     End end;
-    auto thing = Thing::create(end);
-    const Thing* raw = thing.get();
-    const dispatch::queue queue = thing->queue();
     Event dropped;
-    bool ran = false;
+    class Derived : public Thing {
+      public:
+        using Thing::Thing;
+    };
+    auto* thing = new Derived(end);
+    const auto expectRefused = [thing] {
+        EXPECT_THROW(thing->execute_wrapped([] { FAIL(); }), std::bad_weak_ptr);
+        EXPECT_THROW(static_cast<void>(thing->weak_from_this()), std::bad_weak_ptr);
+    };
+    expectRefused();
+    std::shared_ptr<Derived> owner = Thing::make_shared_ptr(thing);
+    EXPECT_EQ(static_cast<const Thing*>(thing)->weak_from_this().lock(), owner);
+    EXPECT_STREQ(thing->queue().label(), "thing");
     // Queued before the drop, so that it runs before the destruction.
-    queue.async([&] {
+    thing->queue().async([&] {
         EXPECT_TRUE(dropped.wait());
-        EXPECT_THROW(raw->execute_wrapped([&ran] { ran = true; }), std::bad_weak_ptr);
-        EXPECT_THROW(static_cast<void>(raw->weak_from_this()), std::bad_weak_ptr);
+        expectRefused();
     });
-    thing.reset();
+    owner.reset();
     dropped.signal();
     EXPECT_TRUE(end.wait());
-    drain(queue);
-    EXPECT_FALSE(ran);
-}
-
-TEST(SharedSynchronizable, RefusesWorkBeforeItIsOwned) {
-    End end;
-    auto* thing = new Thing(end);
-    EXPECT_THROW(thing->execute_wrapped([] {}), std::bad_weak_ptr);
-    EXPECT_THROW(static_cast<void>(thing->weak_from_this()), std::bad_weak_ptr);
-    const auto owner = Thing::make_shared_ptr(thing);
-    EXPECT_EQ(thing->weak_from_this().lock(), owner);
-    const Thing& constant = *thing;
-    EXPECT_EQ(constant.weak_from_this().lock(), owner);
-}
-
-TEST(SharedSynchronizable, OwnsDerivedClassesAndNothingAtAll) {
-    End end;
-    bool destroyed = false;
-    const std::shared_ptr<DerivedThing> derived =
-        Thing::make_shared_ptr(new DerivedThing(end, destroyed));
-    const dispatch::queue queue = derived->queue();
-    EXPECT_EQ(std::string(queue.label()), "thing");
-    std::weak_ptr<Thing> weak = derived->weak_from_this();
-    const_cast<std::shared_ptr<DerivedThing>&>(derived).reset();
-    EXPECT_TRUE(end.wait());
-    EXPECT_TRUE(destroyed);
     EXPECT_EQ(Thing::make_shared_ptr(static_cast<Thing*>(nullptr)).get(), nullptr);
 }
 
-TEST(SharedSynchronizable, SynchronousWorkReturnsItsResult) {
+TEST(SharedSynchronizable, RunsWorkInOrderAndReturnsResults) {
     End end;
     const auto thing = Thing::create(end);
-    bool ran = false;
-    thing->execute_wrapped_sync([&] { ran = thing->queue().is_current(); });
-    EXPECT_TRUE(ran);
-    EXPECT_EQ(thing->execute_wrapped_sync([] { return std::string("text"); }), "text");
+    std::vector<int> order;  // touched on the queue only
+    for (int i = 0; i < 3; ++i)
+        thing->execute_wrapped([&order, i] { order.push_back(i); });
+    thing->execute_wrapped(dispatch::block<void()>([&order] { order.push_back(3); }));
+    EXPECT_EQ(thing->execute_wrapped_sync([&order] { return order; }),
+              (std::vector<int>{0, 1, 2, 3}));
     EXPECT_EQ(*thing->execute_wrapped_sync([] { return std::make_unique<int>(7); }), 7);
     // perform() also from the queue itself.
-    EXPECT_EQ(thing->execute_wrapped_sync([&] { return thing->performed([] { return 8; }); }), 8);
-    EXPECT_EQ(thing->performed([&] { return thing->queue().is_current(); }), true);
+    const auto onQueue = [&] { return thing->queue().is_current(); };
+    EXPECT_TRUE(thing->execute_wrapped_sync([&] { return thing->performed(onQueue); }));
+    EXPECT_TRUE(thing->performed(onQueue));
 }
 
 TEST(WhileAlive, DoesNothingOnceTheObjectIsGone) {

@@ -52,9 +52,4 @@ TEST(Block, OverloadsWithStdFunctionDoNotCollideOnALambda) {
     static_assert(!std::is_convertible_v<void (*)(), block<void()>>);
 }
 
-TEST(Block, AnExceptionThatLeavesItEndsTheProcess) {
-    const block<void()> throwing([] { throw 1; });
-    EXPECT_DEATH(throwing(), "");
-}
-
 }  // namespace

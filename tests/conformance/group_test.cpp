@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <memory>
 #include <optional>
 #include <thread>
 #include <vector>
@@ -94,13 +95,9 @@ TEST(Group, AsyncIsAMemberUntilItsClosureIsDestroyed) {
     const auto serial = queue::create("serial");
     const group work;
     std::atomic<int> destroyed{0};
-    struct Tracked {
-        explicit Tracked(std::atomic<int>* destructions) : count(destructions) {}
-        ~Tracked() { ++*count; }
-        std::atomic<int>* count;
-    };
     for (int i = 0; i < 100; ++i)
-        work.async(serial, [held = std::make_unique<Tracked>(&destroyed)] {});
+        work.async(serial, [held = std::shared_ptr<void>(nullptr,
+                                                         [&destroyed](void*) { ++destroyed; })] {});
     EXPECT_EQ(work.wait(dispatch::time::after(plr::test::kBound)), 0);
     EXPECT_GE(destroyed, 99);  // the session of the last may go just before its closure
     drain(serial);

@@ -93,11 +93,6 @@ TEST(Sync, OntoTheQueueOneIsOnStopsTheProcess) {
     EXPECT_DEATH(child.sync([&] { other.sync([&] { child.sync([] {}); }); }), "'lower'");
 }
 
-TEST(Sync, AnExceptionEndsTheProcess) {
-    const auto serial = queue::create("serial");
-    EXPECT_DEATH(serial.sync([] { throw 1; }), "");
-}
-
 // Many more workers than processors wait in sync() for work that is queued
 // behind them.
 TEST(Sync, BlockedWorkersAreReplaced) {

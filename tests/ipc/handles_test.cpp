@@ -1,9 +1,7 @@
 #include <gtest/gtest.h>
 
-#include <functional>
 #include <string>
 #include <utility>
-#include <vector>
 
 #include "plr/ipc.h"
 
@@ -14,15 +12,11 @@ TEST(Object, IsNeverEmpty) {
     const vox::object taken = std::move(moved);
     const std::pair<const char*, vox::object> cases[] = {
         {"default", vox::object()},
-        {"null pointer", vox::object(nullptr)},
         {"adopted null", vox::object::adopt(nullptr)},
-        {"retained null", vox::object::retain(nullptr)},
         {"moved from", moved},
         {"dict of a number", vox::dict(vox::int64(1))},
         {"array of a dictionary", vox::array(vox::dict::create())},
         {"connection of a string", vox::connection(vox::string("x"))},
-        {"endpoint of a string", vox::endpoint(vox::string("x"))},
-        {"missing entry", vox::dict::create()["k"]},
         {"entry of no dictionary", vox::dict()["k"]},
         {"past the end", vox::array::create()[0]},
     };
@@ -55,21 +49,16 @@ TEST(ObjectProxy, ReadsByTypeAndStoresEveryKind) {
     vox::object moved = vox::string("text");
     values["object"] = std::move(moved);
     EXPECT_EQ(moved.type(), VOX_TYPE_NULL);  // NOLINT(bugprone-use-after-move): so it says
-    const vox::dict inner = vox::dict::create();
-    values["dict"] = inner;
     values["array"] = vox::array::create();
     values["copy"] = values["object"];
     values["missing"] = values["no such key"];
 
     EXPECT_EQ(vox::object(values["copy"]).text(), "text");
-    EXPECT_EQ(vox::dict(values["dict"]).get(), inner.get());
     EXPECT_TRUE(vox::array(values["array"]));
     const vox::dict converted = values["array"];
     EXPECT_FALSE(converted);
-    const vox::array alsoConverted = values["dict"];
-    EXPECT_FALSE(alsoConverted);
     EXPECT_TRUE(values.contains("missing"));
-    EXPECT_EQ(values.count(), 5U);
+    EXPECT_EQ(values.count(), 4U);
 }
 
 TEST(ObjectProxy, AssigningNullKeepsTheKey) {
@@ -77,13 +66,7 @@ TEST(ObjectProxy, AssigningNullKeepsTheKey) {
     values["k"] = vox::int64(1);
     values["k"] = nullptr;
     values["new"] = nullptr;
-    EXPECT_EQ(values.count(), 2U);
-    EXPECT_TRUE(values.contains("k"));
-    EXPECT_EQ(vox::object(values["k"]).type(), VOX_TYPE_NULL);
-    EXPECT_TRUE(values.contains("new"));
-}
-
-TEST(ObjectProxy, AssigningToNoDictionaryDoesNothing) {
+    EXPECT_EQ(values.to_string(), "{\n\t\"k\": null,\n\t\"new\": null\n}");
     const vox::dict none;
     none["k"] = vox::int64(1);
     EXPECT_EQ(none.count(), 0U);

@@ -35,9 +35,7 @@ TEST(ToString, RendersEveryType) {
         const char* expected;
     } rows[] = {
         {"empty dictionary", vox::dict::create(), "{}"},
-        {"one entry", dictOf("k", vox::int64(1)), "{\n\t\"k\": 1\n}"},
         {"empty array", vox::array::create(), "[]"},
-        {"array", vox::array_creator()("a")("b"), "[\n\t0: \"a\",\n\t1: \"b\"\n]"},
         {"nested", nested(),
          "{\n\t\"a\": [\n\t\t0: \"x\",\n\t\t1: {\n\t\t\t\"b\": true\n\t\t},\n\t\t2: []\n\t],\n"
          "\t\"e\": {}\n}"},
@@ -89,35 +87,30 @@ TEST_F(DateToString, IsLocalTimeInWholeSeconds) {
 // Users may build values deeper than any that a message can carry. On a stack
 // far too small for a call per level:
 TEST(ToString, NeedsNoStackForDepth) {
-    constexpr int kDepth = 3000;
-    vox::object deep = vox::array::create();
-    for (int i = 1; i < kDepth; ++i) {
-        const vox::array outer = vox::array::create();
-        outer.append(deep);
-        deep = outer;
-    }
+    constexpr std::size_t kDepth = 3000;
     struct Call {
-        const vox::object& value;
+        vox::object value = vox::array::create();
         std::size_t length = 0;
-    } call{deep};
+    } call;
+    for (std::size_t i = 1; i < kDepth; ++i) {
+        const vox::array outer = vox::array::create();
+        outer.append(call.value);
+        call.value = outer;
+    }
+    const auto describe = [](void* context) -> void* {
+        auto* described = static_cast<Call*>(context);
+        described->length = described->value.to_string().size();
+        return nullptr;
+    };
     pthread_attr_t attributes;
-    ASSERT_EQ(pthread_attr_init(&attributes), 0);
+    pthread_attr_init(&attributes);
     ASSERT_EQ(pthread_attr_setstacksize(&attributes, 128U * 1024), 0);
     pthread_t thread{};
-    ASSERT_EQ(pthread_create(
-                  &thread, &attributes,
-                  [](void* context) -> void* {
-                      auto* described = static_cast<Call*>(context);
-                      described->length = described->value.to_string().size();
-                      return nullptr;
-                  },
-                  &call),
-              0);
+    ASSERT_EQ(pthread_create(&thread, &attributes, describe, &call), 0);
     pthread_join(thread, nullptr);
     pthread_attr_destroy(&attributes);
     // Twice the tabs of every level, and "[", "\n", "0: ", "\n", "]" around it.
-    constexpr std::size_t kTabs = static_cast<std::size_t>(kDepth) * (kDepth - 1);
-    EXPECT_EQ(call.length, kTabs - (kDepth - 1) + 7U * (kDepth - 1) + 2);
+    EXPECT_EQ(call.length, kDepth * (kDepth - 1) - (kDepth - 1) + 7U * (kDepth - 1) + 2);
 }
 
 }  // namespace

@@ -1,36 +1,29 @@
 // Peers that do not read, or stop in the middle of a frame.
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <atomic>
 #include <cerrno>
+#include <optional>
 #include <string>
 
 #include "support/vox_raw_peer.h"
 
 namespace {
 
-using plr::test::descriptionOf;
-using plr::test::Inbox;
-using plr::test::message;
-using plr::test::RawPeer;
-using plr::test::Ref;
+using namespace plr::test;
 using vox_link::frame_type;
-using Bytes = RawPeer::Bytes;
 
-TEST(VoxSlowPeer, AFrameMustBeWholeInTime) {
+TEST(VoxSlowFrame, MustBeWholeInTime) {
     vox_limits_t limits = vox_limits_default();
     limits.incomplete_frame_ms = 20;
-    auto [connection, peer] = plr::test::connectionWithRawPeer(&limits);
-    Inbox inbox;
-    plr::test::resumeWith(connection, inbox);
-    const Bytes whole = RawPeer::frame(frame_type::message, 0, message(1));
-    peer.send(RawPeer::join({RawPeer::hello(), whole}));
-    ASSERT_TRUE(inbox.wait(1));
-    peer.send(std::span(whole).first(whole.size() - 1));
-    const Ref error = inbox.waitForError();
-    EXPECT_EQ(vox_error_get_code(error), VOX_ERROR_CONNECTION_INVALID);
-    EXPECT_NE(descriptionOf(error).find("not whole after 20 ms"), std::string::npos);
+    RawPair pair(&limits);
+    pair.start();
+    const Bytes whole = plainMessage(1);
+    pair.peer.send(whole);
+    ASSERT_TRUE(pair.end.inbox.wait(1));
+    pair.peer.send(std::span(whole).first(whole.size() - 1));
+    EXPECT_EQ(pair.end.inbox.errorCode(), VOX_ERROR_CONNECTION_INVALID);
+    EXPECT_NE(pair.end.inbox.errorText().find("not whole after 20 ms"), std::string::npos);
 }
 
 vox_limits_t smallQueue(vox_overflow_policy_t policy) {
@@ -41,162 +34,124 @@ vox_limits_t smallQueue(vox_overflow_policy_t policy) {
     return limits;
 }
 
-TEST(VoxSlowPeer, IsDisconnectedWhenThatIsThePolicy) {
-    const plr::test::Reports reports;
-    const vox_limits_t limits = smallQueue(VOX_OVERFLOW_DISCONNECT);
-    auto [connection, peer] = plr::test::connectionWithRawPeer(&limits);
-    Inbox inbox;
-    Inbox refused;
-    plr::test::resumeWith(connection, inbox);
-    peer.send(RawPeer::hello());
-    int error = 0;
-    vox_statistics_t counts;
-    while (error == 0) {
-        error = vox_connection_send_message(connection, message(1, 1000));
-        vox_connection_get_statistics(connection, &counts);
-        ASSERT_LE(counts.queued_bytes, limits.max_queued_bytes);
+// A peer with little room in the queue for it, which has said hello.
+class VoxSlowPeer : public ::testing::Test {
+  protected:
+    void start(vox_overflow_policy_t policy, const End::Handler& first = {}) {
+        limits = smallQueue(policy);
+        pair.emplace(&limits);
+        pair->start(first);
     }
-    EXPECT_EQ(error, EPIPE);
-    const Ref event = inbox.waitForError();
-    EXPECT_EQ(vox_error_get_code(event), VOX_ERROR_CONNECTION_INVALID);
-    EXPECT_NE(descriptionOf(event).find("does not read"), std::string::npos);
-    EXPECT_LE(reports.count("does not read"), 1u);
+    // What it does not get beyond the limits.
+    [[nodiscard]] bool isWithin(std::uint32_t times) const {
+        const vox_statistics_t counts = pair->end.counts();
+        return counts.queued_bytes <= times * limits.max_queued_bytes &&
+               counts.queued_messages <= times * limits.max_queued_messages;
+    }
+    // Sends until a message is not taken; that error.
+    int fill() {
+        for (;;) {
+            const int error = pair->end.send(message(accepted, 1000));
+            EXPECT_TRUE(isWithin(1));
+            if (error != 0)
+                return error;
+            ++accepted;
+        }
+    }
+    void expectDisconnected() {
+        EXPECT_EQ(pair->end.inbox.errorCode(), VOX_ERROR_CONNECTION_INVALID);
+        EXPECT_NE(pair->end.inbox.errorText().find("does not read"), std::string::npos);
+    }
+
+    vox_limits_t limits = {};
+    std::optional<RawPair> pair;
+    std::int64_t accepted = 0;
+};
+
+TEST_F(VoxSlowPeer, IsDisconnectedWhenThatIsThePolicy) {
+    start(VOX_OVERFLOW_DISCONNECT);
+    EXPECT_EQ(fill(), EPIPE);
+    expectDisconnected();
 }
 
-TEST(VoxSlowPeer, OneMessageOfAnySizeIsTakenWhenNothingWaits) {
-    const vox_limits_t limits = smallQueue(VOX_OVERFLOW_DROP);
-    auto [connection, peer] = plr::test::connectionWithRawPeer(&limits);
-    Inbox inbox;
-    plr::test::resumeWith(connection, inbox);
-    peer.send(RawPeer::hello());
-    EXPECT_EQ(vox_connection_send_message(connection, message(1, 4u << 20)), 0);
+TEST_F(VoxSlowPeer, GetsOneMessageOfAnySizeWhenNothingWaits) {
+    start(VOX_OVERFLOW_DROP);
+    End& end = pair->end;
+    const RawPeer& peer = pair->peer;
+    EXPECT_EQ(end.send(message(1, 4u << 20)), 0);
     EXPECT_EQ(peer.readFrame().first.type, frame_type::hello);
-    EXPECT_EQ(vox_connection_send_message(connection, message(2)), ENOBUFS) << "that one waits";
+    EXPECT_EQ(end.send(message(2)), ENOBUFS) << "that one waits";
     EXPECT_EQ(peer.readFrame().first.length >> 20, 4u);
     EXPECT_EQ(peer.readFrame().first.type, frame_type::dropped);
     // The peer may have read it before the writer came back from the kernel.
-    EXPECT_TRUE(plr::test::eventually([&sender = connection] {
-        return vox_connection_send_message(sender, message(3, 4u << 20)) == 0;
-    }));
-    vox_connection_cancel(connection);
-    EXPECT_TRUE(inbox.waitForError());
+    EXPECT_TRUE(eventually([&] { return end.send(message(3, 4u << 20)) == 0; }));
 }
 
-TEST(VoxSlowPeer, LearnsHowManyMessagesWereDroppedWhenThatIsThePolicy) {
-    const vox_limits_t limits = smallQueue(VOX_OVERFLOW_DROP);
-    auto [connection, peer] = plr::test::connectionWithRawPeer(&limits);
-    Inbox inbox;
-    plr::test::resumeWith(connection, inbox);
-    peer.send(RawPeer::hello());
-    std::int64_t accepted = 0;
-    std::int64_t dropped = 0;
-    constexpr std::int64_t kSent = 3000;
-    vox_statistics_t counts;
-    for (std::int64_t n = 0; n < kSent; ++n) {
-        const int error = vox_connection_send_message(connection, message(n, 1000));
-        ASSERT_TRUE(error == 0 || error == ENOBUFS);
-        ++(error == 0 ? accepted : dropped);
-        vox_connection_get_statistics(connection, &counts);
-        ASSERT_LE(counts.queued_bytes, limits.max_queued_bytes);
-        ASSERT_LE(counts.queued_messages, limits.max_queued_messages);
-    }
-    EXPECT_GT(dropped, 0);
-    EXPECT_EQ(counts.messages_dropped, static_cast<std::uint64_t>(dropped));
-
+TEST_F(VoxSlowPeer, LearnsHowManyMessagesWereDroppedWhenThatIsThePolicy) {
+    start(VOX_OVERFLOW_DROP);
+    EXPECT_EQ(fill(), ENOBUFS);
+    for (int more = 0; more < 10; ++more)
+        EXPECT_EQ(pair->end.send(message(1, 1000)), ENOBUFS);
     Inbox refused;
-    plr::test::request(connection, message(1, 1000), dispatch::queue::global(), refused);
-    EXPECT_EQ(vox_error_get_code(refused.waitForError()), VOX_ERROR_MESSAGE_REFUSED);
-    ++dropped;
+    pair->end.request(message(1, 1000), refused);
+    EXPECT_EQ(refused.errorCode(), VOX_ERROR_MESSAGE_REFUSED);
+    EXPECT_EQ(pair->end.counts().messages_dropped, 12u);
 
-    EXPECT_EQ(peer.readFrame().first.type, frame_type::hello);
+    EXPECT_EQ(pair->peer.readFrame().first.type, frame_type::hello);
     std::int64_t received = 0;
     std::int64_t told = 0;
-    std::int64_t last = -1;
-    while (received < accepted || told < dropped) {
-        const auto [header, body] = peer.readFrame();
-        const char* why = nullptr;
-        const Ref value(vox_wire::decode(body, {}, {}, why));
-        if (header.type == frame_type::dropped) {
-            told += vox_int64_get_value(value);
-            continue;
-        }
-        ASSERT_EQ(header.type, frame_type::message);
-        EXPECT_GT(plr::test::numberIn(value), last);
-        last = plr::test::numberIn(value);
-        ++received;
+    while (received < accepted || told < 12) {
+        const auto [header, body] = pair->peer.readFrame();
+        if (header.type == frame_type::dropped)
+            told += vox_int64_get_value(body);
+        else
+            ASSERT_EQ(numberIn(body), received++);
     }
     EXPECT_EQ(received, accepted);
-    EXPECT_EQ(told, dropped);
+    EXPECT_EQ(told, 12);
     // Now that there is room again, messages pass.
-    EXPECT_TRUE(plr::test::eventually([&sender = connection] {
-        return vox_connection_send_message(sender, message(kSent)) == 0;
-    }));
-    while (peer.readFrame().first.type == frame_type::dropped) {
+    EXPECT_TRUE(eventually([&] { return pair->end.send(message(2)) == 0; }));
+    frame_type next{};
+    while ((next = pair->peer.readFrame().first.type) == frame_type::dropped) {
     }
-    vox_connection_cancel(connection);
-    EXPECT_TRUE(inbox.waitForError());
+    EXPECT_EQ(next, frame_type::message);
 }
 
-TEST(VoxSlowPeer, GetsEveryReplyUnlessTwiceTheLimitWaits) {
-    const vox_limits_t limits = smallQueue(VOX_OVERFLOW_DROP);
-    auto [connection, peer] = plr::test::connectionWithRawPeer(&limits);
-    Inbox inbox;
-    std::atomic<std::uint64_t> most{0};
-    const dispatch::block<void(vox_object_t)> answer(
-        [&, own = vox_connection_t(connection)](vox_object_t event) {
-            const Ref reply(vox_dictionary_create_reply(event));
-            if (!vox_object_t(reply))
-                return inbox.add(event);
-            vox_dictionary_set_value(reply, "data",
-                                     Ref(vox_data_create(std::string(1000, 'x').data(), 1000)));
-            static_cast<void>(vox_connection_send_message(own, reply));
-            vox_statistics_t counts;
-            vox_connection_get_statistics(own, &counts);
-            most = std::max(most.load(), counts.queued_bytes);
-            EXPECT_EQ(counts.messages_dropped, 0u);
-        });
-    vox_connection_set_event_handler(connection, &answer);
-    vox_connection_resume(connection);
-    bool open = peer.send(RawPeer::hello());
+TEST_F(VoxSlowPeer, GetsEveryReplyUnlessTwiceTheLimitWaits) {
+    std::atomic<bool> within{true};
+    start(VOX_OVERFLOW_DROP, [&](vox_object_t event) {
+        if (vox_get_type(event) == VOX_TYPE_ERROR)
+            return false;
+        static_cast<void>(pair->end.answer(event, 1000));
+        within = within && isWithin(2) && pair->end.counts().messages_dropped == 0;
+        return true;
+    });
+    bool open = true;
     for (std::uint64_t id = 1; open && id < 100000; ++id)
-        open = peer.send(RawPeer::frame(frame_type::request, id, message(1)));
-    EXPECT_NE(descriptionOf(inbox.waitForError()).find("does not read"), std::string::npos);
-    EXPECT_LE(most.load(), 2 * limits.max_queued_bytes);
+        open = pair->peer.send(frame({.type = frame_type::request, .id = id}, message(1)));
+    expectDisconnected();
+    EXPECT_TRUE(within);
 }
 
-TEST(VoxSlowPeer, CannotMakeAnswersToPingsPileUp) {
-    const vox_limits_t limits = smallQueue(VOX_OVERFLOW_DROP);
-    auto [connection, peer] = plr::test::connectionWithRawPeer(&limits);
-    Inbox inbox;
-    plr::test::resumeWith(connection, inbox);
-    const Bytes ping = RawPeer::frame(frame_type::ping, 1, Ref(vox_null_create()), 0, 1);
+TEST_F(VoxSlowPeer, CannotMakeAnswersToPingsPileUp) {
+    start(VOX_OVERFLOW_DROP);
+    const Bytes ping = frame({.type = frame_type::ping, .flags = 1, .id = 1}, Bytes{0xf6});
     Bytes many;
     for (int i = 0; i < 1000; ++i)
         many.insert(many.end(), ping.begin(), ping.end());
-    bool open = peer.send(RawPeer::hello());
-    vox_statistics_t counts;
-    while (open) {
-        open = peer.send(many);
-        vox_connection_get_statistics(connection, &counts);
-        ASSERT_LE(counts.queued_bytes, 2 * limits.max_queued_bytes);
-    }
-    EXPECT_NE(descriptionOf(inbox.waitForError()).find("does not read"), std::string::npos);
+    while (pair->peer.send(many))
+        ASSERT_LE(pair->end.counts().queued_bytes, 2 * limits.max_queued_bytes);
+    expectDisconnected();
 }
 
-TEST(VoxSlowPeer, ToldCountsAreSeenByTheReceiver) {
-    auto [connection, peer] = plr::test::connectionWithRawPeer();
-    Inbox inbox;
-    plr::test::resumeWith(connection, inbox);
-    peer.send(RawPeer::join({RawPeer::hello(),
-                             RawPeer::frame(frame_type::dropped, 0, Ref(vox_int64_create(5))),
-                             RawPeer::frame(frame_type::dropped, 0, Ref(vox_int64_create(2))),
-                             RawPeer::frame(frame_type::message, 0, message(1))}));
-    ASSERT_TRUE(inbox.wait(1));
-    vox_statistics_t counts;
-    vox_connection_get_statistics(connection, &counts);
-    EXPECT_EQ(counts.peer_dropped, 7u);
-    vox_connection_cancel(connection);
-    EXPECT_TRUE(inbox.waitForError());
+TEST(VoxSlowPeers, CountsOfWhatTheyDroppedAddUp) {
+    RawPair pair;
+    pair.start();
+    for (const std::int64_t count : {5, 2})
+        pair.peer.send(frame({.type = frame_type::dropped}, number(count)));
+    pair.peer.send(plainMessage(1));
+    ASSERT_TRUE(pair.end.inbox.wait(1));
+    EXPECT_EQ(pair.end.counts().peer_dropped, 7u);
 }
 
 }  // namespace

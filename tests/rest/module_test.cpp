@@ -1,22 +1,71 @@
+#include "plr/rest/rest_module.h"
+
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
-#include "rest/module_fixture.h"
+#include "support/raw_rest_client.h"
 
-// What a module sends, and what it does with what it gets.
+// What a module sends, what it does with what it gets, and what happens when its
+// server comes and goes.
 namespace {
 
+using namespace plr::test;
 using plr::RestModule;
 using plr::rest::Operation;
-using plr::test::drain;
-using plr::test::Event;
-using plr::test::Module;
-using plr::test::RawRestClient;
-using plr::test::Texts;
 using Reply = std::shared_ptr<vox::object>;
+
+// A module and, at the other end of its connection, a server played by hand.
+class Module : public testing::Test {
+  protected:
+    ~Module() override {
+        module_.reset();
+        drain(queue_);
+    }
+
+    // Runs on the module's queue, as its owner's calls do.
+    template <class Callable>
+    auto on(Callable&& work) {
+        return queue_.sync(std::forward<Callable>(work));
+    }
+    // A new server at the other end; the connection for the module.
+    vox::connection newServer() {
+        auto [mine, theirs] = vox::connection::create_pair();
+        server_ = std::make_unique<RawRestClient>(theirs, "server");
+        return mine;
+    }
+    void connect() {
+        on([this, mine = newServer()] { module_->connect(mine); });
+    }
+    // What the module has sent since the last call, as "operation me path value".
+    Texts heard() { return server_->takeMessagesBefore(plr::rest::createPingMessage()); }
+    // Sends to the module and waits until that was handled.
+    void tell(const vox::dict& message) {
+        server_->send(message);
+        static_cast<void>(heard());
+    }
+    void notify(const char* path, const vox::object& value) {
+        tell(server_->message(Operation::kNotify, path, value));
+    }
+    // A handler that remembers what it is called with.
+    RestModule::Handler remember(const char* label) {
+        return [this, label](const vox::object& value) {
+            calls_.push_back(label + (" " + oneLine(value)));
+        };
+    }
+    Texts calls() {
+        return on([this] { return std::exchange(calls_, {}); });
+    }
+
+    const dispatch::queue queue_ = dispatch::queue::create("module");
+    std::optional<RestModule> module_{std::in_place, queue_, "me"};
+    std::unique_ptr<RawRestClient> server_;
+    Texts calls_;  // touched on the module's queue only
+};
 
 TEST_F(Module, RestoresRegistrationsInOrder) {
     on([this] {
@@ -26,10 +75,9 @@ TEST_F(Module, RestoresRegistrationsInOrder) {
         module_->registerAsRequestSink("/y", RestModule::RequestHandler([](auto&&...) {}));
         EXPECT_FALSE(module_->isConnected());
     });
-    const Texts all = {"push /connections null", "push /y null", "push /z null", "push /a null",
-                       "push /b null"};
     connect();
-    EXPECT_EQ(heard(), all);
+    EXPECT_EQ(heard(), (Texts{"push me /connections null", "push me /y null", "push me /z null",
+                              "push me /a null", "push me /b null"}));
     on([this] {
         EXPECT_TRUE(module_->isConnected());
         module_->disconnect();
@@ -38,13 +86,14 @@ TEST_F(Module, RestoresRegistrationsInOrder) {
         module_->deregisterAsRequestSink("/y");
     });
     EXPECT_TRUE(server_->waitForEnd());
+    const Texts rest = {"push me /connections null", "push me /z null", "push me /b null"};
     connect();
-    EXPECT_EQ(heard(), (Texts{"push /connections null", "push /z null", "push /b null"}));
+    EXPECT_EQ(heard(), rest);
     // A second connection in place of the first.
     const auto first = std::move(server_);
     connect();
     EXPECT_TRUE(first->waitForEnd());
-    EXPECT_EQ(heard(), (Texts{"push /connections null", "push /z null", "push /b null"}));
+    EXPECT_EQ(heard(), rest);
 }
 
 TEST_F(Module, ObservingAgainKeepsTheFirstHandler) {
@@ -55,21 +104,20 @@ TEST_F(Module, ObservingAgainKeepsTheFirstHandler) {
         module_->observeProperty("/p", remember("second"));
         module_->observeEvent("/p", remember("third"));
     });
-    EXPECT_EQ(heard(), (Texts{"push /p null"}));
+    EXPECT_EQ(heard(), (Texts{"push me /p null"}));
     on([this] { module_->observeProperty("/p", remember("forced"), plr::force_resubscribe); });
-    EXPECT_EQ(heard(), (Texts{"push /p null"}));
+    EXPECT_EQ(heard(), (Texts{"push me /p null"}));
     notify("/p", vox::int64(1));
     EXPECT_EQ(calls(), (Texts{"first 1"}));
     on([this] {
         module_->unobserveProperty("/p");
         module_->unobserveProperty("/p");
         module_->observeProperty("/p", RestModule::Handler());
+        module_->observeProperty("/new", remember("new"), plr::force_resubscribe);
     });
-    EXPECT_EQ(heard(), (Texts{"pop /p null"}));
+    EXPECT_EQ(heard(), (Texts{"pop me /p null", "push me /new null"}));
     notify("/p", vox::int64(2));
     EXPECT_EQ(calls(), Texts());
-    on([this] { module_->observeProperty("/new", remember("new"), plr::force_resubscribe); });
-    EXPECT_EQ(heard(), (Texts{"push /new null"}));
 }
 
 TEST_F(Module, RegisteringASinkAgainReplacesItsHandler) {
@@ -84,16 +132,16 @@ TEST_F(Module, RegisteringASinkAgainReplacesItsHandler) {
         module_->registerAsRequestSink("/r", answering("first"));
         module_->registerAsRequestSink("/r", answering("second"));
     });
-    EXPECT_EQ(heard(), (Texts{"push /r null"}));
+    EXPECT_EQ(heard(), (Texts{"push me /r null"}));
     EXPECT_EQ(server_->get("/r"), vox::string("second"));
     on([&] {
         module_->deregisterAsRequestSink("/r");
         module_->registerAsRequestSink("/r", RestModule::RequestHandler());
     });
-    EXPECT_EQ(heard(), (Texts{"pop /r null"}));
+    EXPECT_EQ(heard(), (Texts{"pop me /r null"}));
 }
 
-TEST_F(Module, AnswersARequestWhenItsHolderLetsGo) {
+TEST_F(Module, AnswersARequestWhenItsHolderLetsGoAndAPingAtOnce) {
     Reply kept;  // touched on the queue only
     connect();
     on([&] {
@@ -102,20 +150,16 @@ TEST_F(Module, AnswersARequestWhenItsHolderLetsGo) {
             kept = reply;
         });
     });
-    auto answered = std::make_shared<Event>();
-    server_->connection().send_message_with_reply(
-        server_->message(Operation::kGet, "/r", vox::int64(1)), server_->queue(),
-        dispatch::block<void(vox::object)>([answered](const vox::object& reply) {
-            EXPECT_EQ(RawRestClient::oneLine(reply), R"({"o": "get","r": "/r","v": 2})");
-            answered->signal();
-        }));
-    heard();
+    server_->ask(server_->message(Operation::kGet, "/r", vox::int64(1)));
+    EXPECT_EQ(oneLine(server_->exchange(plr::rest::createPingMessage())), R"({"o": "ping"})");
+    tell(plr::rest::createPingMessage());  // one that wants no answer
     on([&] {
         ASSERT_TRUE(kept);
         *kept = vox::int64(2);
         kept.reset();
     });
-    EXPECT_TRUE(answered->wait());
+    EXPECT_TRUE(server_->replied.wait());
+    EXPECT_EQ(oneLine(server_->replies()[0]), R"({"o": "get","r": "/r","v": 2})");
 }
 
 TEST_F(Module, DropsWhatItDoesNotKnow) {
@@ -126,7 +170,6 @@ TEST_F(Module, DropsWhatItDoesNotKnow) {
             calls_.push_back(reply ? "request" : "request without reply");
         });
     });
-    heard();
     const auto odd = [this](const char* key, const vox::object& value) {
         const vox::dict message = server_->message(Operation::kNotify, "/p");
         message[key] = value;
@@ -137,7 +180,6 @@ TEST_F(Module, DropsWhatItDoesNotKnow) {
         server_->message(Operation::kNotify, "/p/"),
         server_->message(Operation::kNotify, ""),
         server_->message(Operation::kGet, "/p"),
-        server_->message(Operation::kGet, ""),
         server_->message(Operation::kSet, "/p"),
         server_->message(Operation::kPush, "/r"),
         odd("o", vox::int64(5)),
@@ -157,13 +199,6 @@ TEST_F(Module, DropsWhatItDoesNotKnow) {
     EXPECT_EQ(calls(), (Texts{"request without reply", "p null"}));
 }
 
-TEST_F(Module, AnswersAPingWithItsOperation) {
-    connect();
-    EXPECT_EQ(RawRestClient::oneLine(server_->exchange(plr::rest::createPingMessage())),
-              R"({"o": "ping"})");
-    tell(plr::rest::createPingMessage());  // one that wants no answer
-}
-
 TEST_F(Module, SendsWhatItIsTold) {
     on([this] { module_->setProperty("/lost", vox::int64(0)); });
     connect();
@@ -176,8 +211,171 @@ TEST_F(Module, SendsWhatItIsTold) {
         module_->sendRawPop("/o", vox::int64(4));
         module_->sendRawNotify("/n", vox::int64(5));
     });
-    EXPECT_EQ(heard(), (Texts{"set /p 1", "set /e 2", "set /s null", "push /u 3", "pop /o 4",
-                              "notify /n 5"}));
+    EXPECT_EQ(heard(), (Texts{"set me /p 1", "set me /e 2", "set me /s null", "push me /u 3",
+                              "pop me /o 4", "notify me /n 5"}));
 }
+
+TEST_F(Module, TakesBlocksToo) {
+    using Block = dispatch::block<void(vox::object)>;
+    connect();
+    on([this] {
+        module_->observeProperty("/p", Block(remember("p")));
+        module_->observeProperty("/p", Block(remember("q")), plr::force_resubscribe);
+        module_->observeEvent("/e", Block(remember("e")));
+        module_->observeEvent("/e", Block());
+        module_->registerAsRequestSink(
+            "/r", RestModule::RequestHandlerBlock(
+                      [](const vox::object& value, const Reply& reply) { *reply = value; }));
+    });
+    notify("/p", vox::int64(1));
+    notify("/e", vox::int64(2));
+    EXPECT_EQ(calls(), (Texts{"p 1"}));
+    EXPECT_EQ(server_->get("/r", vox::int64(3)), vox::int64(3));
+}
+
+TEST_F(Module, AHandlerMayChangeTheRegistrations) {
+    connect();
+    on([this] {
+        module_->observeProperty("/p", [this](const vox::object& value) {
+            module_->unobserveProperty("/p");
+            for (const char* path : {"/1", "/2", "/3", "/4", "/5", "/6", "/7", "/8"})
+                module_->observeProperty(path, remember(path));
+            calls_.push_back("once " + oneLine(value));
+        });
+    });
+    notify("/p", vox::int64(1));
+    notify("/p", vox::int64(2));
+    notify("/8", vox::int64(3));
+    EXPECT_EQ(calls(), (Texts{"once 1", "/8 3"}));
+}
+
+// ---- Requests, and a server that comes and goes ---------------------------------------
+
+TEST_F(Module, AnswersAtOnceWhileDisconnected) {
+    on([this] {
+        module_->sendRequest("/r", vox::int64(1), remember("request"));
+        module_->getPropertyOnce("/p", remember("once"));
+        module_->sendRawGet("/g", dispatch::block<void(vox::object)>(remember("raw")));
+        EXPECT_EQ(calls_, (Texts{"request null", "once null", "raw null"}));
+        module_->sendRequest("/r", vox::int64(1), RestModule::Handler());
+        module_->flush(dispatch::group());
+    });
+    module_->flush();  // returns at once
+}
+
+// Answers without a value.
+struct ValuelessResource : plr::rest::RestResource {
+    bool handleRestMessage_GET(plr::rest::RestResourceContext& context,
+                               const plr::rest::PathView&) override {
+        context.takeAutoReplyValue().reset();
+        return true;
+    }
+};
+
+TEST_F(Module, HandsTheValueOfAReplyOn) {
+    RestServerRig rig;
+    rig.add("/leaf", std::make_shared<FakeRestResource>());
+    rig.add("/none", std::make_shared<ValuelessResource>());
+    rig.start();
+    Event answered;
+    on([&] {
+        module_->connect(rig.connect());
+        for (const char* path : {"/leaf", "/none"})
+            module_->sendRequest(path, vox::int64(1), [&](const vox::object& value) {
+                EXPECT_TRUE(queue_.is_current());
+                remember("reply")(value);
+                answered.signal();
+            });
+    });
+    EXPECT_TRUE(answered.wait());
+    EXPECT_TRUE(answered.wait());
+    EXPECT_EQ(calls(), (Texts{"reply \"value\"", "reply null"}));
+    on([&] { module_->disconnect(); });
+}
+
+TEST_F(Module, LearnsOfTheServersEndAndMayConnectAgain) {
+    connect();
+    on([this] {
+        module_->observeProperty("/p", remember("p"));
+        module_->getPropertyOnce("/p", remember("unanswered"));
+    });
+    heard();
+    Event reconnected;
+    const auto first = std::move(server_);
+    on([&] {
+        module_->setServerErrorHandler([&](const vox::object& error) {
+            EXPECT_EQ(error.type(), VOX_TYPE_ERROR);
+            EXPECT_FALSE(module_->isConnected());
+            EXPECT_EQ(calls_, (Texts{"unanswered null"}));
+            module_->connect(newServer());
+            reconnected.signal();
+        });
+    });
+    first->connection().cancel();
+    ASSERT_TRUE(reconnected.wait());
+    EXPECT_EQ(heard(), (Texts{"push me /connections null", "push me /p null"}));
+    on([&] { module_->setServerErrorHandler(RestModule::Handler()); });
+}
+
+TEST_F(Module, RefusesToConnectToNothing) {
+    connect();
+    on([this] {
+        try {
+            module_->connect(vox::connection());
+            ADD_FAILURE();
+        } catch (const std::invalid_argument& error) {
+            EXPECT_STREQ(error.what(),
+                         "RestModule::connect cannot be called with a null connection");
+        }
+        EXPECT_TRUE(module_->isConnected());
+    });
+}
+
+TEST_F(Module, DropsCallbacksWhenItGoes) {
+    connect();
+    heard();
+    Event released;
+    std::shared_ptr<void> held(nullptr, [&released](void*) { released.signal(); });
+    on([&] {
+        module_->getPropertyOnce("/p", [held](const vox::object&) { FAIL(); });
+        module_->observeProperty("/p", [held](const vox::object&) { FAIL(); });
+        held.reset();
+        EXPECT_TRUE(module_->getWeakHandle().lock());
+        module_.reset();
+    });
+    EXPECT_TRUE(server_->waitForEnd());
+    EXPECT_TRUE(released.wait());
+    module_.emplace();
+    EXPECT_FALSE(module_->isConnected());
+    EXPECT_FALSE(module_->getWeakHandle().lock());
+}
+
+TEST_F(Module, FlushWaitsUntilAllIsHandedOver) {
+    const vox::connection mine = newServer();
+    const dispatch::group group;
+    on([&] {
+        module_->connect(mine);
+        for (int i = 0; i < 1000; ++i)
+            module_->setProperty("/p", vox::int64(i));
+        module_->flush(group);
+    });
+    module_->flush();
+    EXPECT_EQ(group.wait(), 0);
+    EXPECT_EQ(mine.statistics().queued_messages, 0U);
+    EXPECT_GE(mine.statistics().messages_sent, 1001U);
+    EXPECT_EQ(heard().size(), 1001U);
+}
+
+#ifdef PLR_DEBUG
+TEST(ModuleDeathTest, RefusesCallsOffItsQueueInDebugBuilds) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_DEATH(
+        {
+            const RestModule module(dispatch::queue::create("module.queue"), "me");
+            static_cast<void>(module.isConnected());
+        },
+        "module.queue");
+}
+#endif
 
 }  // namespace

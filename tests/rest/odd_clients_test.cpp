@@ -9,27 +9,16 @@
 #include <vector>
 
 #include "support/raw_rest_client.h"
-#include "support/vox_test.h"
+#include "support/vox_values.h"
 
 // What no client can do to a service: end it, stop it answering others, or
 // leave something behind in it.
 namespace {
 
+using namespace plr::test;
 using plr::rest::Operation;
-using plr::test::RawRestClient;
-using plr::test::RestServerRig;
 
 constexpr std::size_t kMebibyte = 1U << 20;
-
-vox::object deepArray(int depth) {
-    vox::object value = vox::array::create();
-    for (int i = 1; i < depth; ++i) {
-        const vox::array outer = vox::array::create();
-        outer.append(value);
-        value = outer;
-    }
-    return value;
-}
 
 std::string repeated(std::string_view part, std::size_t bytes) {
     std::string text;
@@ -38,13 +27,8 @@ std::string repeated(std::string_view part, std::size_t bytes) {
     return text;
 }
 
-struct Odd {
-    std::string name;
-    vox::object value;
-};
-
 // Values of every type, and of extreme size.
-std::vector<Odd> oddValues() {
+std::vector<std::pair<std::string, vox::object>> oddValues() {
     const std::uint8_t uuid[16] = {};
     const vox::dict wide = vox::dict::create();
     for (int i = 0; i < 1000; ++i)
@@ -53,7 +37,6 @@ std::vector<Odd> oddValues() {
         {"null", nullptr},
         {"true", vox::boolean(true)},
         {"int64 minimum", vox::int64(std::numeric_limits<std::int64_t>::min())},
-        {"int64 -1", vox::int64(-1)},
         {"uint64 maximum", vox::uint64(std::numeric_limits<std::uint64_t>::max())},
         {"NaN", vox::real(std::numeric_limits<double>::quiet_NaN())},
         {"date", vox::date(std::chrono::nanoseconds::min())},
@@ -61,7 +44,6 @@ std::vector<Odd> oddValues() {
         {"empty string", vox::string(std::string_view())},
         {"set", vox::string("set")},
         {"string with a NUL", vox::string(std::string_view("get\0x", 5))},
-        {"1 MiB string", vox::string(repeated("x", kMebibyte))},
         {"1 MiB path", vox::string(repeated("/a", kMebibyte))},
         {"1 MiB of slashes", vox::string(repeated("/", kMebibyte))},
         {"1 MiB property name", vox::string("/kept/" + repeated("n", kMebibyte))},
@@ -73,8 +55,7 @@ std::vector<Odd> oddValues() {
         {"the dump below itself", vox::string(repeated("/*", 1000))},
         {"meta of meta", vox::string("/kept" + repeated("/_", 1000))},
         {"uuid", vox::uuid(uuid)},
-        {"empty array", vox::array::create()},
-        {"deep array", deepArray(60)},
+        {"deep array", vox::object::adopt(vox_retain(nested(60)))},
         {"wide dictionary", wide},
         {"error", vox::error(-1, nullptr)},
         {"descriptor", vox::object::adopt(vox_fd_create(0))},
@@ -88,17 +69,14 @@ class OddClients : public testing::Test {
         rig_.add("/events", std::make_shared<plr::rest::PropertyRestResource>(false));
         rig_.start();
         good_ = rig_.registeredClient("good");
-        const vox::array list = vox::array_creator()("x");
-        good_->send(Operation::kSet, "/kept/x", list);
+        good_->send(Operation::kSet, "/kept/x", vox::array_creator()("x"));
         EXPECT_EQ(good_->get("/kept/x@0"), vox::string("x"));
     }
-
     // Sends a message both ways and sees that the service still answers: this
     // client, unless it is the one to blame, and the others.
     void send(const vox::dict& message) {
         odd_->send(message);
-        odd_->connection().send_message_with_reply(
-            message, odd_->queue(), dispatch::block<void(vox::object)>([](const vox::object&) {}));
+        odd_->ask(message);
         EXPECT_TRUE(vox::array(odd_->get("")));
         EXPECT_TRUE(vox::array(good_->get("/kept")));
     }
@@ -108,66 +86,53 @@ class OddClients : public testing::Test {
     std::unique_ptr<RawRestClient> odd_ = rig_.registeredClient("odd");
 };
 
-TEST_F(OddClients, EveryKeyMayHoldAnything) {
-    for (const char* key : {"o", "a", "r", "v", "e", "x"}) {
-        for (const Odd& odd : oddValues()) {
-            SCOPED_TRACE(key + (": " + odd.name));
+TEST_F(OddClients, EveryKeyMayHoldAnythingAndNoneNeedBeThere) {
+    for (const char* key : {"o", "a", "r", "v", "e"}) {
+        for (const auto& [name, value] : oddValues()) {
+            SCOPED_TRACE(key + (": " + name));
             for (const Operation operation : {Operation::kSet, Operation::kGet, Operation::kPush,
                                               Operation::kPop, Operation::kNotify}) {
                 const vox::dict message = odd_->message(operation, "/kept/x");
-                message[key] = odd.value;
+                message[key] = value;
                 send(message);
             }
             if (HasFailure())
                 return;
         }
     }
-}
-
-TEST_F(OddClients, NoKeyNeedBeThere) {
     for (int present = 0; present < 16; ++present) {
-        const vox::dict whole = odd_->message(Operation::kGet, "/kept/x");
-        const vox::dict message = vox::dict::create();
+        const vox::dict message = odd_->message(Operation::kGet, "/kept/x");
         const char* const keys[] = {"o", "a", "r", "v"};
         for (int i = 0; i < 4; ++i)
             if (present >> i & 1)
-                message[keys[i]] = whole[keys[i]];
+                vox_dictionary_set_value(message.get(), keys[i], nullptr);
         send(message);
     }
 }
 
-TEST_F(OddClients, ClientsThatComeAndGoLeaveNoDescriptorBehind) {
-    EXPECT_TRUE(vox::array(odd_->get("")));  // it is known, so that its end will be told
-    odd_.reset();
-    EXPECT_TRUE(rig_.waitForDrop());
+TEST_F(OddClients, ThatComeAndGoLeaveNoDescriptorBehind) {
     const auto visit = [this](int round) {
         auto client = rig_.registeredClient("visitor" + std::to_string(round));
-        const vox::dict message = client->message(Operation::kSet, "/kept/fd");
-        message["v"] = vox::object::adopt(vox_fd_create(0));
         client->send(Operation::kPush, "/kept/fd");
-        client->send(message);
+        client->send(Operation::kSet, "/kept/fd", vox::object::adopt(vox_fd_create(0)));
         if (round % 2 == 0) {
             EXPECT_TRUE(vox::array(client->get("")));
         }
-        // Some leave with requests under way.
-        client->connection().send_message_with_reply(
-            client->message(Operation::kGet, "*"), client->queue(),
-            dispatch::block<void(vox::object)>([](const vox::object&) {}));
-        client.reset();
+        client->ask(client->message(Operation::kGet, "*"));  // under way when it leaves
     };
-    for (int round = 0; round < 10; ++round)
-        visit(round);
     const auto settled = [this] {
         static_cast<void>(good_->get("/connections"));
         good_->send(Operation::kSet, "/kept/fd", nullptr);
         static_cast<void>(good_->get(""));
-        return plr::test::openDescriptors();
+        return openDescriptors();
     };
+    for (int round = 0; round < 10; ++round)
+        visit(round);
     const std::size_t before = settled();
     for (int round = 10; round < 110; ++round)
         visit(round);
     // The server learns of the last ends when it gets to them.
-    EXPECT_TRUE(plr::test::eventually([&] { return settled() <= before + 2; })) << before;
+    EXPECT_TRUE(eventually([&] { return settled() <= before + 2; })) << before;
 }
 
 }  // namespace

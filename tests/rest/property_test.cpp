@@ -4,17 +4,14 @@
 
 #include <memory>
 #include <string>
-#include <vector>
 
 #include "support/raw_rest_client.h"
 
 namespace {
 
+using namespace plr::test;
 using plr::rest::Operation;
 using plr::rest::PropertyRestResource;
-using plr::test::RawRestClient;
-using plr::test::RestServerRig;
-using Texts = std::vector<std::string>;
 
 // A property resource that remembers whether it handled the last message.
 class RecordingProperties : public PropertyRestResource {
@@ -43,121 +40,100 @@ class Property : public testing::Test {
   protected:
     Property() {
         rig_.add("/kept", kept_);
-        rig_.add("/events", events_);
+        rig_.add("/events", std::make_shared<PropertyRestResource>(false));
         rig_.start();
         client_ = rig_.registeredClient("me");
-        client_->send(Operation::kSet, "/kept/x", valueOfX());
-        client_->send(Operation::kSet, "/events/x", valueOfX());
-        EXPECT_EQ(client_->takeNotifications(), Texts());
+        set("/kept/x", valueOfX());
+        set("/events/x", valueOfX());
     }
 
-    // Whether the resource handled the last message of `client_`.
-    bool lastHandled(const RecordingProperties& resource) {
-        return rig_.queue().sync([&] { return resource.handled; });
-    }
-    std::string get(const std::string& path) { return RawRestClient::oneLine(client_->get(path)); }
+    std::string get(const std::string& path) { return client_->textAt(path); }
     void set(const std::string& path, const vox::object& value) {
         client_->send(Operation::kSet, path, value);
     }
     void push(const std::string& path) { client_->send(Operation::kPush, path); }
     void pop(const std::string& path) { client_->send(Operation::kPop, path); }
-    Texts news() { return client_->takeNotifications(); }
+    Texts news() { return client_->takeMessages(); }
+    // What `client_` hears of what another one does.
+    Texts newsOf(const std::unique_ptr<RawRestClient>& other, Operation operation,
+                 const char* path) {
+        other->send(operation, path, vox::int64(1));
+        static_cast<void>(other->takeMessages());
+        return news();
+    }
 
-    RestServerRig rig_;
     const std::shared_ptr<RecordingProperties> kept_ = std::make_shared<RecordingProperties>(true);
-    const std::shared_ptr<RecordingProperties> events_ =
-        std::make_shared<RecordingProperties>(false);
+    RestServerRig rig_;
     std::unique_ptr<RawRestClient> client_;
 };
 
+// One kind of path: what it answers, which operations are handled there, and what
+// a PUSH sends to its author at once.
 struct Cell {
     const char* kind;
     const char* path;  // below the resource
-    const char* got;   // of the resource that keeps values
-    bool handlesSet;
-    bool handlesPush;
-    bool handlesPop;
-    Texts pushNews;  // what a PUSH sends to its author at once
+    const char* got;
+    const char* handled;  // of GET, SET, PUSH and POP, never NOTIFY
+    Texts pushNews;
 };
 
-const std::vector<Cell>& cells() {
-    static const auto& rows = *new std::vector<Cell>{
-        {"Root", "", R"([0: "x"])", true, true, true, {"me /kept [0: \"x\"]"}},
-        {"Meta", "/_", R"([0: "watchers",1: "watched"])", true, true, true, {}},
-        {"MetaWatchers", "/_/watchers", "[]", true, true, true, {}},
-        {"MetaWatched", "/_/watched", "[]", true, true, true, {"me /kept/_/watched []"}},
-        {"MetaWatchedMetaWatchers", "/_/watched/_/watchers", "[]", true, true, true, {}},
-        {"DumpState", "/*", R"({"x": {"k": [0: 5]}})", false, false, false, {}},
-        {"Resource", "/x", kValueOfX, true, true, true, {"me /kept/x {\"k\": [0: 5]}"}},
-        {"Resource below", "/x/other", kValueOfX, true, true, true, {"me /kept/x {\"k\": [0: 5]}"}},
-        {"Resource below _",
-         "/x/_/other",
-         kValueOfX,
-         true,
-         true,
-         true,
-         {"me /kept/x {\"k\": [0: 5]}"}},
-        {"Resource below watchers",
-         "/x/_/watchers/y",
-         kValueOfX,
-         true,
-         true,
-         true,
-         {"me /kept/x {\"k\": [0: 5]}"}},
-        {"part", "/x@k.0", "5", false, true, true, {"me /kept/x {\"k\": [0: 5]}"}},
-        {"no part", "/x@", kValueOfX, true, true, true, {"me /kept/x {\"k\": [0: 5]}"}},
-        {"ResourceMeta", "/x/_", R"([0: "watchers"])", true, true, true, {}},
-        {"ResourceWatchers", "/x/_/watchers", "[]", true, true, true, {}},
-        {"ResourceWatchers of a new name", "/y/_/watchers", "[]", true, true, true, {}},
-        {"Unknown word", "/_/other", "null", true, false, false, {}},
-        {"Unknown below watchers", "/_/watchers/x", "null", true, false, false, {}},
-        {"Unknown below watched", "/_/watched/x", "null", true, false, false, {}},
-        {"Unknown watched meta", "/_/watched/_", "null", true, false, false, {}},
-        {"Unknown deep", "/_/watched/_/watchers/x", "null", true, false, false, {}},
-        {"Unknown below the dump", "/*/x", "null", true, false, false, {}},
+std::vector<Cell> cells() {
+    const Texts x = {std::string("notify me /kept/x ") + kValueOfX};
+    const char* const all = "get set push pop ";
+    const char* const some = "get set ";
+    return {
+        {"Root", "", R"([0: "x"])", all, {R"(notify me /kept [0: "x"])"}},
+        {"Meta", "/_", R"([0: "watchers",1: "watched"])", all, {}},
+        {"MetaWatchers", "/_/watchers", "[]", all, {}},
+        {"MetaWatched", "/_/watched", "[]", all, {"notify me /kept/_/watched []"}},
+        {"MetaWatchedMetaWatchers", "/_/watched/_/watchers", "[]", all, {}},
+        {"DumpState", "/*", R"({"x": {"k": [0: 5]}})", "get ", {}},
+        {"Resource", "/x", kValueOfX, all, x},
+        {"Resource below", "/x/other", kValueOfX, all, x},
+        {"Resource below _", "/x/_/other", kValueOfX, all, x},
+        {"Resource below watchers", "/x/_/watchers/y", kValueOfX, all, x},
+        {"part", "/x@k.0", "5", "get push pop ", x},
+        {"no part", "/x@", kValueOfX, all, x},
+        {"ResourceMeta", "/x/_", R"([0: "watchers"])", all, {}},
+        {"ResourceWatchers", "/x/_/watchers", "[]", all, {}},
+        {"ResourceWatchers of a new name", "/y/_/watchers", "[]", all, {}},
+        {"Unknown word", "/_/other", "null", some, {}},
+        {"Unknown below watchers", "/_/watchers/x", "null", some, {}},
+        {"Unknown below watched", "/_/watched/x", "null", some, {}},
+        {"Unknown watched meta", "/_/watched/_", "null", some, {}},
+        {"Unknown deep", "/_/watched/_/watchers/x", "null", some, {}},
+        {"Unknown below the dump", "/*/x", "null", some, {}},
     };
-    return rows;
-}
-
-TEST_F(Property, AnswersEveryKindOfPath) {
-    for (const Cell& cell : cells()) {
-        EXPECT_EQ(get("/kept" + std::string(cell.path)), cell.got) << cell.kind;
-        EXPECT_TRUE(lastHandled(*kept_)) << cell.kind;
-    }
-    EXPECT_EQ(get("/kept"), R"([0: "x"])") << "a GET makes no property";
-    EXPECT_EQ(news(), Texts());
 }
 
 TEST_F(Property, HandlesEveryOperationOnEveryKindOfPath) {
     for (const Cell& cell : cells()) {
         SCOPED_TRACE(cell.kind);
-        const std::string path = "/kept" + std::string(cell.path);
-        pop(path);
+        const std::string path = std::string("/kept") + cell.path;
+        std::string handled;
+        const auto note = [&](const char* operation) {
+            handled += rig_.queue().sync([&] { return kept_->handled; }) ? operation : "";
+        };
+        EXPECT_EQ(get(path), cell.got);
+        note("get ");
+        set(path, vox::string("new"));
         EXPECT_EQ(news(), Texts());
-        EXPECT_EQ(lastHandled(*kept_), cell.handlesPop);
+        note("set ");
+        const bool setsX = cell.got == std::string(kValueOfX);
+        EXPECT_EQ(get("/kept/x"), setsX ? R"("new")" : kValueOfX) << "only properties are set";
+        set("/kept/x", valueOfX());
         push(path);
         EXPECT_EQ(news(), cell.pushNews);
-        EXPECT_EQ(lastHandled(*kept_), cell.handlesPush);
+        note("push ");
         pop(path);
         EXPECT_EQ(news(), Texts());
+        note("pop ");
         client_->send(Operation::kNotify, path, vox::int64(1));
         EXPECT_EQ(news(), Texts());
-        EXPECT_FALSE(lastHandled(*kept_));
+        note("notify ");
+        EXPECT_EQ(handled, cell.handled);
     }
-    EXPECT_EQ(get("/kept"), R"([0: "x"])");
-}
-
-TEST_F(Property, SetsNothingButProperties) {
-    for (const Cell& cell : cells()) {
-        SCOPED_TRACE(cell.kind);
-        set("/kept" + std::string(cell.path), vox::string("new"));
-        EXPECT_EQ(news(), Texts());
-        EXPECT_EQ(lastHandled(*kept_), cell.handlesSet);
-        const bool setsX = cell.handlesSet && cell.got == std::string(kValueOfX);
-        EXPECT_EQ(get("/kept/x"), setsX ? R"("new")" : kValueOfX);
-        set("/kept/x", valueOfX());
-    }
-    EXPECT_EQ(get("/kept"), R"([0: "x"])");
+    EXPECT_EQ(get("/kept"), R"([0: "x"])") << "none of these makes a property";
 }
 
 TEST_F(Property, GivesPartsOfItsValue) {
@@ -165,50 +141,50 @@ TEST_F(Property, GivesPartsOfItsValue) {
         const char* path;
         const char* expected;
     } rows[] = {
-        {"/kept/x@k", "[0: 5]"},  {"/kept/x@k.0", "5"},
-        {"/kept/x@k.1", "null"},  {"/kept/x@k.word", "null"},  // the conversion throws
-        {"/kept/x@k.", "null"},   {"/kept/x@k.99999999999999999999999", "null"},
-        {"/kept/x@k.-1", "null"}, {"/kept/x@z", "null"},
-        {"/kept/x@k@0", "null"},  {"/kept/new@k", "null"},
-        {"/kept/@k", "null"},     {"/events/x@k", "null"},
-        {"/events/x", "null"},    {"/kept/new", "null"},
+        {"/kept/x@k", "[0: 5]"},
+        {"/kept/x@k.1", "null"},
+        {"/kept/x@k.word", "null"},  // the conversion throws
+        {"/kept/x@k.", "null"},
+        {"/kept/x@k.99999999999999999999999", "null"},
+        {"/kept/x@z", "null"},
+        {"/kept/x@k@0", "null"},
+        {"/kept/new@k", "null"},
+        {"/kept/@k", "null"},
+        {"/events/x@k", "null"},
+        {"/events/x", "null"},
+        {"/events/*", R"({"x": null})"},
+        {"/events", R"([0: "x"])"},
+        {"*", R"({"connections": [0: "me"],"events": {"x": null},"kept": {"x": {"k": [0: 5]}}})"},
     };
     for (const auto& row : rows)
         EXPECT_EQ(get(row.path), row.expected) << row.path;
 }
 
-TEST_F(Property, EverySetNotifiesChangedOrNot) {
-    push("/kept/x");
-    news();
+TEST_F(Property, EverySetNotifiesChangedOrNotUnderItsPathWithTheWatchersName) {
+    push("kept/x");
+    EXPECT_EQ(news(), (Texts{R"(notify me kept/x {"k": [0: 5]})"}));
     set("/kept/x", vox::int64(1));
     set("/kept/x", vox::int64(1));
     set("/kept/x@part", vox::int64(2));
-    EXPECT_EQ(news(), (Texts{"me /kept/x 1", "me /kept/x 1"}));
-    EXPECT_EQ(get("/kept/x"), "1");
-    pop("/kept/x");
-    set("/kept/x", vox::int64(3));
-    EXPECT_EQ(news(), Texts());
-    EXPECT_EQ(get("/kept/x"), "3");
-}
-
-TEST_F(Property, NotifiesUnderThePathOfTheSetWithTheWatchersName) {
+    EXPECT_EQ(news(), (Texts{"notify me /kept/x 1", "notify me /kept/x 1"}));
     const auto setter = rig_.registeredClient("setter");
-    push("kept/x");
-    EXPECT_EQ(news(), (Texts{"me kept/x {\"k\": [0: 5]}"}));
-    setter->send(Operation::kSet, "/kept/x/below", vox::int64(1));
-    EXPECT_EQ(setter->takeNotifications(), Texts());
-    EXPECT_EQ(news(), (Texts{"me /kept/x 1"}));
+    EXPECT_EQ(newsOf(setter, Operation::kSet, "/kept/x/below"), (Texts{"notify me /kept/x 1"}));
+    pop("/kept/x");
+    EXPECT_EQ(newsOf(setter, Operation::kSet, "/kept/x"), Texts());
+    // Where values are not kept, only sets are told.
+    push("/events/x");
+    set("/events/x", vox::int64(2));
+    EXPECT_EQ(news(), (Texts{"notify me /events/x 2"}));
 }
 
 TEST_F(Property, ANewNameIsAnnouncedToWhoWatchesTheNames) {
     push("/kept");
-    EXPECT_EQ(news(), (Texts{"me /kept [0: \"x\"]"}));
     push("/kept/new");
-    EXPECT_EQ(news(), (Texts{"me /kept [0: \"new\",1: \"x\"]", "me /kept/new null"}));
+    EXPECT_EQ(news(), (Texts{R"(notify me /kept [0: "x"])", R"(notify me /kept [0: "new",1: "x"])",
+                             "notify me /kept/new null"}));
     set("/kept/a", vox::int64(1));
-    EXPECT_EQ(news(), (Texts{"me /kept [0: \"a\",1: \"new\",2: \"x\"]"}));
     set("/kept/a", vox::int64(1));
-    EXPECT_EQ(news(), Texts());
+    EXPECT_EQ(news(), (Texts{R"(notify me /kept [0: "a",1: "new",2: "x"])"}));
     EXPECT_EQ(get("/kept/_/watchers"), R"([0: "me"])");
     pop("/kept");
     set("/kept/b", vox::int64(1));
@@ -219,36 +195,27 @@ TEST_F(Property, ANewNameIsAnnouncedToWhoWatchesTheNames) {
 TEST_F(Property, WhatIsWatchedIsAnnouncedToWhoWatchesThat) {
     const auto other = rig_.registeredClient("other");
     push("/kept/_/watched");
-    EXPECT_EQ(news(), (Texts{"me /kept/_/watched []"}));
+    EXPECT_EQ(news(), (Texts{"notify me /kept/_/watched []"}));
     EXPECT_EQ(get("/kept/_/watched/_/watchers"), R"([0: "me"])");
-    const auto tell = [&](Operation operation, const char* path) {
-        other->send(operation, path);
-        static_cast<void>(other->takeMessages());
-        return news();
+    const struct {
+        Operation operation;
+        const char* path;
+        Texts news;
+    } rows[] = {
+        {Operation::kPush, "/kept/x", {R"(notify me /kept/_/watched [0: "x"])"}},
+        {Operation::kPush, "/kept/x", {}},
+        {Operation::kPush, "/kept/y", {R"(notify me /kept/_/watched [0: "x",1: "y"])"}},
+        {Operation::kPop, "/kept/z", {}},
+        {Operation::kPop, "/kept/x", {R"(notify me /kept/_/watched [0: "y"])"}},
+        {Operation::kPop, "/kept/x", {}},
     };
-    EXPECT_EQ(tell(Operation::kPush, "/kept/x"), (Texts{"me /kept/_/watched [0: \"x\"]"}));
-    EXPECT_EQ(tell(Operation::kPush, "/kept/x"), Texts());
-    EXPECT_EQ(tell(Operation::kPush, "/kept/y"), (Texts{"me /kept/_/watched [0: \"x\",1: \"y\"]"}));
-    EXPECT_EQ(get("/kept/_/watched"), R"([0: "x",1: "y"])");
-    EXPECT_EQ(get("/kept/x/_/watchers"), R"([0: "other"])");
-    EXPECT_EQ(tell(Operation::kPop, "/kept/z"), Texts());
-    EXPECT_EQ(tell(Operation::kPop, "/kept/x"), (Texts{"me /kept/_/watched [0: \"y\"]"}));
-    EXPECT_EQ(tell(Operation::kPop, "/kept/x"), Texts());
+    for (const auto& row : rows)
+        EXPECT_EQ(newsOf(other, row.operation, row.path), row.news) << row.path;
+    EXPECT_EQ(get("/kept/_/watched"), R"([0: "y"])");
+    EXPECT_EQ(get("/kept/y/_/watchers"), R"([0: "other"])");
     EXPECT_EQ(get("/kept"), R"([0: "x",1: "y"])") << "properties stay";
     pop("/kept/_/watched");
-    EXPECT_EQ(tell(Operation::kPop, "/kept/y"), Texts());
-}
-
-TEST_F(Property, WithoutKeptValuesOnlySetsAreTold) {
-    push("/events/x");
-    EXPECT_EQ(news(), Texts());
-    set("/events/x", vox::int64(1));
-    EXPECT_EQ(news(), (Texts{"me /events/x 1"}));
-    EXPECT_EQ(get("/events/x"), "null");
-    EXPECT_EQ(get("/events/*"), R"({"x": null})");
-    EXPECT_EQ(get("/events"), R"([0: "x"])");
-    push("/events");
-    EXPECT_EQ(news(), (Texts{"me /events [0: \"x\"]"}));
+    EXPECT_EQ(newsOf(other, Operation::kPop, "/kept/y"), Texts());
 }
 
 TEST_F(Property, AnUnknownClientWatchesNothingButMakesProperties) {
@@ -258,17 +225,15 @@ TEST_F(Property, AnUnknownClientWatchesNothingButMakesProperties) {
     for (const char* path : {"/kept/new", "/kept", "/kept/_/watched"})
         for (const Operation operation : {Operation::kPush, Operation::kPop})
             stranger->send(operation, path);
-    EXPECT_EQ(stranger->takeNotifications(), Texts());
-    EXPECT_EQ(news(), (Texts{"me /kept [0: \"new\",1: \"x\"]"}));
+    EXPECT_EQ(stranger->takeMessages(), Texts());
+    EXPECT_EQ(news(), (Texts{R"(notify me /kept [0: "new",1: "x"])"}));
     EXPECT_EQ(get("/kept/new/_/watchers"), "[]");
 }
 
 TEST_F(Property, WatchersThatWentAwayExpireAndStillCountOnce) {
     push("/kept/_/watched");
     auto other = rig_.registeredClient("other");
-    other->send(Operation::kPush, "/kept/x");
-    static_cast<void>(other->takeMessages());
-    EXPECT_EQ(news(), (Texts{"me /kept/_/watched []", "me /kept/_/watched [0: \"x\"]"}));
+    EXPECT_EQ(newsOf(other, Operation::kPush, "/kept/x").size(), 2U);
     other.reset();
     ASSERT_TRUE(rig_.waitForDrop());
     EXPECT_EQ(get("/kept/x/_/watchers"), "[]");
@@ -277,36 +242,24 @@ TEST_F(Property, WatchersThatWentAwayExpireAndStillCountOnce) {
     EXPECT_EQ(news(), Texts());
     // The expired entry still counts as a watcher: nobody is told of the new one.
     push("/kept/x");
-    EXPECT_EQ(news(), (Texts{"me /kept/x 1"}));
+    EXPECT_EQ(news(), (Texts{"notify me /kept/x 1"}));
     EXPECT_EQ(get("/kept/_/watched"), R"([0: "x"])");
     // That PUSH has cleaned up, so that now the last one leaves.
     pop("/kept/x");
-    EXPECT_EQ(news(), (Texts{"me /kept/_/watched []"}));
-}
-
-TEST_F(Property, DumpsAllItsValuesAsPartOfTheTree) {
-    set("/kept/a", vox::int64(1));
-    EXPECT_EQ(get("/kept/*"), R"({"a": 1,"x": {"k": [0: 5]}})");
-    EXPECT_EQ(get("*"), R"({"connections": [0: "me"],"events": {"x": null},)"
-                        R"("kept": {"a": 1,"x": {"k": [0: 5]}}})");
+    EXPECT_EQ(news(), (Texts{"notify me /kept/_/watched []"}));
 }
 
 TEST(Watchable, KnowsItsWatchersOnce) {
-    class Silent : public plr::rest::RestResourceConnection {
-      public:
-        using RestResourceConnection::RestResourceConnection;
-        void send(vox::dict) const override {}
-        void sendWithReply(vox::dict, dispatch::queue, ReplyHandler) const override {}
-    };
     plr::rest::WatchableRestResourceHelper watchers;
-    std::shared_ptr<plr::rest::RestResourceConnection> first = std::make_shared<Silent>("1");
-    const std::shared_ptr<plr::rest::RestResourceConnection> second = std::make_shared<Silent>("2");
+    std::shared_ptr<plr::rest::RestResourceConnection> first =
+        std::make_shared<FakeRestConnection>("1");
+    const std::shared_ptr<plr::rest::RestResourceConnection> second =
+        std::make_shared<FakeRestConnection>("2");
     EXPECT_TRUE(watchers.addWatcher(first));
     EXPECT_FALSE(watchers.addWatcher(first));
     EXPECT_TRUE(watchers.addWatcher(second));
-    EXPECT_EQ(watchers.getWatcherNames().count(), 2U);
     first.reset();
-    EXPECT_EQ(RawRestClient::oneLine(watchers.getWatcherNames()), R"([0: "2"])");
+    EXPECT_EQ(oneLine(watchers.getWatcherNames()), R"([0: "2"])");
     EXPECT_FALSE(watchers.removeWatcher(nullptr));
     EXPECT_TRUE(watchers.removeWatcher(second));
     EXPECT_FALSE(watchers.removeWatcher(second));

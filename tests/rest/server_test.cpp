@@ -2,159 +2,162 @@
 
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <memory>
 #include <stdexcept>
 #include <string>
 #include <vector>
 
-#include "plr/base/report.h"
-#include "support/fake_rest.h"
 #include "support/raw_rest_client.h"
+#include "support/runtime.h"
 
 namespace {
 
-using plr::rest::Operation;
-using plr::rest::PathView;
-using plr::rest::RestResource;
-using plr::rest::RestResourceConnection;
-using plr::rest::RestResourceContext;
-using plr::rest::RestServerExample;
-using plr::rest::TreeRestResource;
-using plr::test::Event;
-using plr::test::FakeRestResource;
-using plr::test::RawRestClient;
-using plr::test::RestServerRig;
-using Texts = std::vector<std::string>;
+using namespace plr::rest;
+using namespace plr::test;
 
-std::string text(const vox::object& value) {
-    return RawRestClient::oneLine(value);
+// A resource that does what a test says with GET, and with SET or PUSH.
+class Scripted : public RestResource {
+  public:
+    using Handler = std::function<bool(RestResourceContext&)>;
+    explicit Scripted(Handler get, Handler other = {})
+        : get_(std::move(get)), other_(std::move(other)) {}
+    bool handleRestMessage_GET(RestResourceContext& context, const PathView&) override {
+        return get_(context);
+    }
+    bool handleRestMessage_SET(RestResourceContext& context, const PathView&) override {
+        return other_(context);
+    }
+    bool handleRestMessage_PUSH(RestResourceContext& context, const PathView&) override {
+        return other_(context);
+    }
+
+  private:
+    const Handler get_;
+    const Handler other_;
+};
+
+// Answers what it sees of the author.
+std::shared_ptr<RestResourceBase> author() {
+    return std::make_shared<Scripted>([](RestResourceContext& context) {
+        return context.sendReplyWithValue(
+            vox::string("%s, says %s", context.getAuthorResource() ? "known" : "unknown",
+                        context.getRestAuthor().to_string().c_str()));
+    });
 }
 
-TEST(RestServer, RefusesToConnectToNothing) {
-    const auto server =
-        RestServerExample::create(dispatch::queue::create("server"), "any name at all");
+class RestServer : public testing::Test {
+  protected:
+    // Starts the server; a client that it does not know.
+    RawRestClient& start() {
+        rig.start();
+        client = rig.client("me");
+        return *client;
+    }
+
+    RestServerRig rig;
+    std::unique_ptr<RawRestClient> client;
+};
+
+TEST_F(RestServer, RefusesToConnectToNothing) {
     try {
-        server->connect(vox::connection());
+        rig.server().connect(vox::connection());
         FAIL();
     } catch (const std::invalid_argument& error) {
         EXPECT_STREQ(error.what(), "RestServer::connect cannot be called with a null connection");
     }
 }
 
-TEST(RestServer, RegistersResourcesBelowTheirNodes) {
-    const RestServerRig rig;
+TEST_F(RestServer, RegistersResourcesBelowTheirNodes) {
     EXPECT_FALSE(rig.server().registerResource("/a/b", std::make_shared<RestResource>()));
     EXPECT_FALSE(rig.server().registerResource("/", std::make_shared<RestResource>()));
     EXPECT_FALSE(rig.server().registerResource("/a", nullptr));
     rig.add("///a/", std::make_shared<TreeRestResource>());
-    rig.add("a/b", std::make_shared<FakeRestResource>());
+    rig.add("a/b", std::make_shared<RestResource>());
     // From the server's own queue too.
-    rig.queue().sync([&] { rig.add("/a/c", std::make_shared<FakeRestResource>()); });
-    rig.start();
-    EXPECT_EQ(text(rig.client("me")->get("/a")), R"([0: "b",1: "c"])");
+    rig.queue().sync([&] { rig.add("/a/c", std::make_shared<RestResource>()); });
+    EXPECT_EQ(start().textAt("/a"), R"([0: "b",1: "c"])");
 }
 
-// Answers what it sees of the author.
-class Author : public RestResource {
-  public:
-    bool handleRestMessage_GET(RestResourceContext& context, const PathView&) override {
-        const auto author = context.getAuthorResource();
-        context.sendReplyWithValue(vox::string("%s, says %s", author ? "known" : "unknown",
-                                               context.getRestAuthor().to_string().c_str()));
-        return true;
-    }
-};
-
-TEST(RestServer, KnowsAuthorsThroughTheFirstConnectionsResource) {
+TEST(RestServers, KnowAuthorsThroughTheFirstConnectionsResource) {
+    const auto connections = [] { return std::make_shared<ConnectionRestResource>(); };
     const struct {
-        const char* name;
         const char* path;
-        std::shared_ptr<plr::rest::RestResourceBase> resource;
+        std::shared_ptr<RestResourceBase> resource;
         const char* expected;
     } rows[] = {
-        {"connections", "/connections", std::make_shared<plr::rest::ConnectionRestResource>(),
-         R"("known, says "me"")"},
+        {"/connections", connections(), R"("known, says "me"")"},
         // Deliberate: only this spelling makes it the server's own.
-        {"no slash", "connections", std::make_shared<plr::rest::ConnectionRestResource>(),
-         R"("unknown, says "me"")"},
-        {"two slashes", "//connections", std::make_shared<plr::rest::ConnectionRestResource>(),
-         R"("unknown, says "me"")"},
-        {"another type", "/connections", std::make_shared<FakeRestResource>(),
-         R"("unknown, says "me"")"},
+        {"connections", connections(), R"("unknown, says "me"")"},
+        {"//connections", connections(), R"("unknown, says "me"")"},
+        {"/connections", std::make_shared<FakeRestResource>(), R"("unknown, says "me"")"},
     };
     for (const auto& row : rows) {
         const auto server = RestServerExample::create(dispatch::queue::create("server"), "");
-        EXPECT_TRUE(server->registerResource(row.path, row.resource)) << row.name;
-        EXPECT_TRUE(server->registerResource("/author", std::make_shared<Author>()));
+        EXPECT_TRUE(server->registerResource(row.path, row.resource));
+        EXPECT_TRUE(server->registerResource("/author", author()));
         const auto listener = vox::connection::create_anonymous_listener();
         server->connect(listener);
         const RawRestClient client(vox::endpoint::create(listener).connect(), "me");
         client.registerName();
-        EXPECT_EQ(text(client.get("/author")), row.expected) << row.name;
+        EXPECT_EQ(client.textAt("/author"), row.expected) << row.path;
     }
 }
 
-TEST(Connections, AreListedRegisteredOnceAndForgotten) {
-    const RestServerRig rig;
-    rig.add("/author", std::make_shared<Author>());
-    rig.start();
-    const auto me = rig.registeredClient("me");
-    EXPECT_EQ(text(me->get("/connections")), R"([0: "me"])");
+TEST_F(RestServer, ListsConnectionsThatRegisteredOnceAndForgetsThem) {
+    rig.add("/author", author());
+    const RawRestClient& me = start();
+    me.registerName();
     auto other = rig.registeredClient("b");
-    EXPECT_EQ(text(other->get("/connections")), R"([0: "b",1: "me"])");
-    auto third = rig.registeredClient("b");
-    EXPECT_EQ(text(third->get("/connections")), R"([0: "b",1: "b",2: "me"])");
+    EXPECT_EQ(other->textAt("/connections"), R"([0: "b",1: "me"])");
+    const auto third = rig.registeredClient("b");
+    EXPECT_EQ(third->textAt("/connections"), R"([0: "b",1: "b",2: "me"])");
     // A second registration changes nothing.
-    vox::dict again = me->message(Operation::kPush, "/connections");
+    vox::dict again = me.message(Operation::kPush, "/connections");
     again["a"] = vox::string("renamed");
-    me->send(again);
-    EXPECT_EQ(text(me->get("/connections")), R"([0: "b",1: "b",2: "me"])");
-    me->send(Operation::kPop, "/connections");
-    me->send(Operation::kPop, "/connections");
-    EXPECT_EQ(text(me->get("/connections")), R"([0: "b",1: "b"])");
-    EXPECT_EQ(text(me->get("/author")), R"("unknown, says "me"")");
+    me.send(again);
+    EXPECT_EQ(me.textAt("/connections"), R"([0: "b",1: "b",2: "me"])");
+    me.send(Operation::kPop, "/connections");
+    me.send(Operation::kPop, "/connections");
+    EXPECT_EQ(me.textAt("/connections/*"), R"([0: "b",1: "b"])");
+    EXPECT_EQ(me.textAt("/author"), R"("unknown, says "me"")");
     other.reset();
     EXPECT_TRUE(rig.waitForDrop());
-    EXPECT_EQ(text(me->get("/connections")), R"([0: "b"])");
-    EXPECT_EQ(text(me->get("/connections/*")), R"([0: "b"])");
+    EXPECT_EQ(me.textAt("/connections"), R"([0: "b"])");
 }
 
-TEST(Connections, BoundTheirNames) {
-    const RestServerRig rig;
-    rig.start();
-    const auto client = rig.client("me");
-    const auto registerAs = [&](const vox::object& author) {
-        vox::dict message = client->message(Operation::kPush, "/connections");
-        message["a"] = author;
-        client->send(message);
-        const std::string names = text(client->get("/connections"));
-        client->send(Operation::kPop, "/connections");
-        return names;
+TEST_F(RestServer, BoundsTheNamesOfConnections) {
+    start();
+    const std::string longest(ConnectionRestResource::kMaximumNameLength, 'n');
+    const std::pair<vox::object, std::string> rows[] = {
+        {vox::string(std::string_view(longest)), "[0: \"" + longest + "\"]"},
+        {vox::string(longest + "n"), "[]"},
+        {vox::int64(5), R"([0: ""])"},
     };
-    const std::string longest(plr::rest::ConnectionRestResource::kMaximumNameLength, 'n');
-    EXPECT_EQ(registerAs(vox::string(std::string_view(longest))), "[0: \"" + longest + "\"]");
-    EXPECT_EQ(registerAs(vox::string(longest + "n")), "[]");
-    EXPECT_EQ(registerAs(vox::int64(5)), R"([0: ""])");
-    EXPECT_EQ(registerAs(nullptr), R"([0: ""])");
+    for (const auto& [name, expected] : rows) {
+        vox::dict message = client->message(Operation::kPush, "/connections");
+        message["a"] = name;
+        client->send(message);
+        EXPECT_EQ(client->textAt("/connections"), expected);
+        client->send(Operation::kPop, "/connections");
+    }
     client->send(Operation::kPush, "/connections/below");
-    EXPECT_EQ(text(client->get("/connections")), "[]");
+    EXPECT_EQ(client->textAt("/connections"), "[]");
 }
 
-TEST(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
-    const RestServerRig rig;
+TEST_F(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
     rig.add("/leaf", std::make_shared<FakeRestResource>());
-    rig.start();
-    const auto client = rig.client("me");
-    EXPECT_EQ(text(client->exchange(client->message(Operation::kGet, "/leaf/x"))),
+    start();
+    EXPECT_EQ(oneLine(client->exchange(client->message(Operation::kGet, "/leaf/x"))),
               R"({"o": "get","r": "/leaf/x","v": "value"})");
     vox::dict rootless = client->message(Operation::kGet, "");
     rootless["r"] = vox::int64(7);
-    EXPECT_EQ(text(client->exchange(rootless)),
+    EXPECT_EQ(oneLine(client->exchange(rootless)),
               R"({"o": "get","r": 7,"v": [0: "connections",1: "leaf",2: "~drops"]})")
         << "something that is no path is the root";
     // None of these is answered: only the GET of the root behind each of them is.
     const vox::dict unanswered[] = {
-        plr::rest::createPingMessage(),
+        createPingMessage(),
         vox::dict::create(),
         client->message(Operation::kGet, "/unknown"),
         client->message(Operation::kGet, "/connections/unknown"),
@@ -162,233 +165,155 @@ TEST(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
         client->message(Operation::kNone, "/leaf"),
         client->message(Operation::kSet, "*"),
     };
-    int replies = 0;  // touched on the client's queue only
     for (const vox::dict& message : unanswered)
-        client->connection().send_message_with_reply(
-            message, client->queue(),
-            dispatch::block<void(vox::object)>([&](const vox::object&) { ++replies; }));
-    EXPECT_TRUE(client->takeMessages().empty());
-    EXPECT_EQ(client->queue().sync([&] { return replies; }), 0);
+        client->ask(message);
+    // Nor is what wants no answer.
+    for (const char* path : {"/leaf", "", "*", "/connections"})
+        client->send(Operation::kGet, path);
+    EXPECT_EQ(client->takeMessages(), Texts());
+    EXPECT_TRUE(client->replies().empty());
     // They are answered by the end of the connection.
     client->connection().cancel();
     EXPECT_TRUE(client->waitForEnd());
-    EXPECT_EQ(client->queue().sync([&] { return replies; }), 7);
+    EXPECT_EQ(client->replies().size(), std::size(unanswered));
 }
 
-// Redirects to itself; counts how often it is reached.
-class Loop : public RestResource {
-  public:
+TEST_F(RestServer, RedirectsAMessageTenTimesAtMost) {
     int reached = 0;
-    bool handleRestMessage_GET(RestResourceContext& context, const PathView&) override {
-        ++reached;
-        return context.redirect("/loop/again");
-    }
-    bool handleRestMessage_SET(RestResourceContext& context, const PathView&) override {
-        return context.redirect("/leaf");
-    }
-};
-
-TEST(RestServer, RedirectsAMessageTenTimesAtMost) {
-    const RestServerRig rig;
-    const auto loop = std::make_shared<Loop>();
+    rig.add("/loop", std::make_shared<Scripted>(
+                         [&](RestResourceContext& context) {
+                             ++reached;
+                             return context.redirect("/loop/again");
+                         },
+                         [](RestResourceContext& context) { return context.redirect("/leaf"); }));
     const auto leaf = std::make_shared<FakeRestResource>();
-    rig.add("/loop", loop);
     rig.add("/leaf", leaf);
     rig.queue().sync([&] {
         const auto send = [&](Operation operation) {
             return rig.server().handleRestMessage(
-                nullptr, plr::rest::createRestMessage(asObject(operation), nullptr,
-                                                      vox::string("/loop"), nullptr));
+                nullptr,
+                createRestMessage(asObject(operation), nullptr, vox::string("/loop"), nullptr));
         };
         EXPECT_FALSE(send(Operation::kGet));
-        EXPECT_EQ(loop->reached, 11);
+        EXPECT_EQ(reached, 11);
         EXPECT_FALSE(send(Operation::kGet)) << "each message has its own ten";
-        EXPECT_EQ(loop->reached, 22);
+        EXPECT_EQ(reached, 22);
         EXPECT_TRUE(send(Operation::kSet));
         EXPECT_EQ(leaf->calls, (Texts{"SET "}));
     });
 }
 
-// Passes a GET on to the client that has pushed itself here.
-class Forwarder : public RestResource {
-  public:
-    bool handleRestMessage_PUSH(RestResourceContext& context, const PathView&) override {
-        provider_ = context.getAuthorResource();
-        return true;
-    }
-    bool handleRestMessage_GET(RestResourceContext& context, const PathView&) override {
-        return provider_ &&
-               context.sendGet(*provider_, context.getRestAuthor(), vox::string("/forwarded"),
-                               context.getRestValue(), context.takeAutoReplyValue());
-    }
-
-  private:
-    std::shared_ptr<RestResourceConnection> provider_;
-};
-
-TEST(RestServer, ForwardsAGetAndItsAnswer) {
-    const RestServerRig rig;
-    rig.add("/forward", std::make_shared<Forwarder>());
-    rig.start();
+// A GET is passed on to the client that has pushed itself there.
+TEST_F(RestServer, ForwardsAGetAndItsAnswer) {
+    std::shared_ptr<RestResourceConnection> provider;
+    rig.add("/forward", std::make_shared<Scripted>(
+                            [&](RestResourceContext& context) {
+                                return provider &&
+                                       context.sendGet(*provider, context.getRestAuthor(),
+                                                       vox::string("/forwarded"),
+                                                       context.getRestValue(),
+                                                       context.takeAutoReplyValue());
+                            },
+                            [&](RestResourceContext& context) {
+                                provider = context.getAuthorResource();
+                                return true;
+                            }));
+    start();
     const auto moduleQueue = dispatch::queue::create("provider");
-    const plr::RestModule provider(moduleQueue, "provider");
+    const plr::RestModule module(moduleQueue, "provider");
     Event ready;
     moduleQueue.sync([&] {
-        provider.connect(rig.connect());
-        provider.registerAsRequestSink(
+        module.connect(rig.connect());
+        module.registerAsRequestSink(
             "/forwarded", [](const vox::object& value, const std::shared_ptr<vox::object>& reply) {
                 *reply = vox::string("answer to %s", value.to_string().c_str());
             });
-        provider.sendRawPush("/forward", nullptr);
-        provider.getPropertyOnce("", [&ready](const vox::object&) { ready.signal(); });
+        module.sendRawPush("/forward", nullptr);
+        module.getPropertyOnce("", [&ready](const vox::object&) { ready.signal(); });
     });
     ASSERT_TRUE(ready.wait());
-    const auto client = rig.client("me");
-    EXPECT_EQ(text(client->get("/forward", vox::int64(1))), R"("answer to 1")");
-    moduleQueue.sync([&] { provider.disconnect(); });
+    EXPECT_EQ(oneLine(client->get("/forward", vox::int64(1))), R"("answer to 1")");
+    moduleQueue.sync([&] { module.disconnect(); });
     ASSERT_TRUE(rig.waitForDrop());
-    EXPECT_EQ(text(client->get("/forward", vox::int64(2))), "null") << "nobody can answer";
+    EXPECT_EQ(oneLine(client->get("/forward", vox::int64(2))), "null") << "nobody can answer";
 }
 
-// Keeps its replies.
-class Late : public RestResource {
-  public:
-    std::vector<std::shared_ptr<vox::object>> replies;
-    bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override {
-        if (path)
-            return false;
-        replies.push_back(context.takeAutoReplyValue());
-        EXPECT_FALSE(context.takeAutoReplyValue()) << "there is one reply";
-        EXPECT_FALSE(context.sendReplyWithValue(vox::int64(1)));
-        return true;
-    }
-};
-
-TEST(RestServer, DeferredRepliesLeaveWithTheirLastHolder) {
-    const RestServerRig rig;
-    const auto late = std::make_shared<Late>();
-    rig.add("/late", late);
-    rig.start();
-    const auto client = rig.client("me");
-    std::vector<vox::object> answers;  // touched on the client's queue only
-    Event answered;
-    for (int i = 0; i < 3; ++i)
-        client->connection().send_message_with_reply(
-            client->message(Operation::kGet, "/late"), client->queue(),
-            dispatch::block<void(vox::object)>([&](const vox::object& answer) {
-                answers.push_back(answer);
-                answered.signal();
+TEST_F(RestServer, DeferredRepliesLeaveWithTheirLastHolder) {
+    std::vector<std::shared_ptr<vox::object>> replies;  // touched on the server's queue only
+    rig.add("/late", std::make_shared<Scripted>([&](RestResourceContext& context) {
+                replies.push_back(context.takeAutoReplyValue());
+                EXPECT_FALSE(context.takeAutoReplyValue()) << "there is one reply";
+                EXPECT_FALSE(context.sendReplyWithValue(vox::int64(1)));
+                return true;
             }));
-    EXPECT_TRUE(client->takeMessages().empty());
-    auto replies = rig.queue().sync([&] { return std::exchange(late->replies, {}); });
-    ASSERT_EQ(replies.size(), 3U);
+    start();
+    for (int i = 0; i < 3; ++i)
+        client->ask(client->message(Operation::kGet, "/late"));
+    client->send(Operation::kGet, "/late");  // wants no answer, and leaves nothing to hold
+    EXPECT_EQ(client->takeMessages(), Texts());
+    auto held = rig.queue().sync([&] { return std::exchange(replies, {}); });
+    ASSERT_EQ(held.size(), 4U);
+    EXPECT_FALSE(held[3]);
     // Out of order, on another thread: an error, nothing, a value.
-    *replies[2] = vox::error(7, "too late");
-    replies.pop_back();
-    EXPECT_TRUE(answered.wait());
-    replies.erase(replies.begin());
-    EXPECT_TRUE(answered.wait());
-    *replies[0] = vox::int64(5);
-    auto copy = replies[0];
-    replies.clear();
+    *held[2] = vox::error(7, "too late");
+    held.resize(2);
+    EXPECT_TRUE(client->replied.wait());
+    held.erase(held.begin());
+    EXPECT_TRUE(client->replied.wait());
+    *held[0] = vox::int64(5);
+    auto copy = held[0];
+    held.clear();
     copy.reset();
-    EXPECT_TRUE(answered.wait());
+    EXPECT_TRUE(client->replied.wait());
     Texts texts;
-    for (const vox::object& answer : client->queue().sync([&] { return answers; }))
-        texts.push_back(text(answer));
+    for (const vox::object& answer : client->replies())
+        texts.push_back(oneLine(answer));
     EXPECT_EQ(texts,
               (Texts{R"({"o": "get","r": "/late","e": "too late"})", R"({"o": "get","r": "/late"})",
                      R"({"o": "get","r": "/late","v": 5})"}));
 }
 
-// A message that wants no answer gets none, and leaves nothing to hold.
-TEST(RestServer, MessagesWithoutReplyAreHandledSilently) {
-    const RestServerRig rig;
-    const auto late = std::make_shared<Late>();
-    rig.add("/late", late);
-    rig.add("/leaf", std::make_shared<FakeRestResource>());
-    rig.start();
-    const auto client = rig.client("me");
-    for (const char* path : {"/late", "/leaf", "", "*", "/connections"})
-        client->send(Operation::kGet, path);
-    EXPECT_TRUE(client->takeMessages().empty());
-    rig.queue().sync([&] {
-        ASSERT_EQ(late->replies.size(), 1U);
-        EXPECT_FALSE(late->replies[0]);
-        late->replies.clear();
-    });
-}
-
-class Thrower : public RestResource {
-  public:
-    bool handleRestMessage_SET(RestResourceContext& context, const PathView&) override {
-        // As a resource would that trusts its clients.
+TEST_F(RestServer, SurvivesAResourceThatThrows) {
+    const Reports reports;
+    const auto trusting = [](RestResourceContext& context) {
         return vox::dyn_cast_or_default(context.getRestValue(), 0ULL) != 0;
-    }
-};
-
-TEST(RestServer, SurvivesAResourceThatThrows) {
-    static std::string reported;
-    const RestServerRig rig;
-    rig.add("/throws", std::make_shared<Thrower>());
-    rig.start();
-    const auto client = rig.client("me");
-    const plr::ReportHook before =
-        plr::setReportHook([](const char* line) noexcept { reported = line; });
-    client->send(Operation::kSet, "/throws", vox::int64(-1));
-    EXPECT_TRUE(client->takeMessages().empty());
-    plr::setReportHook(before);
-    EXPECT_NE(reported.find("dyn_cast to uint64_t requires nonnegative values"), std::string::npos)
-        << reported;
+    };
+    rig.add("/throws", std::make_shared<Scripted>(trusting, trusting));
+    start().send(Operation::kSet, "/throws", vox::int64(-1));
+    EXPECT_EQ(client->takeMessages(), Texts());
+    EXPECT_EQ(reports.count("dyn_cast to uint64_t requires nonnegative values"), 1U);
 }
 
-TEST(RestServer, IgnoresItsClientsOnceItIsGone) {
-    RestServerRig rig;
-    rig.start();
-    const auto client = rig.registeredClient("me");
-    EXPECT_EQ(text(client->get("/connections")), R"([0: "me"])");
+TEST_F(RestServer, IgnoresItsClientsOnceItIsGone) {
+    EXPECT_EQ(start().textAt("/connections"), "[]");
     rig.stop();
-    bool answered = false;  // touched on the client's queue only
-    client->connection().send_message_with_reply(
-        client->message(Operation::kGet, ""), client->queue(),
-        dispatch::block<void(vox::object)>([&](const vox::object& reply) {
-            EXPECT_EQ(reply.type(), VOX_TYPE_ERROR);
-            answered = true;
-        }));
+    client->ask(client->message(Operation::kGet, ""));
     client->connection().cancel();
     EXPECT_TRUE(client->waitForEnd());
-    EXPECT_TRUE(client->queue().sync([&] { return answered; }));
-    const RawRestClient late(rig.connect(), "late");
-    EXPECT_NE(late.connection().get(), nullptr);
+    ASSERT_EQ(client->replies().size(), 1U);
+    EXPECT_EQ(client->replies()[0].type(), VOX_TYPE_ERROR);
+    const auto late = rig.client("late");
 }
 
-TEST(RestServer, TellsOfItsListenersEnd) {
-    const RestServerRig rig;
-    rig.start();
+TEST_F(RestServer, ListensAnewAndTellsOfItsPresentListenersEnd) {
+    start().registerName();
+    EXPECT_EQ(client->textAt("/connections"), R"([0: "me"])");
+    vox::object why;  // touched on the server's queue only
     Event failed;
-    vox::object why;
     rig.server().setListenerErrorHandler([&](const vox::object& error) {
+        EXPECT_FALSE(why) << "also of the old one's";
         why = error;
         failed.signal();
     });
-    rig.listener().cancel();
-    EXPECT_TRUE(failed.wait());
-    EXPECT_EQ(why.type(), VOX_TYPE_ERROR);
-    rig.server().setListenerErrorHandler({});
-}
-
-TEST(RestServer, ListensAnewAndDropsTheOldListenersErrors) {
-    const RestServerRig rig;
-    rig.start();
-    const auto client = rig.registeredClient("me");
-    EXPECT_EQ(text(client->get("/connections")), R"([0: "me"])");
-    rig.server().setListenerErrorHandler([](const vox::object&) { FAIL(); });
     const auto listener = vox::connection::create_anonymous_listener();
     rig.server().connect(listener);
     const RawRestClient other(vox::endpoint::create(listener).connect(), "other");
     other.registerName();
-    EXPECT_EQ(text(other.get("/connections")), R"([0: "me",1: "other"])");
-    EXPECT_EQ(text(client->get("/connections")), R"([0: "me",1: "other"])");
+    EXPECT_EQ(other.textAt("/connections"), R"([0: "me",1: "other"])");
+    EXPECT_EQ(client->textAt("/connections"), R"([0: "me",1: "other"])");
+    listener.cancel();
+    EXPECT_TRUE(failed.wait());
+    EXPECT_EQ(rig.queue().sync([&] { return why; }).type(), VOX_TYPE_ERROR);
     rig.server().setListenerErrorHandler({});
 }
 

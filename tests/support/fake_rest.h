@@ -11,6 +11,13 @@
 // sends.
 namespace plr::test {
 
+// A value on one line.
+inline std::string oneLine(const vox::object& value) {
+    std::string text = value.to_string();
+    std::erase_if(text, [](char c) { return c == '\n' || c == '\t'; });
+    return text;
+}
+
 class FakeRestConnection : public rest::RestResourceConnection {
   public:
     using RestResourceConnection::RestResourceConnection;

@@ -9,13 +9,15 @@
 #include <utility>
 #include <vector>
 
-#include "plr/rest.h"
+#include "support/fake_rest.h"
 #include "support/waiting.h"
+
+namespace plr::test {
+
+using Texts = std::vector<std::string>;
 
 // A client of a REST server that sends whatever a test wants, and keeps every
 // message that it gets.
-namespace plr::test {
-
 class RawRestClient {
   public:
     // `connection` is not started yet.
@@ -34,7 +36,6 @@ class RawRestClient {
     RawRestClient& operator=(const RawRestClient&) = delete;
 
     [[nodiscard]] const vox::connection& connection() const { return connection_; }
-    [[nodiscard]] const dispatch::queue& queue() const { return queue_; }
 
     [[nodiscard]] vox::dict message(rest::Operation operation, std::string_view path,
                                     const vox::object& value = {}) const {
@@ -49,6 +50,18 @@ class RawRestClient {
     // Makes the client known to the server.
     void registerName() const { send(rest::Operation::kPush, "/connections"); }
 
+    // Asks; what answers is added to replies().
+    void ask(const vox::dict& message) {
+        connection_.send_message_with_reply(
+            message, queue_, dispatch::block<void(vox::object)>([this](const vox::object& reply) {
+                replies_.push_back(reply);
+                replied.signal();
+            }));
+    }
+    // What answered so far, errors included.
+    [[nodiscard]] std::vector<vox::object> replies() const {
+        return queue_.sync([this] { return replies_; });
+    }
     // The reply to a message; an error when it was not answered in time.
     [[nodiscard]] vox::object exchange(const vox::dict& message) const {
         const auto answer = std::make_shared<std::promise<vox::object>>();
@@ -65,73 +78,43 @@ class RawRestClient {
     [[nodiscard]] vox::object get(std::string_view path, const vox::object& value = {}) const {
         return rest::getReplyValue(exchange(message(rest::Operation::kGet, path, value)));
     }
+    [[nodiscard]] std::string textAt(std::string_view path) const { return oneLine(get(path)); }
 
-    // The messages that came since the last call, all that the other end sent
-    // before now included: it answers `probe` behind them.
-    [[nodiscard]] std::vector<vox::dict> takeMessagesBefore(const vox::dict& probe) {
+    // The messages that came since the last call, each as "operation author path
+    // value"; all that the other end sent before now included: it answers `probe`
+    // behind them.
+    [[nodiscard]] Texts takeMessagesBefore(const vox::dict& probe) {
         EXPECT_TRUE(vox::dict(exchange(probe))) << "the other end does not answer";
         return queue_.sync([this] { return std::exchange(messages_, {}); });
     }
     // The same with a probe that every server answers.
-    [[nodiscard]] std::vector<vox::dict> takeMessages() {
+    [[nodiscard]] Texts takeMessages() {
         return takeMessagesBefore(message(rest::Operation::kGet, ""));
-    }
-    // The same for notifications, each as "author path value".
-    [[nodiscard]] std::vector<std::string> takeNotifications() {
-        std::vector<std::string> texts;
-        for (const vox::dict& message : takeMessages()) {
-            EXPECT_EQ(rest::asOperation(message["o"]), rest::Operation::kNotify);
-            texts.push_back(std::string(vox::object(message["a"]).text()) + " " +
-                            std::string(vox::object(message["r"]).text()) + " " +
-                            oneLine(message["v"]));
-        }
-        return texts;
     }
 
     // Whether the connection ended.
     [[nodiscard]] bool waitForEnd() { return hasEnded_ || (hasEnded_ = end_.wait()); }
-    // What ended it.
-    [[nodiscard]] vox::object endError() {
-        EXPECT_TRUE(waitForEnd());
-        return queue_.sync([this] { return error_; });
-    }
 
-    // A value on one line.
-    [[nodiscard]] static std::string oneLine(const vox::object& value) {
-        std::string text;
-        for (const char c : value.to_string())
-            if (c != '\n' && c != '\t')
-                text += c;
-        return text;
-    }
+    Event replied;
 
   private:
     void take(const vox::object& event) {
-        if (const vox::dict message(event); message) {
-            messages_.push_back(message);
-        } else {
-            error_ = event;
-            end_.signal();
-        }
+        const vox::dict message(event);
+        if (!message)
+            return end_.signal();
+        std::string text;
+        for (const char* key : {"o", "a", "r"})
+            text.append(vox::object(message[key]).text()) += ' ';
+        messages_.push_back(text + oneLine(message["v"]));
     }
 
     const vox::connection connection_;
     const std::string name_;
     const dispatch::queue queue_ = dispatch::queue::create("raw.client");
-    std::vector<vox::dict> messages_;  // touched on the queue only
-    vox::object error_;                // touched on the queue only
+    Texts messages_;                    // touched on the queue only
+    std::vector<vox::object> replies_;  // touched on the queue only
     Event end_;
     bool hasEnded_ = false;
-};
-
-// Signals when the server has told its resources of a client that dropped.
-class DropObserver : public rest::RestResource {
-  public:
-    void handleDroppedConnection(rest::RestResourceContext&, const rest::PathView&,
-                                 const std::shared_ptr<rest::RestResourceConnection>&) override {
-        dropped.signal();
-    }
-    Event dropped;
 };
 
 // A server with an anonymous listener, and clients for it.
@@ -176,7 +159,17 @@ class RestServerRig {
     }
 
   private:
-    const std::shared_ptr<DropObserver> drops_ = std::make_shared<DropObserver>();
+    // Signals when the server has told its resources of a client that dropped.
+    struct Drops : rest::RestResource {
+        void handleDroppedConnection(
+            rest::RestResourceContext&, const rest::PathView&,
+            const std::shared_ptr<rest::RestResourceConnection>&) override {
+            dropped.signal();
+        }
+        Event dropped;
+    };
+
+    const std::shared_ptr<Drops> drops_ = std::make_shared<Drops>();
     const dispatch::queue queue_ = dispatch::queue::create("rest.server");
     std::shared_ptr<rest::RestServerExample> server_ =
         rest::RestServerExample::create(queue_, "rig");

@@ -1,71 +1,43 @@
 #pragma once
 
 #include <gtest/gtest.h>
-#include <unistd.h>
 
-#include <chrono>
 #include <condition_variable>
-#include <cstdint>
-#include <cstdlib>
-#include <filesystem>
+#include <functional>
 #include <memory>
 #include <mutex>
+#include <numeric>
 #include <string>
-#include <string_view>
-#include <utility>
 #include <vector>
 
-#include "plr/base/report.h"
+#include "support/runtime.h"
+#include "support/vox_values.h"
 #include "support/waiting.h"
 #include "vox/vox.h"
 
 // What the tests of Vox connections share.
 namespace plr::test {
 
-// One owned reference.
-class Ref {
-  public:
-    Ref() = default;
-    explicit Ref(vox_object_t adopted) : object_(adopted) {}
-    Ref(const Ref& other) : object_(vox_retain(other.object_)) {}
-    Ref(Ref&& other) noexcept : object_(std::exchange(other.object_, nullptr)) {}
-    Ref& operator=(Ref other) noexcept {
-        std::swap(object_, other.object_);
-        return *this;
-    }
-    ~Ref() { vox_release(object_); }
-    operator vox_object_t() const { return object_; }
-    static Ref retain(vox_object_t lent) { return Ref(vox_retain(lent)); }
-
-  private:
-    vox_object_t object_ = nullptr;
-};
+using Numbers = std::vector<std::int64_t>;
 
 // {"n": n}, and with "data" of `bytes` bytes when that is not 0.
 inline Ref message(std::int64_t n, std::size_t bytes = 0) {
-    Ref made(vox_dictionary_create());
-    vox_dictionary_set_value(made, "n", Ref(vox_int64_create(n)));
-    if (bytes > 0) {
-        const std::string data(bytes, 'x');
-        vox_dictionary_set_value(made, "data", Ref(vox_data_create(data.data(), bytes)));
-    }
-    return made;
+    const Ref data(vox_data_create(std::string(bytes, 'x').data(), bytes));
+    return dictionary({{"n", number(n)}, {"data", bytes > 0 ? vox_object_t(data) : nullptr}});
 }
 inline std::int64_t numberIn(vox_object_t message) {
     return vox_int64_get_value(vox_dictionary_get_value(message, "n"));
 }
-inline std::string descriptionOf(vox_object_t error) {
-    const vox_object_t text = vox_error_get_value(error, vox_error_key_description);
-    return text ? vox_string_get_string_ptr(text) : "";
+// 0, 1, … count - 1
+inline Numbers upTo(std::int64_t count) {
+    Numbers numbers(static_cast<std::size_t>(count));
+    std::iota(numbers.begin(), numbers.end(), 0);
+    return numbers;
 }
 
 // The events of one connection, in order.
 class Inbox {
   public:
-    // For vox_connection_set_event_handler(); the inbox outlives the connection.
-    dispatch::block<void(vox_object_t)> handler() {
-        return dispatch::block<void(vox_object_t)>([this](vox_object_t event) { add(event); });
-    }
     void add(vox_object_t event) {
         const std::lock_guard guard(lock_);
         events_.push_back(Ref::retain(event));
@@ -76,28 +48,30 @@ class Inbox {
         std::unique_lock guard(lock_);
         return changed_.wait_for(guard, kBound, [&] { return events_.size() >= count; });
     }
-    // The error event, waited for; null when none came in time.
+    // The error that came last, waited for; null when none came in time.
     [[nodiscard]] Ref waitForError() {
         std::unique_lock guard(lock_);
-        Ref found;
-        changed_.wait_for(guard, kBound, [&] {
-            if (!events_.empty() && vox_get_type(events_.back()) == VOX_TYPE_ERROR)
-                found = events_.back();
-            return vox_object_t(found) != nullptr;
-        });
-        return found;
+        const auto failed = [this] {
+            return !events_.empty() && vox_get_type(events_.back()) == VOX_TYPE_ERROR;
+        };
+        return changed_.wait_for(guard, kBound, failed) ? events_.back() : Ref();
+    }
+    // Of that error.
+    [[nodiscard]] std::int64_t errorCode() { return vox_error_get_code(waitForError()); }
+    [[nodiscard]] std::string errorText() {
+        return description(vox_error_get_value(waitForError(), vox_error_key_description));
     }
     [[nodiscard]] std::vector<Ref> all() const {
         const std::lock_guard guard(lock_);
         return events_;
     }
+    [[nodiscard]] vox_object_t operator[](std::size_t i) const { return all().at(i); }
     // The "n" of every message so far.
-    [[nodiscard]] std::vector<std::int64_t> numbers() const {
-        std::vector<std::int64_t> found;
-        for (const Ref& event : all()) {
+    [[nodiscard]] Numbers numbers() const {
+        Numbers found;
+        for (const Ref& event : all())
             if (vox_get_type(event) == VOX_TYPE_DICTIONARY)
                 found.push_back(numberIn(event));
-        }
         return found;
     }
     void clear() {
@@ -111,101 +85,78 @@ class Inbox {
     std::vector<Ref> events_;
 };
 
-// Sets up and resumes.
-inline void resumeWith(vox_connection_t connection, Inbox& inbox,
-                       const dispatch::queue& queue = dispatch::queue()) {
-    const auto handler = inbox.handler();
-    vox_connection_set_event_handler(connection, &handler);
-    if (queue)
-        vox_connection_set_target_queue(connection, &queue);
-    vox_connection_resume(connection);
-}
-
-// Sends `message` with reply; the reply or error arrives in `inbox`.
-inline void request(vox_connection_t connection, vox_object_t message, const dispatch::queue& queue,
-                    Inbox& inbox) {
-    const auto handler = inbox.handler();
-    vox_connection_send_message_with_reply(connection, message, &queue, &handler);
-}
-
-// The lines that went through the report hook since it was made. One at a time.
-class Reports {
+// One end of a connection, with its events. Cancelled at the end.
+class End {
   public:
-    Reports() {
-        lines().clear();
-        plr::setReportHook([](const char* line) noexcept {
-            const std::lock_guard guard(lock());
-            lines().emplace_back(line);
+    // True: the event is dealt with, and goes to no inbox.
+    using Handler = std::function<bool(vox_object_t)>;
+
+    // Not resumed yet.
+    explicit End(vox_connection_t adopted) : connection_(adopted) {}
+    ~End() {
+        vox_connection_cancel(connection_);
+        if (resumed_) {
+            EXPECT_TRUE(ended_.wait());
+        }
+        drain(queue);
+    }
+    End(const End&) = delete;
+    End& operator=(const End&) = delete;
+    operator vox_connection_t() const { return connection_; }
+
+    void resume(const Handler& first = {}) {
+        const dispatch::block<void(vox_object_t)> handler([this, first](vox_object_t event) {
+            if (!first || !first(event))
+                inbox.add(event);
+            if (vox_get_type(event) == VOX_TYPE_ERROR)
+                ended_.signal();
         });
+        vox_connection_set_event_handler(connection_, &handler);
+        vox_connection_set_target_queue(connection_, &queue);
+        vox_connection_resume(connection_);
+        resumed_ = true;
     }
-    ~Reports() { plr::setReportHook(nullptr); }
-    Reports(const Reports&) = delete;
-    Reports& operator=(const Reports&) = delete;
-    // How many lines contain `text`.
-    [[nodiscard]] std::size_t count(std::string_view text) const {
-        const std::lock_guard guard(lock());
-        std::size_t found = 0;
-        for (const std::string& line : lines())
-            found += line.find(text) != std::string::npos ? 1 : 0;
-        return found;
+    // Requests are answered with their number.
+    void resumeEcho() {
+        resume([this](vox_object_t event) { return answer(event) == 0; });
     }
+    // Answers a request with its number and `bytes` bytes. EINVAL: it is none.
+    int answer(vox_object_t request, std::size_t bytes = 0) {
+        const Ref reply(vox_dictionary_create_reply(request));
+        if (!vox_object_t(reply))
+            return EINVAL;
+        const Ref contents = message(numberIn(request), bytes);
+        for (const char* key : {"n", "data"})
+            vox_dictionary_set_value(reply, key, vox_dictionary_get_value(contents, key));
+        return send(reply);
+    }
+    int send(vox_object_t message) { return vox_connection_send_message(connection_, message); }
+    // The answer, or an error, arrives in `replies`.
+    void request(vox_object_t message, Inbox& replies, const dispatch::queue& on) {
+        const dispatch::block<void(vox_object_t)> handler(
+            [&replies](vox_object_t reply) { replies.add(reply); });
+        vox_connection_send_message_with_reply(connection_, message, &on, &handler);
+    }
+    void request(vox_object_t message, Inbox& replies) { request(message, replies, queue); }
+    // Whether a request is answered.
+    [[nodiscard]] bool works() {
+        Inbox replies;
+        request(message(42), replies);
+        return replies.wait(1) && replies.numbers() == Numbers{42};
+    }
+    [[nodiscard]] vox_statistics_t counts() const {
+        vox_statistics_t counts;
+        vox_connection_get_statistics(connection_, &counts);
+        return counts;
+    }
+
+    dispatch::queue queue = dispatch::queue::create("end");
+    Inbox inbox;
 
   private:
-    static std::mutex& lock() {
-        static std::mutex shared;
-        return shared;
-    }
-    static std::vector<std::string>& lines() {
-        static std::vector<std::string> shared;
-        return shared;
-    }
+    const Ref connection_;
+    bool resumed_ = false;
+    Event ended_;
 };
-
-// A fresh runtime directory for this process.
-class RuntimeDirectory {
-  public:
-    RuntimeDirectory() {
-        std::string pattern =
-            (std::filesystem::temp_directory_path() / "pelorin-vox-XXXXXX").string();
-        if (::mkdtemp(pattern.data()))
-            path_ = pattern;
-        use(path_);
-    }
-    ~RuntimeDirectory() {
-        std::error_code ignored;
-        std::filesystem::remove_all(path_, ignored);
-    }
-    RuntimeDirectory(const RuntimeDirectory&) = delete;
-    RuntimeDirectory& operator=(const RuntimeDirectory&) = delete;
-    [[nodiscard]] const std::string& path() const { return path_; }
-    static void use(const std::string& directory) {
-        ::setenv("VOX_RUNTIME_DIR", directory.c_str(), 1);  // NOLINT(concurrency-mt-unsafe)
-    }
-
-  private:
-    std::string path_;
-};
-
-// Whether `condition` came true in time: for what no event tells.
-template <class Condition>
-[[nodiscard]] bool eventually(Condition condition) {
-    const auto end = std::chrono::steady_clock::now() + kBound;
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > end)
-            return false;
-        ::usleep(1000);
-    }
-    return true;
-}
-
-// Descriptors that this process has open.
-inline std::size_t openDescriptors() {
-    std::size_t count = 0;
-    for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
-        static_cast<void>(entry);
-        ++count;
-    }
-    return count;
-}
 
 }  // namespace plr::test

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <chrono>
 #include <semaphore>
@@ -26,6 +27,18 @@ class Event {
 // Everything submitted to `queue` before has run.
 inline void drain(const dispatch::queue& queue) {
     queue.sync([] {});
+}
+
+// Whether `condition` came true in time: for what no event tells.
+template <class Condition>
+[[nodiscard]] bool eventually(Condition condition) {
+    const auto end = std::chrono::steady_clock::now() + kBound;
+    while (!condition()) {
+        if (std::chrono::steady_clock::now() > end)
+            return false;
+        ::usleep(1000);
+    }
+    return true;
 }
 
 }  // namespace plr::test
