@@ -1,7 +1,6 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
-#include <memory>
 #include <optional>
 #include <thread>
 #include <vector>
@@ -89,19 +88,6 @@ TEST(Group, SessionsLeaveWithTheirLastCopy) {
     EXPECT_NE(work.wait(dispatch::immediately), 0);
     copy.reset();
     EXPECT_EQ(work.wait(dispatch::immediately), 0);
-}
-
-TEST(Group, AsyncIsAMemberUntilItsClosureIsDestroyed) {
-    const auto serial = queue::create("serial");
-    const group work;
-    std::atomic<int> destroyed{0};
-    for (int i = 0; i < 100; ++i)
-        work.async(serial, [held = std::shared_ptr<void>(nullptr,
-                                                         [&destroyed](void*) { ++destroyed; })] {});
-    EXPECT_EQ(work.wait(dispatch::time::after(plr::test::kBound)), 0);
-    EXPECT_GE(destroyed, 99);  // the session of the last may go just before its closure
-    drain(serial);
-    EXPECT_EQ(destroyed, 100);
 }
 
 TEST(Group, WorkersMayWaitForWorkThatIsQueued) {

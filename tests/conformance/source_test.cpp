@@ -31,27 +31,6 @@ struct Pair {
     int ends[2];
 };
 
-TEST(TimerSource, FiresOnceNotBeforeItsTimeOnEitherClock) {
-    const auto serial = queue::create("serial");
-    for (const auto on : {dispatch::clock::monotonic, dispatch::clock::wall}) {
-        const auto timer = source::timer(serial);
-        Event fired;
-        std::atomic<int> count{0};
-        const auto due = dispatch::time::after(3ms, on);
-        timer.set_event_handler(block<void()>([&] {
-            EXPECT_GE(dispatch::time::now(on).nanoseconds(), due.nanoseconds());
-            ++count;
-            fired.signal();
-        }));
-        timer.set_timer(due, dispatch::kOnce);
-        timer.resume();
-        EXPECT_TRUE(fired.wait());
-        timer.cancel();
-        drain(serial);
-        EXPECT_EQ(count, 1);
-    }
-}
-
 TEST(TimerSource, PeriodsAddUpWithoutDrift) {
     const auto serial = queue::create("serial");
     const auto timer = source::timer(serial);

@@ -14,10 +14,13 @@ namespace {
 using namespace plr::test;
 using Texts = std::vector<std::string>;
 
-vox::dict message(const char* text) {
+vox::dict message(const std::string& text) {
     const vox::dict made = vox::dict::create();
-    made["text"] = vox::string(std::string_view(text));
+    made["text"] = vox::string(text);
     return made;
+}
+std::string textOf(const vox::object& message) {
+    return std::string(vox::object(vox::dict(message)["text"]).text());
 }
 
 // A server that remembers what it is told and echoes requests.
@@ -39,52 +42,64 @@ class EchoServer : public plr::VoxServer {
             startListener_sync();
         });
     }
-    [[nodiscard]] const dispatch::queue& queue() const { return ownQueue_.queue(); }
-
     // All on the queue only, the events apart.
     bool refuses = false;
     Texts heard;
-    int clientErrors = 0;
     int listenerErrors = 0;
     Event clientError;
     Event listenerError;
+    const dispatch::queue& queue = ownQueue_.queue();
 
   protected:
     void handleListenerErrorImpl(vox::object) override {
         ++listenerErrors;
         listenerError.signal();
     }
+    void handleClientErrorImpl(vox::connection, vox::object) override { clientError.signal(); }
     MessageHandler newClientHandlerImpl(vox::connection) override {
         if (refuses)
             return nullptr;
         return MessageHandler([this](const vox::connection& client, const vox::dict& received) {
-            heard.emplace_back(vox::object(received["text"]).text());
-            if (const vox::dict reply =
-                    vox::object::adopt(vox_dictionary_create_reply(received.get()))) {
-                reply["text"] = received["text"];
-                client.send_message(reply);
-            }
+            heard.push_back(textOf(received));
+            if (vox::dict reply = vox::object::adopt(vox_dictionary_create_reply(received.get())))
+                answer(client, std::move(reply));
         });
-    }
-    void handleClientErrorImpl(vox::connection, vox::object) override {
-        ++clientErrors;
-        clientError.signal();
     }
 
   private:
     explicit EchoServer(vox::connection listener) : VoxServer("echo", std::move(listener)) {}
+
+    // An auto_reply in each of its forms sends it, once that is gone.
+    void answer(const vox::connection& client, vox::dict reply) {
+        reply["text"] = vox::string(heard.back());
+        if (heard.back() == "to its own connection") {
+            vox::auto_reply owner(reply);
+            vox::auto_reply moved(std::move(owner));
+            EXPECT_EQ(moved.get().get(), reply.get());
+        } else if (heard.back() == "to a given one") {
+            const vox::auto_reply owner(reply, client);
+        } else {
+            // The holder starts with a dictionary that cannot be sent anywhere.
+            vox::auto_reply owner(vox::dict::create());
+            owner.connect(std::move(reply));
+            EXPECT_FALSE(reply);  // NOLINT(bugprone-use-after-move): so it says
+        }
+    }
 };
 
 class RememberingClient : public plr::VoxClient {
   public:
     template <class... Queue>
-    static std::shared_ptr<RememberingClient> create(const Queue&... queue) {
-        return make_shared_ptr(new RememberingClient(queue...));
+    static std::shared_ptr<RememberingClient> create(const Queue&... given) {
+        return make_shared_ptr(new RememberingClient(given...));
     }
-    // Runs on the client's queue.
+    // Runs with the connection to the server on the client's queue.
     template <class Callable>
     auto on(Callable&& work) {
-        return execute_wrapped_sync([&] { return work(*this); });
+        return execute_wrapped_sync([&] {
+            ownQueue_.assertCurrent();
+            return work(helper_sync());
+        });
     }
     void setServer(const vox::connection& server) {
         execute_wrapped_sync([&] {
@@ -92,24 +107,29 @@ class RememberingClient : public plr::VoxClient {
             setServer_sync(server);
         });
     }
-    void flush(const dispatch::group& group) {
-        execute_wrapped_sync([&] {
-            ownQueue_.assertCurrent();
-            helper_sync().flush(group);
-        });
+    void send(const std::string& text) {
+        on([&](auto& helper) { helper.getServer().send_message(message(text)); });
     }
-    void send(const vox::dict& sent) {
-        execute_wrapped_sync([&] {
-            ownQueue_.assertCurrent();
-            helper_sync().getServer().send_message(sent);
+    // The text that answers.
+    std::string ask(const std::string& text) {
+        Event answered;
+        std::string answer;
+        on([&](auto& helper) {
+            helper.getServer().send_message_with_reply(
+                message(text), dispatch::queue::global(),
+                dispatch::block<void(vox::object)>([&](const vox::object& reply) {
+                    answer = textOf(reply);
+                    answered.signal();
+                }));
         });
+        EXPECT_TRUE(answered.wait());
+        return answer;
     }
-    [[nodiscard]] const dispatch::queue& queue() const { return ownQueue_.queue(); }
 
-    Texts heard;     // on the queue only
-    int errors = 0;  // on the queue only
-    Event message;
+    Event told;
     Event error;
+    int errors = 0;  // on the queue only
+    const dispatch::queue& queue = ownQueue_.queue();
 
   protected:
     void handleServerErrorImpl(vox::object) override {
@@ -117,190 +137,107 @@ class RememberingClient : public plr::VoxClient {
         error.signal();
     }
     void handleMessageImpl(vox::dict received) override {
-        heard.emplace_back(vox::object(received["text"]).text());
-        message.signal();
+        EXPECT_EQ(textOf(received), "hello");
+        told.signal();
     }
 
   private:
     template <class... Queue>
-    explicit RememberingClient(const Queue&... queue) : VoxClient("remembering", queue...) {}
+    explicit RememberingClient(const Queue&... given) : VoxClient("remembering", given...) {}
 };
 
-// One end of a connection, by hand: remembers messages and its end.
-struct Peer {
-    explicit Peer(vox::connection started) : connection(std::move(started)) {
-        connection.set_event_handler([this](const vox::object& event) {
-            if (event.type() == VOX_TYPE_ERROR)
-                return ended.signal();
-            heard.emplace_back(vox::object(vox::dict(event)["text"]).text());
-        });
-        connection.set_target_queue(queue);
-        connection.resume();
-    }
-    ~Peer() {
-        connection.cancel();
-        EXPECT_TRUE(waitForEnd());
-    }
-    bool waitForEnd() { return hasEnded || (hasEnded = ended.wait()); }
-    // The text that answers.
-    std::string ask(const char* text) {
-        Event answered;
-        std::string answer;
-        connection.send_message_with_reply(
-            message(text), queue, dispatch::block<void(vox::object)>([&](const vox::object& reply) {
-                answer = vox::object(vox::dict(reply)["text"]).text();
-                answered.signal();
-            }));
-        EXPECT_TRUE(answered.wait());
-        return answer;
-    }
-    const dispatch::queue queue = dispatch::queue::create("peer");
-    const vox::connection connection;
-    Texts heard;  // on the queue only
-    Event ended;
-    bool hasEnded = false;
-};
-
-TEST(VoxServer, HandsMessagesToTheHandlersThatItsClientsGet) {
-    const auto listener = vox::connection::create_anonymous_listener();
-    const auto connect = [&] { return vox::endpoint::create(listener).connect(); };
-    auto server = EchoServer::create(listener);
-    const dispatch::queue queue = server->queue();
-    {
-        Peer client(connect());
-        client.connection.send_message(message("one"));
-        EXPECT_EQ(client.ask("two"), "two");
-        EXPECT_EQ(Peer(connect()).ask("three"), "three");
-        EXPECT_TRUE(server->clientError.wait());
-        queue.sync([&] { server->refuses = true; });
-        Peer refused(connect());
-        refused.connection.send_message(message("lost"));
-        EXPECT_TRUE(refused.waitForEnd());
-        EXPECT_EQ(client.ask("four"), "four");
-        queue.sync([&] {
-            EXPECT_EQ(server->heard, (Texts{"one", "two", "three", "four"}));
-            EXPECT_EQ(server->clientErrors, 1);
-        });
-        // It cancels its listener and hears nothing once it is gone.
-        server.reset();
-        drain(queue);
-        client.connection.send_message(message("to nobody"));
-        Peer late(connect());
-        EXPECT_TRUE(late.waitForEnd());
-    }
-}
-
-TEST(VoxServer, HearsOfItsPresentListenersErrorsOnly) {
-    const auto server = EchoServer::create(vox::connection::create_anonymous_listener());
-    const auto next = vox::connection::create_anonymous_listener();
-    server->listenAt(next);
-    EXPECT_EQ(Peer(vox::endpoint::create(next).connect()).ask("through it"), "through it");
-    next.cancel();
-    EXPECT_TRUE(server->listenerError.wait());
-    EXPECT_EQ(server->queue().sync([&] { return server->listenerErrors; }), 1);
-    server->listenAt(vox::connection());  // none any more
-}
-
-// A client and the other end of its connection.
-class Client : public testing::Test {
+class Endpoints : public testing::Test {
   protected:
-    Client() { connect(); }
-    void connect() {
-        auto [mine, theirs] = vox::connection::create_pair();
-        mine_ = mine;
-        client_->setServer(mine);
-        peer_ = std::make_unique<Peer>(theirs);
+    ~Endpoints() override {
+        const dispatch::queue ending = client_->queue;
+        client_.reset();
+        drain(ending);
+        server_.reset();
+    }
+    static vox::connection anonymous() { return vox::connection::create_anonymous_listener(); }
+    [[nodiscard]] vox::connection connect() const {
+        return vox::endpoint::create(listener_).connect();
     }
     int errors() {
-        return client_->on([](RememberingClient& self) { return self.errors; });
+        return client_->queue.sync([this] { return client_->errors; });
     }
 
+    const dispatch::queue queue_ = dispatch::queue::create("given");
+    const vox::connection listener_ = anonymous();
+    std::shared_ptr<EchoServer> server_ = EchoServer::create(listener_);
     std::shared_ptr<RememberingClient> client_ = RememberingClient::create();
-    vox::connection mine_;
-    std::unique_ptr<Peer> peer_;
 };
 
-TEST_F(Client, HearsOfItsPresentConnectionOnly) {
-    const auto first = std::move(peer_);
-    connect();
-    EXPECT_TRUE(first->waitForEnd());
-    peer_->connection.send_message(message("new"));
-    EXPECT_TRUE(client_->message.wait());
-    EXPECT_EQ(client_->on([](RememberingClient& self) { return self.heard; }), (Texts{"new"}));
+TEST_F(Endpoints, TalkToEachOther) {
+    client_->setServer(connect());
+    client_->send("one");
+    const Texts asked = {"to its own connection", "to a given one", "to a connected one"};
+    for (const std::string& text : asked)
+        EXPECT_EQ(client_->ask(text), text);
+    const auto other = RememberingClient::create(queue_);
+    EXPECT_EQ(other->queue, queue_);
+    other->setServer(connect());
+    for (int i = 0; i < 1000; ++i)
+        other->send(std::to_string(i));
+    const dispatch::group sent;
+    other->on([&](auto& helper) { helper.flush(sent); });
+    EXPECT_EQ(sent.wait(), 0);
+    other->send("last");
+    other->setServer(nullptr);  // sends what waits
+    other->on([&](auto& helper) { helper.flush(sent); });
+    EXPECT_EQ(sent.wait(dispatch::immediately), 0) << "nothing to wait for without a connection";
+    EXPECT_TRUE(server_->clientError.wait());
+    server_->queue.sync([this] {
+        EXPECT_EQ(server_->heard.size(), 1 + 3 + 1000 + 1U);
+        EXPECT_EQ(server_->heard.back(), "last");
+    });
     EXPECT_EQ(errors(), 0);
-    peer_.reset();
+}
+
+TEST_F(Endpoints, OfARefusedOrEndedServerAreTold) {
+    server_->queue.sync([this] { server_->refuses = true; });
+    client_->setServer(connect());
+    client_->send("lost");
     EXPECT_TRUE(client_->error.wait());
-    EXPECT_EQ(errors(), 1);
+    server_->queue.sync([this] {
+        EXPECT_EQ(server_->heard, Texts());
+        server_->refuses = false;
+    });
+    client_->setServer(connect());
+    EXPECT_EQ(client_->ask("here"), "here");
+    const dispatch::queue queue = server_->queue;
+    server_.reset();  // cancels its listener, and hears nothing more
+    drain(queue);
+    client_->send("to nobody");
+    client_->setServer(connect());
+    EXPECT_TRUE(client_->error.wait());
+    EXPECT_EQ(errors(), 2);
 }
 
-TEST_F(Client, SendsWhatWaitsBeforeItFlushesOrDisconnects) {
-    const dispatch::group group;
-    Texts expected;
-    for (int i = 0; i < 1000; ++i) {
-        expected.push_back(std::to_string(i));
-        client_->send(message(expected.back().c_str()));
-        if (i == 100) {
-            client_->flush(group);
-            EXPECT_EQ(group.wait(), 0);
-            EXPECT_EQ(mine_.statistics().messages_sent, 101U);
-        }
-    }
-    client_->setServer(nullptr);
-    EXPECT_TRUE(peer_->waitForEnd());
-    EXPECT_EQ(peer_->queue.sync([this] { return peer_->heard; }), expected);
-    EXPECT_EQ(errors(), 0) << "its own doing is no error of the server";
-    client_->flush(group);
-    EXPECT_EQ(group.wait(dispatch::immediately), 0) << "nothing to wait for without a connection";
-}
+TEST_F(Endpoints, HearOfTheirPresentConnectionsOnly) {
+    const auto next = anonymous();
+    server_->listenAt(next);
+    client_->setServer(vox::endpoint::create(next).connect());
+    EXPECT_EQ(client_->ask("through it"), "through it");
+    next.cancel();
+    EXPECT_TRUE(server_->listenerError.wait());
+    EXPECT_EQ(server_->queue.sync([this] { return server_->listenerErrors; }), 1);
+    server_->listenAt(vox::connection());  // none any more
 
-TEST_F(Client, DropsWhatArrivesOnceItIsGone) {
-    const dispatch::queue queue = client_->queue();
+    auto [mine, theirs] = vox::connection::create_pair();
+    client_->setServer(mine);
+    theirs.resume();
+    theirs.send_message(message("hello"));
+    EXPECT_TRUE(client_->told.wait());
+    EXPECT_EQ(errors(), 0);
+    // What arrives once it is gone is dropped.
+    const dispatch::queue queue = client_->queue;
     Event go;
     queue.async([&go] { EXPECT_TRUE(go.wait()); });
-    peer_->connection.send_message(message("too late"));
-    client_.reset();
+    theirs.send_message(message("too late"));
+    client_ = RememberingClient::create();
     go.signal();
-    EXPECT_TRUE(peer_->waitForEnd());
     drain(queue);
-    EXPECT_EQ(RememberingClient::create(queue)->queue(), queue) << "it may run on a given one";
-}
-
-// Requests are answered with what `answer` makes of an empty reply.
-std::string askThrough(
-    const dispatch::block<void(const vox::connection&, const vox::dict&)>& answer) {
-    auto [mine, theirs] = vox::connection::create_pair();
-    const auto queue = dispatch::queue::create("answering");
-    theirs.set_event_handler([connection = theirs, answer](const vox::object& event) {
-        const vox::dict request(event);
-        const vox::dict reply = vox::object::adopt(vox_dictionary_create_reply(request.get()));
-        if (reply)
-            answer(connection, reply);
-    });
-    theirs.set_target_queue(queue);
-    theirs.resume();
-    return Peer(mine).ask("?");
-}
-
-TEST(AutoReply, IsSentOnceItsOwnerGoes) {
-    using Answer = dispatch::block<void(const vox::connection&, const vox::dict&)>;
-    EXPECT_EQ(askThrough(Answer([](const vox::connection&, const vox::dict& reply) {
-                  vox::auto_reply owner(reply);
-                  vox::auto_reply moved(std::move(owner));
-                  moved.get()["text"] = vox::string("remote");
-              })),
-              "remote");
-    EXPECT_EQ(askThrough(Answer([](const vox::connection& to, const vox::dict& reply) {
-                  vox::auto_reply(reply, to).get()["text"] = vox::string("given");
-              })),
-              "given");
-    EXPECT_EQ(askThrough(Answer([](const vox::connection&, vox::dict reply) {
-                  // The holder starts with a dictionary that cannot be sent anywhere.
-                  vox::auto_reply owner(vox::dict::create());
-                  reply["text"] = vox::string("connected");
-                  owner.connect(std::move(reply));
-                  EXPECT_FALSE(reply);  // NOLINT(bugprone-use-after-move): so it says
-              })),
-              "connected");
 }
 
 TEST(AutoReply, WithoutAHolderOrADictionarySendsNothing) {

@@ -65,6 +65,7 @@ TEST(DynCastOrDefault, ReadsStringsAndDataByTheirLength) {
     EXPECT_EQ(vox::dyn_cast_or_default(vox::string(text), std::string("x")), text);
     EXPECT_EQ(vox::dyn_cast_or_default(vox::string(text), "x"), text);
     EXPECT_EQ(vox::dyn_cast_or_default(vox::int64(1), "x"), "x");
+    EXPECT_EQ(vox::dyn_cast_or_default(vox::object(), std::string("x")), "x");
     const std::vector<std::uint8_t> bytes{0, 1, 255};
     const std::vector<std::uint8_t> fallback{7};
     EXPECT_EQ(vox::dyn_cast_or_default(vox::data(bytes), fallback), bytes);

@@ -1,8 +1,8 @@
 """Holds the Python client's values and frames against docs/wire-protocol.md."""
 
-import math
 import pathlib
 import sys
+import time
 import unittest
 import uuid
 
@@ -17,47 +17,41 @@ PAGE = (ROOT / "docs" / "wire-protocol.md").read_text(encoding="utf-8")
 
 
 def quoted(text):
-    return '"' + "".join(f"\\x{ord(c):02x}" if ord(c) < 32 else c for c in text) + '"'
+    return '"' + text.replace("\x00", "\\x00") + '"'
 
 
 def date(nanoseconds):
     """Written without the datetime module, which knows no nanoseconds."""
-    import time
     seconds, part = divmod(nanoseconds, 10**9)
     return time.strftime("%Y-%m-%dT%H:%M:%S", time.gmtime(seconds)) + f".{part:09}Z"
 
 
+def error(value):
+    return f"<error {value.code}{': ' + quoted(value.description) if value.description else ''}>"
+
+
+# By type, the description that our logs give.
+DESCRIBE = {
+    type(None): lambda _: "null",
+    bool: lambda value: str(value).lower(),
+    Uint64: lambda value: f"{int(value)}u",
+    int: str,
+    float: lambda value: f"{value:.17g}",
+    Date: lambda value: date(value.nanoseconds),
+    bytes: lambda value: f"<{len(value)} bytes{''.join(f' {b:02x}' for b in value)}>",
+    str: quoted,
+    uuid.UUID: str,
+    Error: error,
+    Fd: lambda _: "<fd>",
+    Endpoint: lambda _: "<endpoint>",
+    list: lambda value: "[" + ", ".join(map(describe, value)) + "]",
+    dict: lambda value:
+        "{" + ", ".join(f"{quoted(k)}: {describe(v)}" for k, v in value.items()) + "}",
+}
+
+
 def describe(value):
-    """The description our logs give, from the client's own types."""
-    match value:
-        case None | bool():
-            return {None: "null", True: "true", False: "false"}[value]
-        case Uint64():
-            return f"{int(value)}u"
-        case int():
-            return str(value)
-        case float():
-            return f"{value:.17g}"
-        case Date():
-            return date(value.nanoseconds)
-        case bytes():
-            return f"<{len(value)} bytes{''.join(f' {b:02x}' for b in value)}>"
-        case str():
-            return quoted(value)
-        case uuid.UUID():
-            return str(value)
-        case Error():
-            text = "" if value.description is None else ": " + quoted(value.description)
-            return f"<error {value.code}{text}>"
-        case Fd():
-            return "<fd>"
-        case Endpoint():
-            return "<endpoint>"
-        case list():
-            return "[" + ", ".join(map(describe, value)) + "]"
-        case dict():
-            return "{" + ", ".join(f"{quoted(k)}: {describe(v)}" for k, v in value.items()) + "}"
-    raise TypeError(value)
+    return DESCRIBE[type(value)](value)
 
 
 class WireProtocolPage(unittest.TestCase):
@@ -87,16 +81,6 @@ class WireProtocolPage(unittest.TestCase):
                 value = vox_client.decode(body, [100])
                 again, _ = vox_client.frame(kind, value, request_id, flags)
                 self.assertEqual(again.hex(), data.hex())
-
-    def test_what_has_no_encoding(self):
-        for value, error in ((1 << 63, ValueError), (Uint64(-1), ValueError),
-                             (Uint64(1 << 64), ValueError), (object(), TypeError)):
-            with self.subTest(value=value), self.assertRaises(error):
-                vox_client.encode([value])
-
-    def test_doubles_keep_their_kind(self):
-        for value in (0.0, 1.0, math.inf, -math.inf, 1e308):
-            self.assertIsInstance(vox_client.decode(vox_client.encode(value)[0]), float)
 
 
 if __name__ == "__main__":

@@ -3,7 +3,6 @@
 #include <unistd.h>
 
 #include <cmath>
-#include <thread>
 
 #include "support/vox_values.h"
 
@@ -159,20 +158,6 @@ TEST(VoxDictionary, AMillionKeysAreNoTrouble) {
 
 // ---- Lifetime -------------------------------------------------------------------
 
-TEST(VoxValue, ContainersHoldWhatIsPutIntoThemAndNoLonger) {
-    const std::size_t before = openDescriptors();
-    Ref fd(vox_fd_create(STDIN_FILENO));
-    Ref list = array({fd, fd});
-    const Ref outer = dictionary({{"list", list}, {"fd", fd}});
-    fd = Ref();
-    vox_dictionary_set_value(outer, "list", vox_null_create());
-    vox_dictionary_set_value(outer, "fd", nullptr);
-    vox_array_set_value(list, 0, nullptr);
-    EXPECT_EQ(openDescriptors(), before + 1) << "the second element still holds it";
-    vox_array_set_value(list, 1, nullptr);
-    EXPECT_EQ(openDescriptors(), before);
-}
-
 TEST(VoxValue, AValueMayReplaceItself) {
     const Ref list = array({number(1)});
     vox_array_set_value(list, 0, vox_array_get_value(list, 0));
@@ -191,22 +176,6 @@ TEST(VoxValue, DepthCostsNoStack) {
     };
     EXPECT_NE(description(chain(Ref(vox_fd_create(STDIN_FILENO)))).find("…"), std::string::npos);
     EXPECT_FALSE(vox_equal(array({chain(number(1))}), array({number(1)})));
-    EXPECT_EQ(openDescriptors(), before);
-}
-
-TEST(VoxValue, ManyThreadsMayHoldOneValue) {
-    const std::size_t before = openDescriptors();
-    Ref shared = array({Ref(vox_fd_create(STDIN_FILENO)), text("text")});
-    std::vector<std::thread> threads;
-    for (int i = 0; i < 4; i++)
-        threads.emplace_back([mine = shared] {
-            for (int round = 0; round < 20000; round++)
-                ASSERT_EQ(description(Ref::retain(vox_array_get_value(Ref(mine), 1))), "\"text\"");
-        });
-    shared = Ref();
-    for (std::thread& thread : threads)
-        thread.join();
-    threads.clear();
     EXPECT_EQ(openDescriptors(), before);
 }
 

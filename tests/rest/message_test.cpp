@@ -110,7 +110,7 @@ TEST(AutoReply, InnerOnesFillTheOuterOnesDictionary) {
 // ---- Values in messages -------------------------------------------------------------
 
 TEST(EnumString, IsANumberAndAName) {
-    EXPECT_EQ(detail::write_enum_string_value(-2LL, "kLost").text(), "-2:kLost");
+    EXPECT_EQ(detail::write_enum_string_value(-2LL, std::string("kLost")).text(), "-2:kLost");
     EXPECT_EQ(detail::write_enum_string_value(~0ULL, std::string("kAll")).text(),
               "18446744073709551615:kAll");
 }

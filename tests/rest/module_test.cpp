@@ -179,6 +179,7 @@ TEST_F(Module, DropsWhatItDoesNotKnow) {
         server_->message(Operation::kNotify, "/unknown"),
         server_->message(Operation::kNotify, "/p/"),
         server_->message(Operation::kNotify, ""),
+        server_->message(Operation::kGet, ""),
         server_->message(Operation::kGet, "/p"),
         server_->message(Operation::kSet, "/p"),
         server_->message(Operation::kPush, "/r"),

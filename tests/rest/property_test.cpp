@@ -142,14 +142,9 @@ TEST_F(Property, GivesPartsOfItsValue) {
         const char* expected;
     } rows[] = {
         {"/kept/x@k", "[0: 5]"},
-        {"/kept/x@k.1", "null"},
         {"/kept/x@k.word", "null"},  // the conversion throws
-        {"/kept/x@k.", "null"},
         {"/kept/x@k.99999999999999999999999", "null"},
-        {"/kept/x@z", "null"},
-        {"/kept/x@k@0", "null"},
         {"/kept/new@k", "null"},
-        {"/kept/@k", "null"},
         {"/events/x@k", "null"},
         {"/events/x", "null"},
         {"/events/*", R"({"x": null})"},

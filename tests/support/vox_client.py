@@ -186,7 +186,6 @@ class Connection:
         self._descriptors = collections.deque()  # arrived, not yet part of a frame
         self._messages = collections.deque()  # (message, request id or None)
         self._replies = {}
-        self._pongs = set()
         self._last_id = 0
         self._socket.settimeout(timeout)
         self._write(HELLO, LIMITS)
@@ -232,24 +231,12 @@ class Connection:
             self._handle_frame(deadline)
         return self._replies.pop(self._last_id)
 
-    def reply(self, request_id, message):
-        self._write(REPLY, message, request_id)
-
     def receive(self):
         """The next message and its request id, None when it wants no reply."""
         deadline = time.monotonic() + self.timeout
         while not self._messages:
             self._handle_frame(deadline)
         return self._messages.popleft()
-
-    def ping(self):
-        """Returns once the peer has read all that was sent before."""
-        self._last_id += 1
-        self._write(PING, None, self._last_id, PING_WANTS_ANSWER)
-        deadline = time.monotonic() + self.timeout
-        while self._last_id not in self._pongs:
-            self._handle_frame(deadline)
-        self._pongs.remove(self._last_id)
 
     def _write(self, kind, value, request_id=0, flags=0):
         data, descriptors = frame(kind, value, request_id, flags)
@@ -268,11 +255,9 @@ class Connection:
             self._replies[request_id] = value
         elif kind == PING and flags & PING_WANTS_ANSWER:
             self._write(PING, None, request_id)
-        elif kind == PING:
-            self._pongs.add(request_id)
         elif kind == DROPPED:
             self.dropped += value
-        elif kind != CANCEL:  # who asked gave up; an answer would be thrown away
+        elif kind not in (PING, CANCEL):  # who asked gave up; an answer would be thrown away
             raise ProtocolError(f"a frame of type {kind}")
 
     def _read_frame(self, deadline):
