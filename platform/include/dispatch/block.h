@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "plr/base/assert.h"
+#include "plr/base/export.h"
 
 // A block is a copyable, nullable closure whose copies share one heap object.
 //
@@ -14,12 +15,28 @@
 //          on the thread that drops it.
 // Threads: copies may be taken, called and dropped on any threads at once; the
 //          callable sees concurrent calls only if its callers make them.
-// Cost:    one allocation when made from a callable, one atomic count a copy.
+// Cost:    one allocation when made from a callable, recycled memory for small
+//          ones; one atomic count a copy.
 //
 // Construction from a callable is explicit, so that overloads taking
 // std::function and overloads taking a block never collide on a lambda.
 // An exception that leaves the callable ends the process.
 namespace dispatch {
+
+namespace detail {
+
+// Recycled memory of kSmallBlock bytes, aligned to 16. Throws std::bad_alloc.
+inline constexpr std::size_t kSmallBlock = 64;
+[[nodiscard]] PLR_EXPORT void* allocate_small();
+PLR_EXPORT void recycle_small(void* unused) noexcept;
+
+struct from_store {
+    static void* operator new(std::size_t) { return allocate_small(); }
+    static void operator delete(void* memory) noexcept { recycle_small(memory); }
+};
+struct from_heap {};
+
+}  // namespace detail
 
 template <class Signature>
 class block;
@@ -73,7 +90,13 @@ class block<Result(Arguments...)> {
 
   private:
     template <class Callable>
-    struct holder : body {
+    static constexpr bool kSmall =
+        alignof(Callable) <= 16 &&
+        (sizeof(body) + 15) / 16 * 16 + sizeof(Callable) <= detail::kSmallBlock;
+
+    template <class Callable>
+    struct holder : body,
+                    std::conditional_t<kSmall<Callable>, detail::from_store, detail::from_heap> {
         template <class Source>
         explicit holder(Source&& source) : callable(std::forward<Source>(source)) {
             this->call = [](body* self, Arguments... arguments) noexcept -> Result {
@@ -91,7 +114,11 @@ class block<Result(Arguments...)> {
         return shared;
     }
     static void release(body* shared) noexcept {
-        if (shared && shared->references.fetch_sub(1, std::memory_order_acq_rel) == 1)
+        if (!shared)
+            return;
+        // The only holder has no rival: nothing to write.
+        if (shared->references.load(std::memory_order_acquire) == 1 ||
+            shared->references.fetch_sub(1, std::memory_order_acq_rel) == 1)
             shared->destroy(shared);
     }
 

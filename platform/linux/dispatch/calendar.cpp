@@ -32,7 +32,8 @@ calendar::reader calendar::replace(reader replacement) noexcept {
 }
 
 void calendar::was_set() noexcept {
-    detail::poller::shared().timers().expire(clock::wall);
+    while (detail::poller::shared().timers().expire(clock::wall)) {
+    }
 }
 
 }  // namespace dispatch

@@ -1,6 +1,7 @@
 #include <array>
 #include <atomic>
 #include <cstdint>
+#include <new>
 
 #include "dispatch/queue.h"
 #include "src/base/magazines.h"
@@ -50,6 +51,16 @@ void recycle_item(closure_item* unused) noexcept {
         store::give(unused);
     else
         delete unused;
+}
+
+// A block is never an item: the node's bytes are all there is to it.
+void* allocate_small() {
+    static_assert(sizeof(closure_item) == kSmallBlock);
+    return allocate_item();
+}
+
+void recycle_small(void* unused) noexcept {
+    recycle_item(::new (unused) closure_item);
 }
 
 }  // namespace dispatch::detail

@@ -133,7 +133,7 @@ queue_core::~queue_core() {
 }
 
 void queue_core::release() noexcept {
-    if (handles_.fetch_sub(1, std::memory_order_acq_rel) != 1 || global_)
+    if (global_ || handles_.fetch_sub(1, std::memory_order_acq_rel) != 1)
         return;
     if (suspension_.load(std::memory_order_acquire) >= kSuspension)
         stop("the last handle of a suspended queue went");

@@ -75,7 +75,11 @@ class queue_core {
     static queue_core* create(std::string_view label, queue_core* target);
     static queue_core* global(priority level) noexcept;
 
-    void retain() noexcept { handles_.fetch_add(1, std::memory_order_relaxed); }
+    // Global queues live for ever, and everybody shares them: they are not counted.
+    void retain() noexcept {
+        if (!global_)
+            handles_.fetch_add(1, std::memory_order_relaxed);
+    }
     void release() noexcept;
 
     void push(item* work) noexcept;

@@ -4,23 +4,44 @@
 #include <sys/epoll.h>
 #include <sys/stat.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
+#include <cstddef>
+#include <new>
 #include <system_error>
 
 #include "platform/linux/dispatch/poller.h"
 #include "platform/linux/dispatch/pool.h"
 #include "platform/linux/dispatch/queue_core.h"
 #include "platform/linux/dispatch/source_core.h"
+#include "src/base/magazines.h"
 
 namespace dispatch {
 namespace detail {
 namespace {
+
+struct timer_memory;
+
+// Recycled memory for timers, which come and go with each request that has a
+// time-out.
+struct timer_store {
+    static constexpr std::size_t kMagazine = 31;
+    static constexpr std::size_t kDepotMagazines = 64;
+
+    static void fill(std::array<timer_memory*, kMagazine>& places);
+    static void discard(timer_memory* memory) noexcept;
+};
+using timer_memories = plr::detail::Magazines<timer_memory, timer_store>;
 
 // The timer queue's lock guards its sources too: arming is one lock.
 class timer_source final : public source_core, timer_entry {
   public:
     explicit timer_source(const queue& on) noexcept
         : source_core(on, timers().lock()), timer_entry(&timer_source::fire) {}
+
+    static void* operator new(std::size_t size);
+    static void operator delete(void* memory) noexcept;
 
     void set_timer(time start, std::chrono::nanoseconds interval) override {
         scoped_lock guard(lock_);
@@ -53,6 +74,38 @@ class timer_source final : public source_core, timer_entry {
     time start_ PLR_GUARDED_BY(lock_) = forever;
     std::int64_t interval_ PLR_GUARDED_BY(lock_) = 0;  // nanoseconds; 0 for once
 };
+
+struct alignas(64) timer_memory {
+    std::byte bytes[sizeof(timer_source)];
+};
+
+void timer_store::fill(std::array<timer_memory*, kMagazine>& places) {
+    std::size_t made = 0;
+    try {
+        for (; made < kMagazine; ++made)
+            places[made] = new timer_memory;
+    } catch (const std::bad_alloc&) {
+        while (made > 0)
+            delete places[--made];
+        throw;
+    }
+}
+void timer_store::discard(timer_memory* memory) noexcept {
+    delete memory;
+}
+
+void* timer_source::operator new(std::size_t size) {
+    if constexpr (plr::detail::kRecycle)
+        return timer_memories::take();
+    else
+        return ::operator new(size);
+}
+void timer_source::operator delete(void* memory) noexcept {
+    if constexpr (plr::detail::kRecycle)
+        timer_memories::give(static_cast<timer_memory*>(memory));
+    else
+        ::operator delete(memory);
+}
 
 constinit spin_lock descriptor_lock;
 

@@ -19,6 +19,8 @@ constexpr clockid_t kClocks[] = {CLOCK_MONOTONIC, CLOCK_BOOTTIME, CLOCK_REALTIME
 
 // Fired before others get the lock.
 constexpr unsigned kBatch = 64;
+// Fired before their handlers get their turn.
+constexpr unsigned kTurn = 1024;
 
 // Of deadlines; what a period takes past it never comes.
 constexpr std::int64_t kLatest = (std::int64_t{1} << 62) - 1;
@@ -81,7 +83,9 @@ void timer_queue::disarm(timer_entry& entry) noexcept {
         of(entry.clock_).wheel.remove(entry);
 }
 
-void timer_queue::expire(clock on) noexcept {
+// At most kTurn at a time: their handlers then run while they are in the caches,
+// and the first of very many do not wait for the last.
+bool timer_queue::expire(clock on) noexcept {
     per_clock& clock = of(on);
     std::int64_t now;
     {
@@ -93,10 +97,12 @@ void timer_queue::expire(clock on) noexcept {
         now = time::now(on).nanoseconds();
         clock.wheel.set_back(now);
     }
-    while (fire_some(clock, now)) {
-    }
+    bool more = true;
+    for (unsigned fired = 0; more && fired < kTurn; fired += kBatch)
+        more = fire_some(clock, now);
     scoped_lock guard(lock_);
     set_descriptor(clock, on);
+    return more;
 }
 
 // Returns whether more may be due.

@@ -46,8 +46,9 @@ class timer_queue {
     void disarm(timer_entry& entry) noexcept PLR_REQUIRES(lock_);
 
     // Fires what is due: when the clock's descriptor is readable, or the clock
-    // was set. Any thread.
-    void expire(clock on) noexcept PLR_EXCLUDES(lock_);
+    // was set. Returns whether more may be due, for which the descriptor stays
+    // readable. Any thread.
+    bool expire(clock on) noexcept PLR_EXCLUDES(lock_);
 
   private:
     struct per_clock {
