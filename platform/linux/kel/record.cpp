@@ -107,11 +107,12 @@ std::string syslog_line(const record& message, const identity& sender) {
     std::tm local{};
     ::localtime_r(&message.when, &local);
     // Not strftime(): the names of the months are English in every locale.
-    static constexpr char kMonths[] = "JanFebMarAprMayJunJulAugSepOctNovDec";
+    static constexpr std::array<const char*, 12> kMonths = {
+        "Jan", "Feb", "Mar", "Apr", "May", "Jun", "Jul", "Aug", "Sep", "Oct", "Nov", "Dec"};
     char head[64];
-    std::snprintf(head, sizeof head, "<%d>%.3s %2d %02d:%02d:%02d ",
-                  facility << 3 | message.priority, kMonths + 3 * local.tm_mon, local.tm_mday,
-                  local.tm_hour, local.tm_min, local.tm_sec);
+    std::snprintf(head, sizeof head, "<%d>%s %2d %02d:%02d:%02d ", facility << 3 | message.priority,
+                  kMonths[static_cast<std::size_t>(local.tm_mon)], local.tm_mday, local.tm_hour,
+                  local.tm_min, local.tm_sec);
     std::string line = head + origin(sender);
     append_text(line, message);
     return line;
