@@ -50,7 +50,7 @@ def progress(text):
 def measure(measurement, rounds, run):
     """A list of values for each peer."""
     values = {peer: [] for peer in measurement.cells}
-    for number in range(rounds):
+    for number in range(min(rounds, measurement.most_rounds or rounds)):
         for peer, cell in measurement.cells.items():
             progress(f"{measurement.title}: round {number + 1}, {peer}")
             values[peer].append(float(run(number, cell)[cell.key]) * cell.scale)

@@ -33,6 +33,7 @@ class Measurement:
     bars: tuple = ()
     big_is_good: bool = False
     notes: dict = field(default_factory=dict)
+    most_rounds: int = 0  # where one round is enough; 0 for as many as asked
 
 
 OURS = "Pelorin"
@@ -48,6 +49,10 @@ ZEROMQ = "ZeroMQ"
 RELAY = "raw relay"
 RELAY_BATCHED = "raw relay, batched"
 MOSQUITTO = "mosquitto"
+LIBUV = "libuv"
+LIBEVENT = "libevent"
+ASIO_TIMERS = "Asio steady_timer"
+TIMER_SERVICE = "our timer service"
 SPDLOG = "spdlog"
 BOOST_LOG = "Boost.Log"
 LOG4CPLUS = "log4cplus"
@@ -140,4 +145,21 @@ def log():
     yield Measurement("log", "memory of a waiting message", "bytes", cells("bytes", "memory"))
 
 
-SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log}
+def timers():
+    programs = {OURS: "timers_pelorin", LIBUV: "timers_libuv", LIBEVENT: "timers_libevent", ASIO_TIMERS: "timers_asio"}
+
+    def cells(key, *arguments):
+        return {peer: Cell(program, arguments, key) for peer, program in programs.items()}
+
+    first = (Bar((LIBUV, LIBEVENT, ASIO_TIMERS), 1.0, "first"),)
+    for count in ("0", "100000"):
+        others = f"{int(count):,} waiting"
+        service = {TIMER_SERVICE: Cell("timers_pelorin", ("service", count), "ns")}
+        yield Measurement("timers", f"create + cancel, {others}", "ns", {**cells("ns", "life", count), **service}, first)
+        yield Measurement("timers", f"arm + disarm, {others}", "ns", cells("ns", "arm_disarm", count), first)
+    yield Measurement("timers", "fire 100,000", "ns", cells("ns", "fire"), first)
+    yield Measurement("timers", "drift of 10 ms in 60 s", "us", cells("us", "drift"),
+                      (Bar((), 1000.0, "under 1 ms"),), most_rounds=1)
+
+
+SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log, "timers": timers}
