@@ -29,8 +29,8 @@ struct timer_store {
     static constexpr std::size_t kMagazine = 31;
     static constexpr std::size_t kDepotMagazines = 64;
 
-    static void fill(std::array<timer_memory*, kMagazine>& places);
-    static void discard(timer_memory* memory) noexcept;
+    [[maybe_unused]] static void fill(std::array<timer_memory*, kMagazine>& places);
+    [[maybe_unused]] static void discard(timer_memory* memory) noexcept;
 };
 using timer_memories = plr::detail::Magazines<timer_memory, timer_store>;
 
