@@ -3,6 +3,7 @@
 #include <array>
 #include <cstddef>
 
+#include "plr/log/log_message_buffer.h"
 #include "src/base/magazines.h"
 
 namespace plr {
@@ -23,23 +24,17 @@ LogMessage::~LogMessage() = default;
 // the place of its shared_ptr's counts.
 class LogMessageStore {
   public:
-    [[nodiscard]] static std::shared_ptr<LogMessage> make(TimeStamp timeStamp, LogLevel level,
-                                                          const std::string& domain,
-                                                          std::string&& text,
-                                                          std::vector<std::string>&& metaData) {
+    // `fill` sets the fields of an empty message.
+    template <class Fill>
+    [[nodiscard]] static std::shared_ptr<LogMessage> make(Fill&& fill) {
         Record* const record = take();
-        LogMessage& message = record->message;
         try {
-            message.domain_ = domain;
+            fill(record->message);
         } catch (...) {
             give(record);
             throw;
         }
-        message.timeStamp_ = timeStamp;
-        message.level_ = level;
-        message.text_.swap(text);
-        message.metaData_.swap(metaData);
-        return {&message, Empty{}, Place<std::byte>{record}};
+        return {&record->message, Empty{}, Place<std::byte>{record}};
     }
 
   private:
@@ -116,11 +111,26 @@ class LogMessageStore {
     }
 };
 
+void LogMessage::takeFrom(LogMessageBuffer& buffer) {
+    metaData_.swap(buffer.metaData_);
+    if (buffer.stream_ || !buffer.text_.empty()) [[unlikely]] {
+        text_ = buffer.takeString();
+        return;
+    }
+    text_ = buffer.inPlace();
+    buffer.inPlaceLength_ = 0;
+}
+
 // Hot path: bench/log_cases.h.
 std::shared_ptr<LogMessage> LogMessage::create(TimeStamp timeStamp, LogLevel level,
-                                               const std::string& domain, std::string&& text,
-                                               std::vector<std::string>&& metaData) {
-    return LogMessageStore::make(timeStamp, level, domain, std::move(text), std::move(metaData));
+                                               const std::string& domain,
+                                               LogMessageBuffer&& buffer) {
+    return LogMessageStore::make([&](LogMessage& message) {
+        message.timeStamp_ = timeStamp;
+        message.level_ = level;
+        message.domain_ = domain;
+        message.takeFrom(buffer);
+    });
 }
 
 }  // namespace plr

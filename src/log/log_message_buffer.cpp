@@ -12,49 +12,41 @@ namespace {
 // Texts of up to this length are formatted in one pass.
 constexpr std::size_t kFirstAttempt = 64;
 
-// Texts start with room for this many bytes, and keep it for the thread's next
-// buffer unless they grew beyond the second.
-constexpr std::size_t kRoom = 128;
+// A used stream is kept for the thread's next buffer that needs one, unless its
+// text grew beyond this many bytes.
 constexpr std::size_t kKeptRoom = 1024;
 
-// What a thread's last buffer left for its next.
-struct Spares {
-    std::string text;
+struct Spare {
     std::unique_ptr<std::ostringstream> stream;
-    ~Spares();
+    ~Spare();
 };
-[[gnu::tls_model("initial-exec")]] thread_local constinit bool sparesEnded = false;
-[[gnu::tls_model("initial-exec")]] thread_local Spares spares;
-Spares::~Spares() {
-    sparesEnded = true;
+thread_local constinit bool spareEnded = false;
+thread_local Spare spare;
+Spare::~Spare() {
+    spareEnded = true;
 }
 
 std::unique_ptr<std::ostringstream> takeStream() {
-    if (sparesEnded || !spares.stream)
+    if (spareEnded || !spare.stream)
         return std::make_unique<std::ostringstream>();
-    return std::move(spares.stream);
+    return std::move(spare.stream);
 }
 
 // Leaves nothing that could be told from a new stream.
 void keepStream(std::unique_ptr<std::ostringstream> used) {
     static const std::ios pristine(nullptr);
     std::ios& base = *used;
-    if (sparesEnded || spares.stream || base.rdbuf() != used->rdbuf() ||
+    if (spareEnded || spare.stream || base.rdbuf() != used->rdbuf() ||
         used->view().size() > kKeptRoom)
         return;
     base.exceptions(std::ios_base::goodbit);
     base.clear();
     base.copyfmt(pristine);
     used->str({});
-    spares.stream = std::move(used);
+    spare.stream = std::move(used);
 }
 
 }  // namespace
-
-LogMessageBuffer::LogMessageBuffer() noexcept {
-    if (!sparesEnded)
-        text_.swap(spares.text);
-}
 
 LogMessageBuffer LogMessageBuffer::vCreateWithFormat(const char* format, va_list arguments) {
     LogMessageBuffer buffer;
@@ -85,8 +77,27 @@ LogMessageBuffer LogMessageBuffer::vprintf(const char* format, va_list arguments
     return vCreateWithFormat(format, arguments);
 }
 
-LogMessageBuffer::LogMessageBuffer(const LogMessageBuffer& other)
-    : text_(other.content()), metaData_(other.metaData_) {}
+LogMessageBuffer LogMessageBuffer::vCreateWithObFormat(ObString* format, va_list arguments) {
+    LogMessageBuffer buffer;
+    if (!format)
+        return buffer;
+    ObString* const text = ob_string_create_with_format_arguments(format, arguments);
+    buffer << text;
+    ob_release(text);
+    return buffer;
+}
+
+LogMessageBuffer LogMessageBuffer::createWithObFormat(ObString* format, ...) {
+    va_list arguments;
+    va_start(arguments, format);
+    LogMessageBuffer buffer = vCreateWithObFormat(format, arguments);
+    va_end(arguments);
+    return buffer;
+}
+
+LogMessageBuffer::LogMessageBuffer(const LogMessageBuffer& other) : metaData_(other.metaData_) {
+    appendContentOf(other);
+}
 
 LogMessageBuffer::LogMessageBuffer(LogMessageBuffer&& other) noexcept : LogMessageBuffer() {
     swap(other);
@@ -97,22 +108,14 @@ LogMessageBuffer& LogMessageBuffer::operator=(LogMessageBuffer other) noexcept {
     return *this;
 }
 
-LogMessageBuffer::~LogMessageBuffer() {
-    if (sparesEnded || text_.capacity() < kRoom || text_.capacity() > kKeptRoom)
-        return;
-    text_.clear();
-    spares.text.swap(text_);
-}
-
 void LogMessageBuffer::swap(LogMessageBuffer& other) noexcept {
     text_.swap(other.text_);
     stream_.swap(other.stream_);
     metaData_.swap(other.metaData_);
     std::swap(numbers_, other.numbers_);
-}
-
-std::string_view LogMessageBuffer::content() const noexcept {
-    return stream_ ? stream_->view() : std::string_view(text_);
+    std::swap_ranges(inPlace_, inPlace_ + std::max(inPlaceLength_, other.inPlaceLength_),
+                     other.inPlace_);
+    std::swap(inPlaceLength_, other.inPlaceLength_);
 }
 
 const std::string& LogMessageBuffer::str() {
@@ -120,8 +123,15 @@ const std::string& LogMessageBuffer::str() {
     if (stream_) {
         text_ = stream_->view();
         keepStream(std::move(stream_));
+    } else {
+        moveToText();
     }
     return text_;
+}
+
+void LogMessageBuffer::moveToText() {
+    text_.append(inPlace());
+    inPlaceLength_ = 0;
 }
 
 std::string&& LogMessageBuffer::takeString() {
@@ -138,6 +148,7 @@ std::ostream& LogMessageBuffer::makeStream() {
     made->imbue(std::locale());
     made->unsetf(std::ios_base::skipws);
     made->setf(std::ios_base::boolalpha);
+    moveToText();
     made->write(text_.data(), static_cast<std::streamsize>(text_.size()));
     stream_ = std::move(made);
     return *stream_;
@@ -147,25 +158,20 @@ LogMessageBuffer::operator std::ostream&() {
     return stream_ ? *stream_ : makeStream();
 }
 
-void LogMessageBuffer::append(std::string_view text) {
-    if (text_.capacity() < kRoom) [[unlikely]]
-        text_.reserve(std::max(kRoom, text_.size() + text.size()));
+void LogMessageBuffer::appendElsewhere(std::string_view text) {
+    if (stream_) {
+        stream_->write(text.data(), static_cast<std::streamsize>(text.size()));
+        return;
+    }
+    moveToText();
     text_.append(text);
 }
 
-void LogMessageBuffer::appendString(std::string_view text) {
-    if (stream_)
-        stream_->write(text.data(), static_cast<std::streamsize>(text.size()));
-    else
-        append(text);
-}
-
-void LogMessageBuffer::appendString(const char* text) {
-    appendString(std::string_view(text ? text : "(null)"));
-}
-
-void LogMessageBuffer::appendChar(char character) {
-    appendString(std::string_view(&character, 1));
+void LogMessageBuffer::appendContentOf(const LogMessageBuffer& other) {
+    if (other.stream_)
+        return appendString(other.stream_->view());
+    appendString(other.text_);
+    appendString(other.inPlace());
 }
 
 void LogMessageBuffer::addMetaData(std::string item) {
@@ -180,13 +186,13 @@ void LogMessageBuffer::merge(const LogMessageBuffer& other) {
     if (&other == this)
         return merge(LogMessageBuffer(other));
     str();
-    append(other.content());
+    appendContentOf(other);
     metaData_.insert(metaData_.end(), other.metaData_.begin(), other.metaData_.end());
 }
 
 void LogMessageBuffer::merge(LogMessageBuffer&& other) {
     str();
-    append(other.str());
+    appendString(other.str());
     metaData_.insert(metaData_.end(), std::make_move_iterator(other.metaData_.begin()),
                      std::make_move_iterator(other.metaData_.end()));
 }
@@ -194,8 +200,9 @@ void LogMessageBuffer::merge(LogMessageBuffer&& other) {
 // A new stream takes the global locale, which may group digits or have a comma
 // for a point. Asked once for each text: it is dearer than the digits.
 bool LogMessageBuffer::hasClassicNumbers() {
+    static const std::locale& classic = std::locale::classic();
     if (numbers_ == Numbers::Unknown)
-        numbers_ = std::locale() == std::locale::classic() ? Numbers::Classic : Numbers::Localised;
+        numbers_ = std::locale() == classic ? Numbers::Classic : Numbers::Localised;
     return numbers_ == Numbers::Classic;
 }
 
@@ -213,7 +220,7 @@ void LogMessageBuffer::insert(Number number) {
                             std::chars_format::general, 6);
     else
         end = std::to_chars(digits, std::end(digits), number);
-    append(std::string_view(digits, static_cast<std::size_t>(end.ptr - digits)));
+    appendString(std::string_view(digits, static_cast<std::size_t>(end.ptr - digits)));
 }
 
 void LogMessageBuffer::appendNumber(int number) {
@@ -243,6 +250,24 @@ void LogMessageBuffer::appendNumber(double number) {
 
 void LogMessageBuffer::appendPointer(const void* pointer) {
     static_cast<std::ostream&>(*this) << pointer;
+}
+
+LogMessageBuffer& operator<<(LogMessageBuffer& buffer, ObString* string) {
+    if (string)
+        buffer.appendString(
+            std::string_view(ob_string_get_utf8(string), ob_string_get_length(string)));
+    else
+        buffer.appendString("<nil>");
+    return buffer;
+}
+
+LogMessageBuffer& operator<<(LogMessageBuffer& buffer, ObNumber* number) {
+    if (!number)
+        return buffer << "<nil>";
+    void* const pool = ob_autorelease_pool_push();
+    buffer << ob_number_get_string_value(number);
+    ob_autorelease_pool_pop(pool);
+    return buffer;
 }
 
 }  // namespace plr

@@ -23,7 +23,7 @@ ServerLogger::LoggerBase(const std::string& domain, std::shared_ptr<LogServer> s
 std::shared_ptr<LogMessage> ServerLogger::buildMessage(LogLevel level,
                                                        LogMessageBuffer&& buffer) const {
     return LogMessage::create(static_cast<TimeStamp>(Clock::now_in_nanoseconds()), level,
-                              getLogDomain(), buffer.takeString(), buffer.takeMetadata());
+                              getLogDomain(), std::move(buffer));
 }
 
 void ServerLogger::forceLog(LogLevel level, LogMessageBuffer&& buffer) const {

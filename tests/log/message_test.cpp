@@ -211,23 +211,40 @@ TEST(LogMessageBuffer, CopiesMovesAndMergesTextAndMetadata) {
     EXPECT_EQ(moved.str(), "in one 1 Warntruein one 1 Warntrue");
 }
 
+TEST(LogMessageBuffer, TakesThePlatformsObjects) {
+    ObString* const format = ob_string_create("%@ is %d, %@");
+    ObString* const string = ob_string_create_with_length("a\0b", 3);
+    ObNumber* const number = ob_number_create_double(0.1);
+    LogMessageBuffer buffer = LogMessageBuffer::createWithObFormat(format, string, 5, nullptr);
+    buffer << ' ' << string << number << static_cast<ObString*>(nullptr)
+           << static_cast<ObNumber*>(nullptr);
+    EXPECT_EQ(buffer.str(), std::string("a\0b is 5, (null) a\0b0.1<nil><nil>", 33));
+    EXPECT_TRUE(LogMessageBuffer::createWithObFormat(nullptr).empty());
+    EXPECT_EQ(ob_get_reference_count(number), 1);
+    ob_release(number);
+    ob_release(string);
+    ob_release(format);
+}
+
 TEST(LogMessage, LeavesNothingToTheNextOne) {
-    std::string text(2000, 'x');
-    std::vector<std::string> metaData{"m"};
-    for (int i = 0; i < 200; ++i) {
-        auto message = LogMessage::create(7, LogLevel::Warn, "a.domain.that.is.not.short",
-                                          std::move(text), std::move(metaData));
+    for (const std::size_t length : {2000U, 3U, 0U, 121U, 3U, 120U}) {
+        SCOPED_TRACE(length);
+        LogMessageBuffer buffer;
+        buffer << std::string(length, 'x');
+        if (length > 120)
+            buffer << MetaData("m");
+        auto message =
+            LogMessage::create(7, LogLevel::Warn, "a.domain.that.is.not.short", std::move(buffer));
+        EXPECT_TRUE(buffer.empty());
         const std::weak_ptr<LogMessage> late = message;
         const LogMessage copy(*message);
         message = nullptr;
         EXPECT_TRUE(late.expired());
         EXPECT_EQ(copy.getDomain(), "a.domain.that.is.not.short");
-        EXPECT_EQ(copy.getText().size(), i == 0 ? 2000U : 3U);
-        EXPECT_EQ(copy.getMetaData().size(), i == 0 ? 1U : 0U);
+        EXPECT_EQ(copy.getText(), std::string(length, 'x'));
+        EXPECT_EQ(copy.getMetaData().size(), length > 120 ? 1U : 0U);
         EXPECT_EQ(copy.getTimeStamp(), 7);
         EXPECT_EQ(copy.getExtra(), "");
-        text = "new";
-        metaData.clear();
     }
 }
 

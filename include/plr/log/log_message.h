@@ -14,12 +14,15 @@
 //
 // Owner:   std::shared_ptr: one record serves all writers.
 // Threads: never changes once built; any thread reads it.
-// Cost:    create() takes a recycled record, text and control block in one,
-//          without an allocation when texts stay under some hundred bytes.
+// Cost:    create() takes a recycled record, with the room of its texts and the
+//          counts of its shared_ptr, so that it allocates nothing once some
+//          thousand messages have passed.
 namespace plr {
 
 // Nanoseconds of the calendar clock since 1970 (POSIX CLOCK_REALTIME).
 using TimeStamp = std::int64_t;
+
+class LogMessageBuffer;
 
 class PLR_EXPORT LogMessage {
   public:
@@ -29,12 +32,11 @@ class PLR_EXPORT LogMessage {
     LogMessage& operator=(const LogMessage&) = delete;
     virtual ~LogMessage();
 
-    // The same record, shared. Leaves in `text` an empty string with room, for
-    // the caller's next message. Throws std::bad_alloc. Any thread.
+    // The same record, shared, with the buffer's text and metadata moved in: the
+    // buffer is empty then. Throws std::bad_alloc. Any thread.
     [[nodiscard]] static std::shared_ptr<LogMessage> create(TimeStamp timeStamp, LogLevel level,
                                                             const std::string& domain,
-                                                            std::string&& text,
-                                                            std::vector<std::string>&& metaData);
+                                                            LogMessageBuffer&& buffer);
 
     // When the message was built.
     [[nodiscard]] TimeStamp getTimeStamp() const noexcept { return timeStamp_; }
@@ -50,6 +52,7 @@ class PLR_EXPORT LogMessage {
 
   private:
     friend class LogMessageStore;
+    void takeFrom(LogMessageBuffer& buffer);
 
     TimeStamp timeStamp_;
     LogLevel level_;

@@ -11,10 +11,8 @@
 #include <utility>
 #include <vector>
 
+#include "ob/ob.h"
 #include "plr/base/export.h"
-
-struct ObString;
-struct ObNumber;
 
 // A LogMessageBuffer is where the text and metadata of one message are composed:
 //
@@ -26,9 +24,9 @@ struct ObNumber;
 //
 // Owner:   the caller, usually on the stack; a logger takes its contents.
 // Threads: one at a time.
-// Cost:    text and numbers are appended in place, into room that messages of
-//          this thread had before. A standard stream is made when somebody asks
-//          for it, by a manipulator or by the conversion to std::ostream&.
+// Cost:    text and numbers are written into the buffer itself, up to kInPlace
+//          bytes without an allocation. A standard stream is made when somebody
+//          asks for it, by a manipulator or by the conversion to std::ostream&.
 //
 // Numbers appear as a new std::ostringstream writes them, in the global locale,
 // with boolalpha and without skipws; a stream that exists keeps its formatting.
@@ -42,7 +40,10 @@ struct MetaData {
 
 class PLR_EXPORT LogMessageBuffer {
   public:
-    LogMessageBuffer() noexcept;
+    // Longer texts go to the heap.
+    static constexpr std::size_t kInPlace = 120;
+
+    LogMessageBuffer() noexcept {}
     // Formats as printf(3) does.
     [[nodiscard, gnu::format(printf, 1, 2)]] static LogMessageBuffer createWithFormat(
         const char* format, ...);
@@ -60,12 +61,14 @@ class PLR_EXPORT LogMessageBuffer {
     LogMessageBuffer(const LogMessageBuffer& other);
     LogMessageBuffer(LogMessageBuffer&& other) noexcept;
     LogMessageBuffer& operator=(LogMessageBuffer other) noexcept;
-    ~LogMessageBuffer();
+    ~LogMessageBuffer() = default;
     void swap(LogMessageBuffer& other) noexcept;
 
     // Nothing was put in. Deliberate: false from the moment a stream was made,
     // even when nothing was written to it; a cheap test.
-    [[nodiscard]] bool empty() const noexcept { return !stream_ && text_.empty(); }
+    [[nodiscard]] bool empty() const noexcept {
+        return !stream_ && inPlaceLength_ == 0 && text_.empty();
+    }
 
     // Ends the stream, if there is one, and returns the text; a loan.
     const std::string& str();
@@ -77,10 +80,17 @@ class PLR_EXPORT LogMessageBuffer {
     // merge or the buffer's end.
     operator std::ostream&();
 
-    void appendString(std::string_view text);
+    // Hot path: bench/log_cases.h.
+    void appendString(std::string_view text) {
+        if (stream_ || text.size() > kInPlace - inPlaceLength_) [[unlikely]]
+            return appendElsewhere(text);
+        text.copy(inPlace_ + inPlaceLength_, text.size());
+        inPlaceLength_ += static_cast<unsigned char>(text.size());
+    }
     void appendString(const std::string& text) { appendString(std::string_view(text)); }
-    void appendString(const char* text);  // null appends "(null)"
-    void appendChar(char character);
+    // Null appends "(null)".
+    void appendString(const char* text) { appendString(std::string_view(text ? text : "(null)")); }
+    void appendChar(char character) { appendString(std::string_view(&character, 1)); }
 
     void addMetaData(std::string item);
     void addMetaData(MetaData item);
@@ -103,8 +113,12 @@ class PLR_EXPORT LogMessageBuffer {
     void appendPointer(const void* pointer);
 
   private:
-    [[nodiscard]] std::string_view content() const noexcept;
-    void append(std::string_view text);
+    friend class LogMessage;  // takes what is in place
+
+    [[nodiscard]] std::string_view inPlace() const noexcept { return {inPlace_, inPlaceLength_}; }
+    void appendElsewhere(std::string_view text);
+    void appendContentOf(const LogMessageBuffer& other);
+    void moveToText();
     template <class Number>
     void insert(Number number);
     [[nodiscard]] bool hasClassicNumbers();
@@ -112,10 +126,14 @@ class PLR_EXPORT LogMessageBuffer {
 
     enum class Numbers : unsigned char { Unknown, Classic, Localised };
 
-    std::string text_;  // stale while there is a stream
+    // The text is text_ and then what is in place; or the stream's while there is
+    // one.
+    std::string text_;
     std::unique_ptr<std::ostringstream> stream_;
     std::vector<std::string> metaData_;
     Numbers numbers_ = Numbers::Unknown;  // how they are written without a stream
+    unsigned char inPlaceLength_ = 0;
+    char inPlace_[kInPlace];
 };
 
 inline LogMessageBuffer& operator<<(LogMessageBuffer& buffer, const std::string& text) {
