@@ -77,14 +77,14 @@ auto LogDelivery::syncOnWriters(Work&& work) {
 // Hot path: bench/log_cases.h.
 void LogDelivery::log(MessagePtr&& message) {
     const LogLevel level = message->getLevel();
-    lock_.lock();
-    if (limit_ != 0 && pending_.messages.size() >= limit_ && !makeRoom()) [[unlikely]] {
-        lock_.unlock();
-        return;
+    bool wake = false;
+    {
+        const detail::BriefLock guard(lock_);
+        if (limit_ != 0 && pending_.messages.size() >= limit_ && !makeRoom()) [[unlikely]]
+            return;
+        pending_.messages.push_back(std::move(message));
+        wake = mustSchedule(level);
     }
-    pending_.messages.push_back(std::move(message));
-    const bool wake = mustSchedule(level);
-    lock_.unlock();
     if (wake)
         schedule();
 }
@@ -146,10 +146,12 @@ void LogDelivery::announceRoom() noexcept {
 }
 
 void LogDelivery::queueOperation(dispatch::block<void()>&& operation) {
-    lock_.lock();
-    pending_.operations.push_back({pending_.messages.size(), std::move(operation)});
-    const bool wake = std::exchange(state_, State::Scheduled) != State::Scheduled;
-    lock_.unlock();
+    bool wake = false;
+    {
+        const detail::BriefLock guard(lock_);
+        pending_.operations.push_back({pending_.messages.size(), std::move(operation)});
+        wake = std::exchange(state_, State::Scheduled) != State::Scheduled;
+    }
     if (wake)
         schedule();
 }

@@ -79,7 +79,7 @@ void LogServer::updateConfig(vox::dict config) {
 }
 
 void LogServer::updateConfig_sync(const vox::dict& config) {
-    if (const vox::dict levels = config["kDomainLogLevels"])
+    if (const vox::dict levels = config[config_key::kDomainLogLevels])
         tree_.updateLogLevels(levels);
     commitLevels_sync();
 }
@@ -109,11 +109,11 @@ vox::dict LogServer::getSimpleConfig() const {
 }
 
 void LogServer::fillLogWriterFullConfig_sync(vox::dict& config) const {
-    config["kLogWriters"] = delivery_->describeWriters(LogDelivery::Report::Full);
+    config[config_key::kLogWriters] = delivery_->describeWriters(LogDelivery::Report::Full);
 }
 
 void LogServer::fillLogWriterSimpleConfig_sync(vox::dict& config) const {
-    config["kLogWriters"] = delivery_->describeWriters(LogDelivery::Report::Simple);
+    config[config_key::kLogWriters] = delivery_->describeWriters(LogDelivery::Report::Simple);
 }
 
 void LogServer::fillLoggerFullConfig_sync(vox::dict& config) const {

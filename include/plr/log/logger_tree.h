@@ -34,13 +34,14 @@ namespace plr {
 
 class TrackedLogger;
 
-// The keys of a server's configuration that concern loggers.
+// The keys of a server's configuration.
 namespace config_key {
 inline constexpr const char* kDomainLogLevels = "kDomainLogLevels";  // dictionary: level by domain
 inline constexpr const char* kLoggers = "kLoggers";                  // array of dictionaries with
 inline constexpr const char* kLoggerName = "kLoggerName";            //   string
 inline constexpr const char* kLoggerLevel = "kLoggerLevel";          //   integer, the logger's own
 inline constexpr const char* kLoggerDomain = "kLoggerDomain";        //   string
+inline constexpr const char* kLogWriters = "kLogWriters";            // array of dictionaries
 }  // namespace config_key
 
 // First name of a path, and the rest, without the dot between them: "a.b.c"
