@@ -3,7 +3,8 @@
 //   radio_watch PATH...     for instance /radio/signal /events/ring
 //
 // When the service goes away it tries again, at growing intervals; what it
-// observes comes back with the connection.
+// observes comes back with the connection. Values go to standard output, what
+// happens to the connection is logged to standard error.
 
 #include <unistd.h>
 
@@ -15,6 +16,7 @@
 #include <vector>
 
 #include "examples/end_signals.h"
+#include "examples/logging.h"
 #include "examples/show.h"
 #include "plr/concurrency.h"
 #include "plr/rest.h"
@@ -22,15 +24,17 @@
 namespace {
 
 using namespace std::chrono_literals;
+using plr::LogLevel;
 
 constexpr const char* kService = "net.example.radio";
 constexpr std::chrono::milliseconds kFirstDelay = 50ms, kLongestDelay = 5s;
 
-// Owns its queue; see plr/concurrency/shared_synchronizable.h.
-class Watcher : public plr::SharedSynchronizable<Watcher> {
+// Owns its queue and its logger; see plr/log/shared_loggable.h.
+class Watcher : public plr::SharedLoggable<Watcher> {
   public:
-    static std::shared_ptr<Watcher> create(std::vector<std::string> paths) {
-        auto watcher = make_shared_ptr(new Watcher);
+    static std::shared_ptr<Watcher> create(const std::shared_ptr<plr::LogServer>& logServer,
+                                           std::vector<std::string> paths) {
+        auto watcher = make_shared_ptr(new Watcher(logServer));
         watcher->execute_wrapped([self = watcher.get(), paths = std::move(paths)] {
             self->ownQueue_.assertCurrent();
             self->observe_sync(paths);
@@ -40,8 +44,9 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
     }
 
   private:
-    Watcher()
-        : SharedSynchronizable("radio_watch"),
+    explicit Watcher(const std::shared_ptr<plr::LogServer>& logServer)
+        : SharedLoggable("radio_watch", "radio.watch", logServer),
+          timers_(plr::DispatchTimerService::create(logServer)),
           rest_(ownQueue_.queue(), "radio_watch." + std::to_string(::getpid())) {}
 
     void observe_sync(const std::vector<std::string>& paths) PLR_ON(ownQueue_)
@@ -74,24 +79,27 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
 
     void connected_sync() PLR_ON(ownQueue_)
     {
-        if (!std::exchange(connected_, true))
-            radio::say(std::string("connected to ") + kService);
         delay_ = kFirstDelay;
+        if (std::exchange(connected_, true))
+            return;
+        radio::log(logger(), LogLevel::Notice, "connected to ", kService);
+        logger().getLogServer()->debugFlush();  // values come behind it
     }
 
     void lost_sync() PLR_ON(ownQueue_)
     {
         if (std::exchange(connected_, false))
-            radio::say(std::string(kService) + " is gone");
-        ownQueue_.queue().after(
-            dispatch::time::after(delay_),
-            dispatch::block<void()>(plr::whileAlive(weak_from_this(), [](Watcher& self) {
-                self.ownQueue_.assertCurrent();
-                self.connect_sync();
-            })));
+            radio::log(logger(), LogLevel::Warn, kService, " is gone");
+        radio::log(logger(), LogLevel::Debug, "next try in ", delay_.count(), " ms");
+        timers_->runAfter(delay_, ownQueue_.queue(),
+                          plr::whileAlive(weak_from_this(), [](Watcher& self) {
+                              self.ownQueue_.assertCurrent();
+                              self.connect_sync();
+                          }));
         delay_ = std::min(2 * delay_, kLongestDelay);
     }
 
+    const std::shared_ptr<plr::TimerService> timers_;
     plr::RestModule rest_ PLR_CONFINED_TO(ownQueue_);
     bool connected_ PLR_CONFINED_TO(ownQueue_)
     = false;
@@ -107,6 +115,8 @@ int main(int argc, char** argv) {
         return 2;
     }
     const radio::EndSignals end;
-    const auto watcher = Watcher::create({argv + 1, argv + argc});
+    const auto logServer = radio::startLog("radio_watch", {"console"});
+    const plr::ScopedLogFlusher flusher(logServer);
+    const auto watcher = Watcher::create(logServer, {argv + 1, argv + argc});
     return end.wait();
 }

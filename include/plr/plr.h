@@ -3,4 +3,5 @@
 // The whole class interface.
 #include "plr/concurrency.h"
 #include "plr/ipc.h"
+#include "plr/log.h"
 #include "plr/rest.h"

@@ -27,8 +27,9 @@ class Radiod(unittest.TestCase):
         self.addCleanup(folder.cleanup)
         self.fifo = os.path.join(folder.name, "modem")
         os.mkfifo(self.fifo)
+        self.log = pathlib.Path(folder.name, "log")
         os.environ["VOX_RUNTIME_DIR"] = os.path.join(folder.name, "run")
-        self.radiod = self.start("radiod", "--modem", self.fifo)
+        self.radiod = self.start("radiod", "--modem", self.fifo, "--log", self.log)
         self.client = vox_client.Connection.open(SERVICE)
         self.addCleanup(self.client.close)
 
@@ -80,8 +81,25 @@ class Radiod(unittest.TestCase):
         self.assertEqual([self.notified() for _ in range(3)],
                          [("/radio/signal", -73), ("/events/ring", "unspecified"), ("/radio/signal", None)])
         self.assertEqual(self.get("*"), {
-            "connections": ["python"], "events": {"ring": None, "sms": None}, "settings": {},
+            "connections": ["python"], "events": {"ring": None, "sms": None}, "log": {}, "settings": {},
             "radio": {"signal": None}})
+
+    def test_levels_are_set_told_and_taken_back(self):
+        self.watch("/radio/signal")
+        self.assertEqual(self.notified(), ("/radio/signal", None))
+        levels = [(None, {}), ("Debug", {"radio.modem": 20}), ("Loud", {"radio.modem": 20}), (None, {})]
+        for number, (level, configured) in enumerate(levels):
+            self.client.send(message("set", "/log/radio.modem", level))
+            self.assertEqual(self.get("/log"), {"kDomainLogLevels": configured, "kLoggers": [], "kLogWriters": [
+                {"kLogWriterType": "file", "kLogWriterPath": str(self.log)}]})
+            self.modem_says(f"+CSQ: {number},0")
+            self.assertEqual(self.notified(), ("/radio/signal", 2 * number - 113))
+        self.end(self.radiod)
+        records = [line.split(" ", 2)[2] for line in self.log.read_text().splitlines()]
+        self.assertEqual([record for record in records if record.startswith(("D", "W"))], [
+            "D radio.modem: line 2: +CSQ: 1,0", 'W radio.rest: no level for radio.modem: "Loud"',
+            "D radio.modem: line 3: +CSQ: 2,0"])
+        self.assertEqual(records[-1], "N radio: ending", "nothing is lost at the end")
 
     def test_a_second_service_of_the_name_gives_up(self):
         second = subprocess.run([EXAMPLES / "radiod", "--modem", self.fifo], timeout=30, check=False,

@@ -26,9 +26,16 @@ class Docs(unittest.TestCase):
                     with self.subTest(document=document.name, target=target):
                         self.assertTrue((document.parent / target).exists())
 
-    def test_readme_shows_the_example_that_is_built(self):
+    def test_readme_shows_the_whole_example(self):
         shown = re.findall(r"```cpp\n(.*?)```", (PROJECT / "README.md").read_text(), re.S)
         self.assertEqual(shown, [(PROJECT / "examples" / "readme_example.cpp").read_text()])
+
+    def test_shown_code_is_built(self):
+        examples = [path.read_text() for path in (PROJECT / "examples").iterdir() if path.suffix in (".cpp", ".h")]
+        for document in documents():
+            for shown in re.findall(r"```cpp\n(.*?)```", document.read_text(), re.S):
+                with self.subTest(document=document.name, shown=shown):
+                    self.assertTrue(any(shown in example for example in examples))
 
 
 if __name__ == "__main__":

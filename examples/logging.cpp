@@ -1,0 +1,30 @@
+#include "examples/logging.h"
+
+#include <stdexcept>
+
+namespace radio {
+namespace {
+
+std::shared_ptr<plr::LogWriter> makeWriter(const char* program, const std::string& place) {
+    if (place == "console")
+        return plr::ConsoleLogWriter::create();
+    if (place == "system")
+        return plr::KelLogWriter::create(program, nullptr, -1);
+    if (place.find('/') != std::string::npos)
+        return plr::FileLogWriter::create({.path = place});
+    throw std::invalid_argument(place + " is no place for a log");
+}
+
+}  // namespace
+
+std::shared_ptr<plr::LogServer> startLog(const char* program,
+                                         const std::vector<std::string>& places) {
+    auto server = plr::LogServer::create(program);
+    for (const std::string& place : places)
+        server->addWriter(makeWriter(program, place));
+    server->start();
+    plr::drainLogsOnCrash(server);
+    return server;
+}
+
+}  // namespace radio
