@@ -351,5 +351,6 @@ pelorin_component(umbrella LEVEL 9 LIBRARY pelorin
   HEADERS
     include/plr/concurrency.h
     include/plr/ipc.h
+    include/plr/log.h
     include/plr/plr.h
     include/plr/rest.h)
