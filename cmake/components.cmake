@@ -279,6 +279,11 @@ pelorin_component(log_loggable LEVEL 4 LIBRARY pelorin
     include/plr/log/loggable.h
     include/plr/log/shared_loggable.h)
 
+# Needs {fmt}, which its users bring; no other header includes it.
+pelorin_component(log_fmt LEVEL 3 LIBRARY pelorin
+  HEADERS
+    include/plr/log/fmt.h)
+
 pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
   HEADERS
     include/plr/rest/auto_reply.h

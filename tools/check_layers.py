@@ -6,7 +6,8 @@ lists: LEVEL COMPONENT LIBRARY FILE. A file may include
   - files of its own component and of components on lower levels; the services
     of the platform library, which all stand on one level, each other too;
   - when it is an installed header: installed headers only, and of other
-    libraries nothing but the C++ and C ones.
+    libraries nothing but the C++ and C ones; a front for another library, which
+    FRONTS lists, that one too, and no other header may include the front.
 Every source and header under include/, src/ and platform/ must be listed.
 
 usage: check_layers.py PROJECT LAYERS.TXT        exit status 1 on any finding
@@ -23,6 +24,9 @@ SEARCHED_FOLDERS = (*PUBLIC_FOLDERS, "")
 LISTED_FOLDERS = ("include", "src", "platform")
 # Folders of the system's own headers; any other name with a slash is a library.
 SYSTEM_FOLDERS = ("sys/", "linux/", "arpa/", "net/", "netinet/", "bits/")
+
+# Optional headers for users of another library, and the folder that one has.
+FRONTS = {"include/plr/log/fmt.h": "fmt/"}
 
 
 class Entry(NamedTuple):
@@ -66,7 +70,8 @@ def findings_of_file(project, table, file):
     for number, quoted, angled in includes(project / file):
         where = f"{file}:{number}"
         if angled:
-            if public and "/" in angled and not angled.startswith(SYSTEM_FOLDERS):
+            allowed = (*SYSTEM_FOLDERS, *filter(None, [FRONTS.get(file)]))
+            if public and "/" in angled and not angled.startswith(allowed):
                 yield f"{where}: an installed header includes <{angled}> of another library"
             continue
         target = resolve(project, file, quoted)
@@ -74,6 +79,8 @@ def findings_of_file(project, table, file):
             yield f'{where}: "{quoted}" is no file of the project'
         elif target not in table:
             yield f"{where}: {target} is in no component"
+        elif target in FRONTS:
+            yield f"{where}: {target} is for users of another library only"
         elif public and not target.startswith(PUBLIC_FOLDERS):
             yield f"{where}: an installed header includes {target}, which is not installed"
         elif not may_use(table[file], table[target]):

@@ -55,7 +55,7 @@ void FileLogWriter::reopenNow() {
 
 void FileLogWriter::endBatch() {
     state_->records.handOver();
-    if (state_->reopenFailed && !std::exchange(state_->reopenFailed, false))
+    if (std::exchange(state_->reopenFailed, false))
         reopen();
 }
 

@@ -68,7 +68,7 @@ bool LogFile::sendAll(RecordBuffer& records) noexcept {
         if (piece.empty() && rotate())
             piece = records.upTo(room());
         if (piece.empty())
-            piece = records.upTo(1);
+            piece = size_ == 0 ? records.first() : records.waiting();
         if (!write(piece, records))
             return false;
     }

@@ -21,7 +21,7 @@ std::string_view RecordBuffer::upTo(std::size_t room) const noexcept {
         first, ends_.end(), [limit = sent_ + room](const End& end) { return end.at <= limit; });
     if (beyond != first)
         return all.substr(0, std::prev(beyond)->at - sent_);
-    return all.substr(0, sent_ == startOfFirst() ? 0 : first->at - sent_);
+    return sent_ == startOfFirst() ? std::string_view() : this->first();
 }
 
 void RecordBuffer::consume(std::size_t bytes) noexcept {

@@ -31,6 +31,10 @@ class RecordBuffer {
     }
     [[nodiscard]] std::size_t messages() const noexcept;
 
+    // What is left of the first record; there must be one.
+    [[nodiscard]] std::string_view first() const noexcept {
+        return {bytes_.get() + sent_, ends_[first_].at - sent_};
+    }
     // As many whole records as fit into `room` bytes. The rest of a record that was
     // sent in part comes first, whatever the room.
     [[nodiscard]] std::string_view upTo(std::size_t room) const noexcept;

@@ -104,8 +104,13 @@ void RecordOutput::tryAgain() {
     Sessions done;
     const detail::BriefLock guard(lock_);
     timerIsSet_ = false;
-    if (!kept_.empty())
-        done = settle(sendKept());
+    if (kept_.empty())
+        return;
+    const std::size_t before = kept_.waiting().size();
+    const bool sent = sendKept();
+    if (kept_.waiting().size() < before)
+        delay_ = kFirstDelay;
+    done = settle(sent);
 }
 
 void RecordOutput::whenSent(const dispatch::group_session& session) {
