@@ -39,8 +39,11 @@ bool take_all(frame_reader& reader, result& taken) {
     vox_link::frame arrived;
     for (;;) {
         const frame_reader::outcome outcome = reader.next(arrived);
-        if (outcome == frame_reader::outcome::error)
+        if (outcome == frame_reader::outcome::error) {
             taken.error = reader.error();
+            // Broken for good.
+            require(reader.has_next() && reader.next(arrived) == outcome);
+        }
         if (outcome != frame_reader::outcome::frame)
             return outcome == frame_reader::outcome::more;
         require(arrived.body.size() == arrived.header.length);

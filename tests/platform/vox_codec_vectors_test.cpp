@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <fstream>
+#include <random>
 #include <regex>
 
 #include "platform/linux/vox/frame.h"
@@ -94,6 +95,77 @@ TEST(WireProtocolPage, FramesAreAsItShows) {
         vox_link::write_header(header, again.data());
         EXPECT_TRUE(std::equal(again.begin(), again.end(), one.data.begin())) << one.description;
     }
+}
+
+// ---- What becomes of them, put together at random ------------------------------------
+
+// An array of some of the page's values, with a dictionary around some more.
+class Mixture {
+  public:
+    explicit Mixture(unsigned seed) : random_(seed) {}
+    Bytes make() {
+        Bytes made = {0x85};
+        for (int item = 0; item < 4; ++item)
+            append(made, some());
+        made.push_back(0xa3);
+        for (const char* key : {"", "short", "longer than 15 bytes"}) {
+            append(made, encoding(text(key)));
+            append(made, some());
+        }
+        return made;
+    }
+    std::size_t below(std::size_t bound) { return random_() % bound; }
+
+  private:
+    static void append(Bytes& made, const Bytes& more) {
+        made.insert(made.end(), more.begin(), more.end());
+    }
+    const Bytes& some() {
+        static const std::vector<Vector> all = examples("vox-values");
+        for (;;) {
+            const Vector& one = all[below(all.size())];
+            if (one.description.find('<') == std::string::npos)  // no descriptor
+                return one.data;
+        }
+    }
+    std::mt19937 random_;
+};
+
+TEST(VoxCodec, ValuesComeBackEqualAndMayBeChanged) {
+    for (unsigned seed = 0; seed < 2000; ++seed) {
+        const Bytes bytes = Mixture(seed).make();
+        const Ref value = decode(bytes).first;
+        const Ref again = decode(bytes).first;
+        ASSERT_TRUE(value && vox_equal(value, again)) << "seed " << seed;
+        ASSERT_EQ(encoding(value), bytes) << "seed " << seed;
+        for (const Ref& each : {value, again}) {
+            vox_array_append_value(each, number(1));
+            vox_dictionary_set_value(vox_array_get_value(each, 4), "new", number(2));
+        }
+        ASSERT_TRUE(vox_equal(value, again)) << "seed " << seed;
+        ASSERT_NE(encoding(value), bytes) << "seed " << seed;
+    }
+}
+
+TEST(VoxCodec, EveryTruncationIsRefusedAndEveryChangedByteOrAnotherValue) {
+    int accepted = 0;
+    for (unsigned seed = 0; seed < 500; ++seed) {
+        Mixture mixture(seed);
+        const Bytes whole = mixture.make();
+        // A copy, so that a sanitizer sees a read past the end.
+        for (auto end = whole.begin(); end != whole.end(); ++end)
+            ASSERT_NE(decode(Bytes(whole.begin(), end)).second, "") << "seed " << seed;
+        for (int change = 0; change < 100; ++change) {
+            Bytes changed = whole;
+            changed[mixture.below(whole.size())] ^=
+                static_cast<std::uint8_t>(1 + mixture.below(255));
+            if (const Ref value = decode(changed).first) {
+                ASSERT_EQ(encoding(value), changed) << "seed " << seed;
+                accepted++;
+            }
+        }
+    }
+    EXPECT_GT(accepted, 5000) << "many changes hit numbers and text";
 }
 
 }  // namespace

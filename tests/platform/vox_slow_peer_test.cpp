@@ -48,10 +48,10 @@ class VoxSlowPeer : public ::testing::Test {
         return counts.queued_bytes <= times * limits.max_queued_bytes &&
                counts.queued_messages <= times * limits.max_queued_messages;
     }
-    // Sends until a message is not taken; that error.
-    int fill() {
+    // Sends messages of so many bytes until one is not taken; that error.
+    int fill(std::size_t bytes) {
         for (;;) {
-            const int error = pair->end.send(message(accepted, 1000));
+            const int error = pair->end.send(message(accepted, bytes));
             EXPECT_TRUE(isWithin(1));
             if (error != 0)
                 return error;
@@ -70,7 +70,7 @@ class VoxSlowPeer : public ::testing::Test {
 
 TEST_F(VoxSlowPeer, IsDisconnectedWhenThatIsThePolicy) {
     start(VOX_OVERFLOW_DISCONNECT);
-    EXPECT_EQ(fill(), EPIPE);
+    EXPECT_EQ(fill(1000), EPIPE);  // there are too many bytes
     expectDisconnected();
 }
 
@@ -89,7 +89,7 @@ TEST_F(VoxSlowPeer, GetsOneMessageOfAnySizeWhenNothingWaits) {
 
 TEST_F(VoxSlowPeer, LearnsHowManyMessagesWereDroppedWhenThatIsThePolicy) {
     start(VOX_OVERFLOW_DROP);
-    EXPECT_EQ(fill(), ENOBUFS);
+    EXPECT_EQ(fill(0), ENOBUFS);  // there are too many messages
     for (int more = 0; more < 10; ++more)
         EXPECT_EQ(pair->end.send(message(1, 1000)), ENOBUFS);
     Inbox refused;
