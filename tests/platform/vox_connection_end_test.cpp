@@ -30,9 +30,14 @@ TEST_F(VoxConnectionEnd, CancellingTellsEveryOutstandingRequestOnceAndThenTheHan
     resumeBoth();
     const auto other = dispatch::queue::create("other");
     Inbox elsewhere;
+    Numbers order;  // touched on the other queue only
     for (std::int64_t n = 0; n < 100; ++n) {
         left.request(message(n), left.inbox);
-        left.request(message(n), elsewhere, other);
+        const dispatch::block<void(vox_object_t)> told([&, n](vox_object_t error) {
+            order.push_back(n);
+            elsewhere.add(error);
+        });
+        vox_connection_send_message_with_reply(left, message(n), &other, &told);
     }
     ASSERT_TRUE(right.inbox.wait(200));
     vox_connection_cancel(left);
@@ -42,7 +47,7 @@ TEST_F(VoxConnectionEnd, CancellingTellsEveryOutstandingRequestOnceAndThenTheHan
     drain(left.queue);
     drain(other);
     EXPECT_EQ(left.inbox.all().size(), 101u);
-    EXPECT_EQ(elsewhere.all().size(), 100u);
+    EXPECT_EQ(order, upTo(100));
     for (const Ref& event : left.inbox.all())
         EXPECT_EQ(vox_error_get_code(event), VOX_ERROR_CONNECTION_INVALID);
     EXPECT_EQ(right.inbox.errorCode(), VOX_ERROR_CONNECTION_INTERRUPTED);
