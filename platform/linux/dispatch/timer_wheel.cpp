@@ -15,7 +15,8 @@ void timer_wheel::place(wheel_entry& entry) noexcept {
     const std::int64_t deadline = std::max(entry.deadline_, base_);
     // The lowest bit stands in for "equal", which has no highest bit.
     const auto differing = static_cast<std::uint64_t>(deadline ^ base_) | 1;
-    const unsigned level = (63 - static_cast<unsigned>(std::countl_zero(differing))) / kBits;
+    const auto highest = static_cast<unsigned>(std::bit_width(differing) - 1) % 64;
+    const unsigned level = highest / kBits;
     const unsigned index = static_cast<unsigned>(deadline >> (level * kBits)) % kSlots;
     const unsigned place = level * kSlots + index;
     const std::uint64_t bit = std::uint64_t{1} << index;

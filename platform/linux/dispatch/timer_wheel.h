@@ -70,6 +70,7 @@ class timer_wheel {
     static constexpr unsigned kBits = 6;
     static constexpr unsigned kSlots = 1 << kBits;
     static constexpr unsigned kLevels = 11;  // for the 62 bits of deadlines
+    static constexpr std::size_t kPlaces = std::size_t{kLevels} * kSlots;
 
     // Meaningless while its bit in occupied_ is clear.
     struct slot {
@@ -85,7 +86,7 @@ class timer_wheel {
     std::int64_t base_ = 0;
     unsigned levels_ = 0;                            // bit: something on that level
     std::array<std::uint64_t, kLevels> occupied_{};  // bit: something in that slot
-    std::array<slot, kLevels * kSlots> slots_;
+    std::array<slot, kPlaces> slots_;
 };
 
 }  // namespace dispatch::detail
