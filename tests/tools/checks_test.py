@@ -16,6 +16,7 @@ TABLE = """\
 1 bytes pelorin include/plr/bytes.h
 2 tree pelorin include/plr/tree.h
 2 tree pelorin src/tree.cpp
+1 front pelorin include/plr/log/fmt.h
 """
 
 
@@ -58,6 +59,7 @@ class CheckLayers(unittest.TestCase):
             "src/tree.cpp": '#include "plr/tree.h"\n#include "plr/bytes.h"\n#include <boost/x.hpp>\n',
             "include/plr/tree.h": '#include "plr/base.h"\n#include <vector>\n#include <sys/types.h>\n',
             "platform/linux/messages.h": '#include "queues.h"\n',
+            "include/plr/log/fmt.h": "#include <fmt/format.h>\n",
         })
         self.assertEqual((result.returncode, result.stdout.strip()), (0, ""))
 
@@ -70,6 +72,10 @@ class CheckLayers(unittest.TestCase):
                 ("include/plr/tree.h", '#include "platform/linux/messages.h"\n', "not installed"),
             "another library in an installed header":
                 ("include/plr/tree.h", "# include <boost/container/flat_map.hpp>\n", "another library"),
+            "a front for users of another library":
+                ("include/plr/tree.h", '#include "plr/log/fmt.h"\n', "users of another library"),
+            "a second library in a front":
+                ("include/plr/log/fmt.h", "#include <boost/format.hpp>\n", "another library"),
             "a file that is nowhere": ("src/tree.cpp", '#include "plr/trea.h"\n', "is no file"),
             "a header nobody lists": ("src/forgotten.h", "", "in no component"),
         }
