@@ -90,7 +90,6 @@ class Watcher : public plr::SharedLoggable<Watcher> {
     {
         if (std::exchange(connected_, false))
             radio::log(logger(), LogLevel::Warn, kService, " is gone");
-        radio::log(logger(), LogLevel::Debug, "next try in ", delay_.count(), " ms");
         timers_->runAfter(delay_, ownQueue_.queue(),
                           plr::whileAlive(weak_from_this(), [](Watcher& self) {
                               self.ownQueue_.assertCurrent();
