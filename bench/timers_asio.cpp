@@ -18,12 +18,11 @@ struct AsioPeer {
             context.poll();
         }
     }
-    template <class Done>
-    void runUntil(Done done) {
+    void run() {
         context.restart();
-        while (!done())
-            context.run_one();
+        context.run();
     }
+    void stop() { context.stop(); }
 
     class Timer {
       public:

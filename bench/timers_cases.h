@@ -16,7 +16,7 @@
 // A peer is a class made once a process, with
 //   inTurns(turns, work)  calls `work` so many times from within the peer's loop
 //                         (or queue) and lets it do what was put off in between
-//   runUntil(done)        runs the loop until done() holds; asked after each callback
+//   run(), stop()         runs the loop until a handler says stop
 //   class Timer           made from the peer and a handler (a callable that
 //                         captures one pointer): arm(deadline, now) for once,
 //                         repeat(first, period), disarm(), destructor.
@@ -54,6 +54,13 @@ class Delays {
 };
 
 inline constexpr auto kNothing = [] {};
+
+// Processor time of all threads of the process.
+inline std::int64_t cpuNs() noexcept {
+    timespec used{};
+    ::clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &used);
+    return std::int64_t{used.tv_sec} * kSecond + used.tv_nsec;
+}
 
 template <class Peer>
 std::vector<std::unique_ptr<typename Peer::Timer>> waiting(Peer& peer, std::size_t count) {
@@ -103,13 +110,23 @@ std::int64_t life(Peer& peer, std::uint64_t operations) {
 }
 
 template <class Peer>
-int fire(Peer& peer) {
+struct Firing {
+    void operator()() {
+        if (++fired == kFirings)
+            peer.stop();
+    }
+    Peer& peer;
     std::size_t fired = 0;
+};
+
+template <class Peer>
+int fire(Peer& peer) {
+    Firing<Peer> firing{peer};
     std::vector<std::unique_ptr<typename Peer::Timer>> timers;
     // Whole milliseconds, because one of the peers knows no others.
     const std::int64_t first = (nowNs() / kMillisecond + 1'000) * kMillisecond;
     for (std::size_t i = 0; i < kFirings; ++i)
-        timers.push_back(std::make_unique<typename Peer::Timer>(peer, [&fired] { ++fired; }));
+        timers.push_back(std::make_unique<typename Peer::Timer>(peer, [&firing] { firing(); }));
     peer.inTurns(1, [&] {
         for (std::size_t i = 0; i < kFirings; ++i) {
             const auto offset = static_cast<std::int64_t>(i * 7919 % kFirings) * 10;
@@ -118,34 +135,48 @@ int fire(Peer& peer) {
     });
     if (nowNs() >= first)
         fail("armed too late");
-    peer.runUntil([&fired] { return fired == kFirings; });
+    const std::int64_t usedBefore = cpuNs();
+    peer.run();
     const std::int64_t taken = nowNs() - first;
+    const std::int64_t used = cpuNs() - usedBefore;
     result("ns", static_cast<double>(taken) / static_cast<double>(kFirings));
+    result("cpu_ns", static_cast<double>(used) / static_cast<double>(kFirings));
     return 0;
 }
 
+// The least late of the first and of the last hundred calls.
 template <class Peer>
-int drift(Peer& peer) {
-    constexpr std::int64_t kPeriod = 10 * kMillisecond;
-    constexpr std::int64_t kCalls = 6'000;
-    constexpr std::int64_t kAtBothEnds = 100;  // the least late of so many
-    std::int64_t calls = 0;
-    std::int64_t early = kSecond;
-    std::int64_t late = kSecond;
-    const std::int64_t first = (nowNs() / kMillisecond + 20) * kMillisecond;
-    const auto handler = [&] {
+struct Drift {
+    static constexpr std::int64_t kPeriod = 10 * kMillisecond;
+    static constexpr std::int64_t kCalls = 6'000;
+    static constexpr std::int64_t kAtBothEnds = 100;
+
+    void operator()() {
         const std::int64_t by = nowNs() - (first + calls * kPeriod);
         ++calls;
         if (calls <= kAtBothEnds)
             early = std::min(early, by);
         if (calls > kCalls - kAtBothEnds)
             late = std::min(late, by);
-    };
-    typename Peer::Timer timer(peer, [call = &handler] { (*call)(); });
-    peer.inTurns(1, [&] { timer.repeat(first, kPeriod); });
-    peer.runUntil([&calls] { return calls >= kCalls; });
+        if (calls == kCalls)
+            peer.stop();
+    }
+
+    Peer& peer;
+    std::int64_t first = (nowNs() / kMillisecond + 20) * kMillisecond;
+    std::int64_t calls = 0;
+    std::int64_t early = kSecond;
+    std::int64_t late = kSecond;
+};
+
+template <class Peer>
+int drift(Peer& peer) {
+    Drift<Peer> state{peer};
+    typename Peer::Timer timer(peer, [&state] { state(); });
+    peer.inTurns(1, [&] { timer.repeat(state.first, state.kPeriod); });
+    peer.run();
     peer.inTurns(1, [&] { timer.disarm(); });
-    result("us", static_cast<double>(std::abs(late - early)) / 1e3);
+    result("us", static_cast<double>(std::abs(state.late - state.early)) / 1e3);
     return 0;
 }
 

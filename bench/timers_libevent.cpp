@@ -28,11 +28,8 @@ struct LibeventPeer {
             event_base_loop(base, EVLOOP_NONBLOCK);
         }
     }
-    template <class Done>
-    void runUntil(Done done) {
-        while (!done())
-            event_base_loop(base, EVLOOP_ONCE);
-    }
+    void run() { event_base_dispatch(base); }
+    void stop() { event_base_loopbreak(base); }
 
     class Timer {
         struct Base {

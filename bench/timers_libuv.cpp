@@ -18,11 +18,8 @@ struct LibuvPeer {
             uv_run(&loop, UV_RUN_NOWAIT);
         }
     }
-    template <class Done>
-    void runUntil(Done done) {
-        while (!done())
-            uv_run(&loop, UV_RUN_ONCE);
-    }
+    void run() { uv_run(&loop, UV_RUN_DEFAULT); }
+    void stop() { uv_stop(&loop); }
 
     class Timer {
         struct Base {

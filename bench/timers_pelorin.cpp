@@ -16,16 +16,9 @@ struct PelorinPeer {
         done.wait();
     }
 
-    // The queue runs by itself; its callbacks are seen from here.
-    template <class Done>
-    void runUntil(Done done) {
-        while (!queue.sync(done)) {
-            bench::Event later;
-            queue.after(dispatch::time::after(std::chrono::milliseconds(1)),
-                        dispatch::block<void()>([&later] { later.signal(); }));
-            later.wait();
-        }
-    }
+    // The queue runs by itself.
+    void run() { stopped.wait(); }
+    void stop() { stopped.signal(); }
 
     class Timer {
       public:
@@ -56,6 +49,7 @@ struct PelorinPeer {
     };
 
     dispatch::queue queue = dispatch::queue::create("bench");
+    bench::Event stopped;
 
   private:
     template <class Work>

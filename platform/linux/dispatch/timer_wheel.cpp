@@ -8,10 +8,10 @@ namespace dispatch::detail {
 // Hot path: bench/timers_cases.h.
 void timer_wheel::insert(wheel_entry& entry, std::int64_t deadline) noexcept {
     entry.deadline_ = deadline;
-    place(entry);
+    place(entry, end::back);
 }
 
-void timer_wheel::place(wheel_entry& entry) noexcept {
+void timer_wheel::place(wheel_entry& entry, end where) noexcept {
     const std::int64_t deadline = std::max(entry.deadline_, base_);
     // The lowest bit stands in for "equal", which has no highest bit.
     const auto differing = static_cast<std::uint64_t>(deadline ^ base_) | 1;
@@ -22,18 +22,38 @@ void timer_wheel::place(wheel_entry& entry) noexcept {
     const std::uint64_t bit = std::uint64_t{1} << index;
     slot& into = slots_[place];
     entry.place_ = static_cast<std::uint16_t>(place);
-    entry.next_ = nullptr;
     if (occupied_[level] & bit) {
-        entry.previous_ = into.last;
-        into.last->next_ = &entry;
-        into.last = &entry;
+        link(into, entry, where);
         into.earliest = std::min(into.earliest, deadline);
         return;
     }
-    entry.previous_ = nullptr;
-    into = {&entry, &entry, deadline};
+    entry.next_ = entry.previous_ = nullptr;
+    entry.ahead_ = nullptr;
+    into.first = into.last = &entry;
+    into.earliest = deadline;
+    into.added = 1;
+    into.from_front = where == end::front;
+    into.recent[0] = &entry;
     occupied_[level] |= bit;
     levels_ |= 1u << level;
+}
+
+void timer_wheel::link(slot& into, wheel_entry& entry, end where) noexcept {
+    const wheel_entry*& place = into.recent[into.added % kAhead];
+    entry.ahead_ = into.added < kAhead ? nullptr : place;
+    place = &entry;
+    ++into.added;
+    if (where == end::back) {
+        entry.next_ = nullptr;
+        entry.previous_ = into.last;
+        into.last->next_ = &entry;
+        into.last = &entry;
+    } else {
+        entry.previous_ = nullptr;
+        entry.next_ = into.first;
+        into.first->previous_ = &entry;
+        into.first = &entry;
+    }
 }
 
 void timer_wheel::remove(wheel_entry& entry) noexcept {
@@ -51,13 +71,13 @@ void timer_wheel::remove(wheel_entry& entry) noexcept {
     entry.place_ = wheel_entry::kNowhere;
 }
 
-// Empties a slot; returns what was in it, linked by `next_`.
-wheel_entry* timer_wheel::detach(unsigned place) noexcept {
+// Empties a slot; what was in it stays linked.
+timer_wheel::slot& timer_wheel::detach(unsigned place) noexcept {
     const unsigned level = place / kSlots;
     occupied_[level] &= ~(std::uint64_t{1} << place % kSlots);
     if (occupied_[level] == 0)
         levels_ &= ~(1u << level);
-    return slots_[place].first;
+    return slots_[place];
 }
 
 unsigned timer_wheel::first_place() const noexcept {
@@ -81,18 +101,25 @@ wheel_entry* timer_wheel::take_due(std::int64_t now) noexcept {
             remove(*entry);
             return entry;
         }
-        entry = detach(place);
-        while (entry) {
-            wheel_entry* next = entry->next_;
-            if (next)
-                __builtin_prefetch(next->next_, 1);
-            this->place(*entry);
-            entry = next;
-        }
+        open(place);
     }
     // Nothing is pending: what comes next is near.
     base_ = std::max(base_, now);
     return nullptr;
+}
+
+// Moves the entries of the first slot to lower levels, which are all empty: so
+// either direction keeps their order.
+void timer_wheel::open(unsigned place) noexcept {
+    const slot& opened = detach(place);
+    const bool forwards = opened.from_front;
+    wheel_entry* entry = forwards ? opened.first : opened.last;
+    while (entry) {
+        wheel_entry* next = forwards ? entry->next_ : entry->previous_;
+        __builtin_prefetch(entry->ahead_, 1);
+        this->place(*entry, forwards ? end::back : end::front);
+        entry = next;
+    }
 }
 
 void timer_wheel::set_back(std::int64_t now) noexcept {
@@ -101,15 +128,14 @@ void timer_wheel::set_back(std::int64_t now) noexcept {
     wheel_entry* all = nullptr;
     wheel_entry* last = nullptr;
     while (levels_ != 0) {
-        const unsigned place = first_place();
-        wheel_entry* first = detach(place);
-        (last ? last->next_ : all) = first;
-        last = slots_[place].last;
+        const slot& emptied = detach(first_place());
+        (last ? last->next_ : all) = emptied.first;
+        last = emptied.last;
     }
     base_ = std::max<std::int64_t>(now, 0);
     while (all) {
         wheel_entry* next = all->next_;
-        place(*all);
+        place(*all, end::back);
         all = next;
     }
 }
