@@ -165,6 +165,7 @@ TEST_F(Property, EverySetNotifiesChangedOrNotUnderItsPathWithTheWatchersName) {
     const auto setter = rig_.registeredClient("setter");
     EXPECT_EQ(newsOf(setter, Operation::kSet, "/kept/x/below"), (Texts{"notify me /kept/x 1"}));
     pop("/kept/x");
+    EXPECT_EQ(news(), Texts());
     EXPECT_EQ(newsOf(setter, Operation::kSet, "/kept/x"), Texts());
     // Where values are not kept, only sets are told.
     push("/events/x");
@@ -210,6 +211,7 @@ TEST_F(Property, WhatIsWatchedIsAnnouncedToWhoWatchesThat) {
     EXPECT_EQ(get("/kept/y/_/watchers"), R"([0: "other"])");
     EXPECT_EQ(get("/kept"), R"([0: "x",1: "y"])") << "properties stay";
     pop("/kept/_/watched");
+    EXPECT_EQ(news(), Texts());
     EXPECT_EQ(newsOf(other, Operation::kPop, "/kept/y"), Texts());
 }
 
@@ -228,7 +230,9 @@ TEST_F(Property, AnUnknownClientWatchesNothingButMakesProperties) {
 TEST_F(Property, WatchersThatWentAwayExpireAndStillCountOnce) {
     push("/kept/_/watched");
     auto other = rig_.registeredClient("other");
-    EXPECT_EQ(newsOf(other, Operation::kPush, "/kept/x").size(), 2U);
+    EXPECT_EQ(news(), (Texts{"notify me /kept/_/watched []"}));
+    EXPECT_EQ(newsOf(other, Operation::kPush, "/kept/x"),
+              (Texts{R"(notify me /kept/_/watched [0: "x"])"}));
     other.reset();
     ASSERT_TRUE(rig_.waitForDrop());
     EXPECT_EQ(get("/kept/x/_/watchers"), "[]");

@@ -108,6 +108,7 @@ TEST_F(RestServer, ListsConnectionsThatRegisteredOnceAndForgetsThem) {
     rig.add("/author", author());
     const RawRestClient& me = start();
     me.registerName();
+    EXPECT_EQ(me.textAt("/connections"), R"([0: "me"])");
     auto other = rig.registeredClient("b");
     EXPECT_EQ(other->textAt("/connections"), R"([0: "b",1: "me"])");
     const auto third = rig.registeredClient("b");
