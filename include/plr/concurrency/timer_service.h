@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <concepts>
 #include <cstdint>
 #include <functional>
 #include <memory>
@@ -50,9 +51,8 @@ class PLR_EXPORT TimerService {
         scheduleAfterImpl(std::move(name), delay.time(), std::move(queue),
                           blockOf(std::forward<Work>(work)));
     }
-    template <class Work>
-    requires std::is_invocable_v < std::decay_t<Work>
-    & > void runAfter(TimerDelay delay, Work&& work, std::string name = {}) {
+    template <std::invocable Work>
+    void runAfter(TimerDelay delay, Work&& work, std::string name = {}) {
         runAfter(delay, dispatch::queue::global(), std::forward<Work>(work), std::move(name));
     }
 
@@ -63,10 +63,9 @@ class PLR_EXPORT TimerService {
         return createOneShotTimerImpl(std::move(name), delay.time(), std::move(queue),
                                       blockOf(std::forward<Work>(work)));
     }
-    template <class Work>
-    requires std::is_invocable_v < std::decay_t<Work>
-    & > [[nodiscard]] std::unique_ptr<Timer> startTimer(TimerDelay delay, Work&& work,
-                                                        std::string name = {}) {
+    template <std::invocable Work>
+    [[nodiscard]] std::unique_ptr<Timer> startTimer(TimerDelay delay, Work&& work,
+                                                    std::string name = {}) {
         return startTimer(delay, dispatch::queue::global(), std::forward<Work>(work),
                           std::move(name));
     }
@@ -81,10 +80,9 @@ class PLR_EXPORT TimerService {
         return createPeriodicTimerImpl(std::move(name), period.time(), std::move(queue),
                                        blockOf(std::forward<Work>(work)));
     }
-    template <class Work>
-    requires std::is_invocable_v < std::decay_t<Work>
-    & > [[nodiscard]] std::unique_ptr<Timer> startPeriodicTimer(TimerDelay period, Work&& work,
-                                                                std::string name = {}) {
+    template <std::invocable Work>
+    [[nodiscard]] std::unique_ptr<Timer> startPeriodicTimer(TimerDelay period, Work&& work,
+                                                            std::string name = {}) {
         return startPeriodicTimer(period, dispatch::queue::global(), std::forward<Work>(work),
                                   std::move(name));
     }

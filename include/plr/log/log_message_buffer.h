@@ -221,11 +221,13 @@ PLR_EXPORT LogMessageBuffer& operator<<(LogMessageBuffer& buffer, ObNumber* numb
 
 // Whatever else a standard stream takes: std::setw(), your own types. (The buffer's
 // type is deduced so that asking a stream for its operators does not end up here.)
-template <std::same_as<LogMessageBuffer> Buffer, class T>
-requires((std::is_class_v<T> || std::is_enum_v<T>)&&requires(std::ostream& stream, const T& value) {
+template <class T>
+concept Streamable = (std::is_class_v<T> || std::is_enum_v<T>)&&requires(std::ostream& stream,
+                                                                         const T& value) {
     stream << value;
-}) Buffer&
-operator<<(Buffer& buffer, const T& value) {
+};
+template <std::same_as<LogMessageBuffer> Buffer, Streamable T>
+Buffer& operator<<(Buffer& buffer, const T& value) {
     static_cast<std::ostream&>(buffer) << value;
     return buffer;
 }
