@@ -48,6 +48,7 @@ struct AsioPeer {
             });
         }
         void disarm() { timer_.cancel(); }
+        static std::int64_t periods() { return 1; }
 
       private:
         static std::chrono::steady_clock::time_point at(std::int64_t nanoseconds) {

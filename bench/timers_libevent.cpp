@@ -63,6 +63,7 @@ struct LibeventPeer {
             event_add(event_, &delay);
         }
         void disarm() { event_del(event_); }
+        static std::int64_t periods() { return 1; }
 
       private:
         event* make(short kind) {

@@ -53,6 +53,8 @@ struct LibuvPeer {
         }
         void disarm() { uv_timer_stop(&made_->handle); }
 
+        static std::int64_t periods() { return 1; }
+
       private:
         void start(std::int64_t delay, std::int64_t period) {
             constexpr auto kUnit = static_cast<std::uint64_t>(bench::timers_cases::kMillisecond);

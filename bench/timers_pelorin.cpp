@@ -35,6 +35,7 @@ struct PelorinPeer {
             set(first, std::chrono::nanoseconds(period));
         }
         void disarm() { source_.set_timer(dispatch::forever, dispatch::kOnce); }
+        std::int64_t periods() const { return static_cast<std::int64_t>(source_.data()); }
 
       private:
         void set(std::int64_t deadline, std::chrono::nanoseconds interval) {

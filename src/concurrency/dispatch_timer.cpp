@@ -4,6 +4,8 @@
 
 namespace plr {
 
+static_assert(sizeof(DispatchTimer) <= dispatch::detail::kSmallBlock);
+
 DispatchTimer::DispatchTimer(dispatch::source source, std::weak_ptr<void> token)
     : source_(std::move(source)), token_(std::move(token)) {
     source_.resume();

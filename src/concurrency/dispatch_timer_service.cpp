@@ -1,6 +1,6 @@
 #include "plr/concurrency/dispatch_timer_service.h"
 
-#include <limits>
+#include <cstddef>
 #include <utility>
 
 #include "plr/base/assert.h"
@@ -25,6 +25,22 @@ nanoseconds toNanoseconds(microseconds count) {
         return nanoseconds::min();
     return count;
 }
+
+// Recycled memory for what is as small as a token with its counts.
+template <class T>
+struct SmallAllocator {
+    using value_type = T;
+    SmallAllocator() = default;
+    template <class U>
+    explicit SmallAllocator(const SmallAllocator<U>&) noexcept {}
+    T* allocate(std::size_t count) {
+        static_assert(sizeof(T) <= dispatch::detail::kSmallBlock && alignof(T) <= 16);
+        PLR_ASSERT(count == 1, "for single objects");
+        return static_cast<T*>(dispatch::detail::allocate_small());
+    }
+    void deallocate(T* unused, std::size_t) noexcept { dispatch::detail::recycle_small(unused); }
+    friend bool operator==(SmallAllocator, SmallAllocator) noexcept { return true; }
+};
 
 // A handler that holds its own source goes only when the source is cancelled.
 struct CancelUnlessKept {
@@ -119,7 +135,7 @@ std::unique_ptr<Timer> DispatchTimerService::createDispatchTimer(
     dispatch::block<void()> block) const {
     const dispatch::source source = dispatch::source::timer(queue);
     CancelUnlessKept guard{source};
-    std::shared_ptr<void> token = std::make_shared<bool>(false);
+    std::shared_ptr<void> token = std::allocate_shared<bool>(SmallAllocator<bool>(), false);
     const std::weak_ptr<void> observer = token;
     if (interval == dispatch::kOnce)
         source.set_event_handler(dispatch::block<void()>([block = std::move(block), source] {

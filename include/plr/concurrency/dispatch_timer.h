@@ -9,7 +9,7 @@
 namespace plr {
 
 // The timer of a dispatch timer source.
-class PLR_EXPORT DispatchTimer final : public Timer {
+class PLR_EXPORT DispatchTimer final : public Timer, public dispatch::detail::from_store {
   public:
     // Takes over a source that is set up, and resumes it, which arms it. The
     // source's cancel handler is what keeps the object of `token` alive: once it

@@ -34,11 +34,20 @@ struct timer_store {
 };
 using timer_memories = plr::detail::Magazines<timer_memory, timer_store>;
 
+// What a timer is set to. A class of its own so that it fills up the cache line
+// in front of the timer entry.
+class timer_setting : public source_core {
+  protected:
+    using source_core::source_core;
+    time start_ PLR_GUARDED_BY(lock_) = forever;
+    std::int64_t period_ PLR_GUARDED_BY(lock_) = 0;  // nanoseconds; 0 for once
+};
+
 // The timer queue's lock guards its sources too: arming is one lock.
-class timer_source final : public source_core, timer_entry {
+class timer_source final : public timer_setting, timer_entry {
   public:
     explicit timer_source(const queue& on) noexcept
-        : source_core(on, timers().lock()), timer_entry(&timer_source::fire) {}
+        : timer_setting(on, timers().lock()), timer_entry(&timer_source::fire) {}
 
     static void* operator new(std::size_t size);
     static void operator delete(void* memory) noexcept;
@@ -46,7 +55,7 @@ class timer_source final : public source_core, timer_entry {
     void set_timer(time start, std::chrono::nanoseconds interval) override {
         scoped_lock guard(lock_);
         start_ = start;
-        interval_ = std::max<std::int64_t>(interval.count(), 0);
+        period_ = std::max<std::int64_t>(interval.count(), 0);
         if (is(kArmed) && !is_cancelled())
             set();
     }
@@ -60,7 +69,7 @@ class timer_source final : public source_core, timer_entry {
     }
     void set() noexcept PLR_REQUIRES(lock_) {
         timers().lock().assert_held();
-        timers().arm(*this, start_, interval_);
+        timers().arm(*this, start_, period_);
     }
     void arm() override PLR_REQUIRES(lock_) {
         set();
@@ -70,10 +79,8 @@ class timer_source final : public source_core, timer_entry {
         timers().lock().assert_held();
         timers().disarm(*this);
     }
-
-    time start_ PLR_GUARDED_BY(lock_) = forever;
-    std::int64_t interval_ PLR_GUARDED_BY(lock_) = 0;  // nanoseconds; 0 for once
 };
+static_assert(sizeof(timer_source) == 192);
 
 struct alignas(64) timer_memory {
     std::byte bytes[sizeof(timer_source)];
