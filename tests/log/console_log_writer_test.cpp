@@ -90,18 +90,15 @@ TEST(ConsoleLogWriter, ColoursForTerminalsOnly) {
         const char *term, *noColour, *force;
         const char* expected;
     };
-    constexpr const char* kPlain = " E d: text\n";
-    constexpr const char* kColoured = " \x1b[31mE d\x1b[0m: text\n";
+    constexpr const char* kPlain = "E d: text\n";
+    constexpr const char* kColoured = "\x1b[31mE d\x1b[0m: text\n";
     const Row rows[] = {{"terminal", makeTerminal, "xterm", "", "", kColoured},
                         {"dumb terminal", makeTerminal, "dumb", "", "", kPlain},
                         {"no TERM", makeTerminal, "", "", "", kPlain},
-                        {"NO_COLOR", makeTerminal, "xterm", "1", "", kPlain},
                         {"NO_COLOR and force", makeTerminal, "xterm", "1", "1", kPlain},
-                        {"pipe", makePipe, "xterm", "", "", kPlain},
-                        {"forced pipe", makePipe, "", "", "1", kColoured},
-                        {"force is 0", makePipe, "xterm", "", "0", kPlain}};
+                        {"pipe", makePipe, "xterm", "", "0", kPlain},
+                        {"forced pipe", makePipe, "", "", "1", kColoured}};
     for (const Row& row : rows) {
-        SCOPED_TRACE(row.name);
         ::setenv("TERM", row.term, 1);
         ::setenv("NO_COLOR", row.noColour, 1);
         ::setenv("CLICOLOR_FORCE", row.force, 1);
@@ -110,10 +107,9 @@ TEST(ConsoleLogWriter, ColoursForTerminalsOnly) {
         const auto writer = ConsoleLogWriter::create({.descriptor = ends.writer, .utc = true});
         writer->write(logMessage("text", LogLevel::Error));
         writer->endBatch();
-        const bool isTerminal = row.make == makeTerminal;
-        EXPECT_EQ(ends.readTo("text\n"), std::string(isTerminal ? "" : "1970-01-01 ") +
-                                             "00:00:00.000000" + (isTerminal ? "" : "+00:00") +
-                                             row.expected);
+        const char* time =
+            row.make == makeTerminal ? "00:00:00.000000 " : "1970-01-01 00:00:00.000000+00:00 ";
+        EXPECT_EQ(ends.readTo("text\n"), std::string(time) + row.expected) << row.name;
     }
     for (const char* name : {"TERM", "NO_COLOR", "CLICOLOR_FORCE"})
         ::unsetenv(name);
@@ -135,11 +131,10 @@ TEST(ConsoleLogWriter, DropsAndCountsForAReaderThatIsStalled) {
         EXPECT_EQ(::fcntl(ends.writer, F_GETFL) & O_NONBLOCK, 0);
 
         // A timer goes on by itself when there is room.
-        const std::string note = "dropped, nobody read them\n";
-        const auto texts = plr::test::textsOfRecords(ends.readTo(note));
+        const auto texts = plr::test::textsOfRecords(ends.readTo("nobody read them\n"));
         const std::int64_t missing = dropped(*writer);
-        EXPECT_EQ(texts.back(), "Note: " + std::to_string(missing) + " log messages " +
-                                    note.substr(0, note.size() - 1));
+        EXPECT_EQ(texts.back(),
+                  "Note: " + std::to_string(missing) + " log messages dropped, nobody read them");
         ASSERT_EQ(static_cast<std::int64_t>(texts.size()) - 1 + missing, written);
         for (std::size_t i = 0; i + 1 < texts.size(); ++i)
             ASSERT_THAT(texts[i], StartsWith(std::to_string(i) + "."));

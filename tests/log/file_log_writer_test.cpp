@@ -6,10 +6,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <cstdlib>
 #include <fstream>
-#include <functional>
 #include <system_error>
 #include <thread>
 
@@ -38,7 +36,8 @@ std::string ten(int number) {
 class FileWriter : public testing::Test {
   protected:
     FileWriter() {
-        plr::setReportHook([](const char*) noexcept { ++reports_; });
+        report_.clear();
+        plr::setReportHook([](const char* line) noexcept { report_ = line; });
     }
     ~FileWriter() override { plr::setReportHook(nullptr); }
 
@@ -56,15 +55,12 @@ class FileWriter : public testing::Test {
         const vox::dict dictionary(writer_->getFullConfig());
         return vox::dyn_cast_or_default(dictionary[key], std::int64_t{-1});
     }
-    std::string lastError() const {
-        return std::string(vox::dict(writer_->getFullConfig()).text("kLastError"));
-    }
     std::vector<std::string> texts(const std::string& name) const {
         return textsOfRecords(folder_.read(name));
     }
     bool exists(const char* name) const { return ::access(folder_.at(name).c_str(), F_OK) == 0; }
 
-    static inline std::atomic<int> reports_{0};
+    static inline std::string report_;  // the last one
     plr::test::ScratchFolder folder_;
     std::shared_ptr<FileLogWriter> writer_;
 };
@@ -78,7 +74,6 @@ TEST_F(FileWriter, WritesRecordsByLocalTime) {
     };
     constexpr plr::TimeStamp kSecond = 1'000'000'000;
     const Row rows[] = {
-        {"UTC0", false, 0, "1970-01-01 00:00:00.000000+00:00"},
         {"UTC0", false, -1, "1969-12-31 23:59:59.999999+00:00"},
         {"CET-1CEST,M3.5.0,M10.5.0/3", false, 1'711'846'799 * kSecond + 999'999'999,
          "2024-03-31 01:59:59.999999+01:00"},
@@ -101,14 +96,12 @@ TEST_F(FileWriter, WritesRecordsByLocalTime) {
 
 TEST_F(FileWriter, RotatesBetweenRecords) {
     open({.path = "", .maxBytes = 3 * kRecord + 1, .oldFiles = 2, .mode = 0600});
-    write(1, 4);
-    write(5, 11);
+    write(1, 11);
     EXPECT_THAT(texts("log"), ElementsAre(ten(10), ten(11)));
     EXPECT_THAT(texts("log.1"), ElementsAre(ten(7), ten(8), ten(9)));
     EXPECT_THAT(texts("log.2"), ElementsAre(ten(4), ten(5), ten(6)));
     EXPECT_FALSE(exists("log.3"));
     EXPECT_EQ(config("kRotations"), 3);
-    EXPECT_EQ(config("kBytes"), static_cast<std::int64_t>(2 * kRecord));
     struct stat status {};
     ASSERT_EQ(::stat(folder_.at("log").c_str(), &status), 0);
     EXPECT_EQ(status.st_mode & 0777u, 0600u);
@@ -119,30 +112,23 @@ TEST_F(FileWriter, RotatesBetweenRecords) {
     EXPECT_THAT(texts("log.1"), ElementsAre(std::string(1000, 'x')));
 }
 
-TEST_F(FileWriter, EmptiesItsFileWhenItKeepsNoOldOnes) {
-    open({.path = "", .maxBytes = 2 * kRecord, .oldFiles = 0});
-    write(1, 3);
-    EXPECT_THAT(texts("log"), ElementsAre(ten(3)));
-    EXPECT_FALSE(exists("log.1"));
-}
-
 TEST_F(FileWriter, GoesOnWhereAnEarlierProcessStopped) {
     std::ofstream(folder_.at("log")) << "1970-01-01 00:00:00.000000+00:00 I d: cut sho";
-    open({.path = "", .maxBytes = 2 * kRecord});
-    write(1, 2);
-    EXPECT_THAT(texts("log.1"), ElementsAre("cut sho", ten(1)));
+    open({.path = "", .maxBytes = 2 * kRecord, .oldFiles = 0});
+    write(1, 1);
+    EXPECT_THAT(texts("log"), ElementsAre("cut sho", ten(1)));
+    write(2, 2);
     EXPECT_THAT(texts("log"), ElementsAre(ten(2)));
+    EXPECT_FALSE(exists("log.1"));
 }
 
 TEST_F(FileWriter, KeepsWritingToTheOldFileWhenRotationFails) {
     std::filesystem::create_directories(folder_.at("log.1/full"));
     open({.path = "", .maxBytes = kRecord, .oldFiles = 1});
-    reports_ = 0;
     write(1, 2);
     write(3, 3);
     EXPECT_THAT(texts("log"), ElementsAre(ten(1), ten(2), ten(3)));
-    EXPECT_NE(lastError(), "");
-    EXPECT_GT(reports_, 0);
+    EXPECT_NE(report_, "");
     std::filesystem::remove_all(folder_.at("log.1"));
     write(4, 4);
     EXPECT_THAT(texts("log.1"), ElementsAre(ten(1), ten(2), ten(3)));
@@ -205,7 +191,7 @@ TEST_F(FileWriter, LosesNothingWhileWhatItCannotWriteFitsIntoMemory) {
         writer_->flush(dispatch::group_session(flushed));
         EXPECT_EQ(folder_.read("log").size(), 2 * kRecord + 7);
         EXPECT_NE(flushed.wait(dispatch::time()), 0);
-        EXPECT_EQ(lastError(), "File too large");
+        EXPECT_EQ(vox::dict(writer_->getFullConfig()).text("kLastError"), "File too large");
     }
     // A timer tries again.
     EXPECT_EQ(flushed.wait(dispatch::time::after(plr::test::kBound)), 0);
@@ -220,7 +206,6 @@ TEST_F(FileWriter, CountsWhatItDropsAndSaysSoAtTheGap) {
     write(1, 3);   // one and a bit in the file, the rest is kept
     write(4, 10);  // two of them are kept
     write(11, 20);
-    EXPECT_EQ(config("kDropped"), 15);
     limit.lift();
     write(21, 21);
     EXPECT_THAT(
@@ -228,19 +213,6 @@ TEST_F(FileWriter, CountsWhatItDropsAndSaysSoAtTheGap) {
         ElementsAre(ten(1), ten(2), ten(3), ten(4), ten(5),
                     "Note: 15 log messages dropped, the file could not be written", ten(21)));
     EXPECT_EQ(config("kDropped"), 15);
-}
-
-TEST_F(FileWriter, MovesFromAFullDiskToANewFile) {
-    std::filesystem::create_symlink("/dev/full", folder_.at("log"));
-    open({.path = "", .maxKeptBytes = 2 * kRecord});
-    write(1, 5);
-    EXPECT_EQ(lastError(), "No space left on device");
-    std::filesystem::remove(folder_.at("log"));
-    writer_->reopen();
-    write(6, 6);
-    EXPECT_THAT(texts("log"),
-                ElementsAre(ten(1), ten(2),
-                            "Note: 3 log messages dropped, the file could not be written", ten(6)));
 }
 
 TEST_F(FileWriter, TakesARecordsBeginningOffTheFileItLeaves) {
@@ -264,12 +236,10 @@ TEST_F(FileWriter, TakesARecordsBeginningOffTheFileItLeaves) {
 TEST_F(FileWriter, ReportsWhatItHasToLeaveUnwritten) {
     std::filesystem::create_symlink("/dev/full", folder_.at("log"));
     open();
-    static std::string last;
-    plr::setReportHook([](const char* line) noexcept { last = line; });
     write(1, 3);
-    EXPECT_THAT(last, HasSubstr("No space left on device"));
+    EXPECT_THAT(report_, HasSubstr("No space left on device"));
     writer_->close();
-    EXPECT_THAT(last, HasSubstr("closed without the last 3 log messages"));
+    EXPECT_THAT(report_, HasSubstr("closed without the last 3 log messages"));
 }
 
 }  // namespace

@@ -4,7 +4,6 @@
 #include <gtest/gtest.h>
 
 #include "plr/log/logger.h"
-#include "plr/log/shared_loggable.h"
 #include "plr/log/staged_logger.h"
 #include "support/log_fixture.h"
 
@@ -22,13 +21,6 @@ void wrong(const StaticLogger& logger) {
 }
 #endif
 
-class Radio : public plr::SharedLoggable<Radio> {
-  public:
-    explicit Radio(std::shared_ptr<plr::LogServer> server)
-        : SharedLoggable("Radio", "radio", std::move(server)) {}
-    void registered(int cell) const { plr::logNotice(*this, "cell {}", cell); }
-};
-
 using FmtFront = plr::test::LogFixture;
 
 TEST_F(FmtFront, LogsFormattedTextThroughEveryKindOfLogger) {
@@ -44,11 +36,9 @@ TEST_F(FmtFront, LogsFormattedTextThroughEveryKindOfLogger) {
         plr::logInfo(staged, "{}", 1);
         plr::logWarn(staged, "{}", 2);
     }
-    Radio::make_shared_ptr(new Radio(server_))->registered(17);
     EXPECT_THAT(takeLines(),
                 ElementsAre("I static beef text", "W static {" + std::string(1000, 'x') + "}",
-                            "E static nothing to fill in", "F tracked true", "W staged 1\n2",
-                            "N radio cell 17"));
+                            "E static nothing to fill in", "F tracked true", "W staged 1\n2"));
 }
 
 TEST_F(FmtFront, ComposesOnlyWhatIsEnabled) {

@@ -179,12 +179,6 @@ TEST_P(WriterContract, IgnoresWhatComesAfterItsClose) {
     EXPECT_THAT(place_->texts(1), ElementsAre("before"));
 }
 
-TEST_P(WriterContract, DescribesItselfByADictionaryOrNotAtAll) {
-    for (const vox::object& config :
-         {place_->writer().getSimpleConfig(), place_->writer().getFullConfig()})
-        EXPECT_TRUE(!config || vox::dict(config));
-}
-
 TEST_P(WriterContract, WritesInACrashBehindWhatItGathered) {
     plr::BatchLogWriter* writer = place_->batching();
     if (!writer)

@@ -16,7 +16,6 @@ using plr::LogMessageBuffer;
 using plr::LogServer;
 using plr::test::Event;
 using testing::ElementsAre;
-using testing::IsEmpty;
 
 enum class Fails { Nowhere, InItsConstructor, WhenRegistered };
 
@@ -78,14 +77,8 @@ TEST_F(SharedLoggable, FollowsTheServerWithoutATurnOnItsQueue) {
     radio->setLogLevel(Notice);
     EXPECT_EQ(radio->getTrackedLogLevel(), Notice);
     radio->report(Notice, "now enough");
+    Radio::create(nullptr)->report(Fatal, "to nobody");
     EXPECT_THAT(takeLines(), ElementsAre("W radio enough", "N radio now enough"));
-}
-
-TEST_F(SharedLoggable, KeepsItsOwnLevelWithoutAServer) {
-    const auto radio = Radio::create(nullptr);
-    radio->report(Fatal, "to nobody");
-    EXPECT_TRUE(radio->logger().enabled(Always));
-    EXPECT_THAT(takeLines(), IsEmpty());
 }
 
 TEST_F(SharedLoggable, ThatFailsLeavesNoQueue) {
@@ -96,25 +89,6 @@ TEST_F(SharedLoggable, ThatFailsLeavesNoQueue) {
                      std::runtime_error);
         EXPECT_TRUE(queueEnd.wait());
     }
-}
-
-// A class whose queue comes with another base, and whose owner is that base's.
-class Server : public plr::SharedSynchronizable<Server> {
-  public:
-    explicit Server() : SharedSynchronizable("server") {}
-    virtual ~Server() = default;
-};
-class LoggingServer : public Server, public plr::Loggable<LoggingServer> {
-  public:
-    explicit LoggingServer(const std::shared_ptr<LogServer>& server) : Loggable("server", server) {}
-    using Loggable::connectToLogServer_sync;
-};
-
-TEST_F(SharedLoggable, TracksALoggerBesideAnyQueue) {
-    const auto server = LoggingServer::make_shared_ptr(new LoggingServer(server_));
-    server->connectToLogServer_sync();
-    configure("server", Error);
-    EXPECT_EQ(server->logger().getLogLevel(), Error);
 }
 
 }  // namespace
