@@ -14,9 +14,8 @@
 namespace {
 
 using plr::test::FakeLog;
-using plr::test::kBound;
-using plr::test::LogPlaces;
 using Client = plr::test::LogClient;
+using KelBacklog = plr::test::LogClientFixture;
 
 constexpr unsigned kLong = 60'000;  // ms
 
@@ -31,35 +30,7 @@ std::uint64_t numberOf(const plr::test::JournalFields& fields, const std::string
     return 0;
 }
 
-TEST(KelBacklog, WhatDoesNotFitIsCountedAndReportedOnceInItsPlace) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
-    const Client client;
-    limitMessages(client, 20);
-    constexpr std::uint64_t kCount = 100;
-    for (std::uint64_t i = 0; i < kCount; i++)
-        client.send(std::to_string(i));
-    const kel_statistics full = client.statistics();
-    EXPECT_EQ(full.waiting, 20u);
-    EXPECT_GT(full.dropped, 0u);
-    EXPECT_EQ(full.sent + full.waiting + full.dropped, kCount);
-    for (std::uint64_t i = 0; i < kCount - full.dropped; i++)
-        EXPECT_EQ(journal.receiveField("MESSAGE"), std::to_string(i));
-    const auto gap = journal.receiveFields();
-    EXPECT_EQ(numberOf(gap, "KEL_DROPPED"), full.dropped);
-    EXPECT_EQ(numberOf(gap, "PRIORITY"), 4u);
-    EXPECT_EQ(gap[2].second, std::to_string(full.dropped) + " messages dropped");
-    EXPECT_TRUE(kel_flush(client.handle, kLong));
-    client.send("next");
-    EXPECT_EQ(journal.receiveField("MESSAGE"), "next");
-    EXPECT_EQ(client.statistics().sent, kCount - full.dropped + 1);
-    EXPECT_EQ(client.statistics().dropped, full.dropped);
-}
-
-TEST(KelBacklog, BytesAreLimitedTooButOneMessageOfAnySizeIsTaken) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
-    const Client client;
+TEST_F(KelBacklog, BytesAreLimitedTooButOneMessageOfAnySizeIsTaken) {
     kel_set_limits(client.handle, {1000, 1000, KEL_DEFAULT_PATIENCE_MS});
     while (client.statistics().waiting == 0)
         client.send(std::string(2000, 'x'));
@@ -70,15 +41,16 @@ TEST(KelBacklog, BytesAreLimitedTooButOneMessageOfAnySizeIsTaken) {
 
 // Every thread's messages arrive in order; with one thread, every gap is where
 // its messages are missing.
-void flood(std::size_t threads) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
-    const Client client;
+struct KelFlood : KelBacklog, testing::WithParamInterface<std::size_t> {};
+INSTANTIATE_TEST_SUITE_P(Threads, KelFlood, testing::Values(1, 4));
+
+TEST_P(KelFlood, IsInOrderAndAccountedForMessageByMessage) {
+    const std::size_t threads = GetParam();
     limitMessages(client, 40);
     constexpr std::uint64_t kEach = 3000;
     std::vector<std::jthread> writers;
     for (std::size_t t = 0; t < threads; t++)
-        writers.emplace_back([&client, t] {
+        writers.emplace_back([this, t] {
             for (std::uint64_t i = 0; i < kEach; i++)
                 client.send({{"Thread", std::to_string(t)}, {"Number", std::to_string(i)}});
         });
@@ -89,6 +61,8 @@ void flood(std::size_t threads) {
         const auto fields = journal.receiveFields();
         ASSERT_FALSE(fields.empty());
         if (const std::uint64_t dropped = numberOf(fields, "KEL_DROPPED")) {
+            EXPECT_EQ(numberOf(fields, "PRIORITY"), 4u);
+            EXPECT_EQ(fields[2].second, std::to_string(dropped) + " messages dropped");
             gaps += dropped;
             next[0] += threads == 1 ? dropped : 0;
             continue;
@@ -106,34 +80,24 @@ void flood(std::size_t threads) {
     EXPECT_EQ(client.statistics().dropped, gaps);
 }
 
-TEST(KelBacklog, AFloodOfOneThreadIsAccountedForMessageByMessage) {
-    flood(1);
-}
-TEST(KelBacklog, AFloodOfManyThreadsKeepsEachOnesOrderAndTheCounts) {
-    flood(4);
-}
-
-TEST(KelBacklog, AJournalThatComesBackGetsEverythingInOrder) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
+TEST_F(KelBacklog, AJournalThatComesBackGetsInOrderWhatFitted) {
     FakeLog syslog(places.syslog());
-    const Client client;
-    client.send("0");
-    EXPECT_EQ(journal.receiveField("MESSAGE"), "0");
+    limitMessages(client, 20);
+    client.send("first");
+    EXPECT_EQ(journal.receiveField("MESSAGE"), "first");
     journal.stop();
-    for (int i = 1; i <= 50; i++)
+    for (int i = 0; i < 25; i++)
         client.send(std::to_string(i));
-    EXPECT_EQ(client.statistics().waiting, 50u);
+    EXPECT_EQ(client.statistics().waiting, 20u);
+    EXPECT_EQ(client.statistics().dropped, 5u);
     journal.start();
-    for (int i = 1; i <= 50; i++)
+    for (int i = 0; i < 20; i++)
         EXPECT_EQ(journal.receiveField("MESSAGE"), std::to_string(i));
+    EXPECT_EQ(journal.receiveField("MESSAGE"), "5 messages dropped");
     EXPECT_FALSE(syslog.hasMore());
 }
 
-TEST(KelBacklog, TheNextBestLogServesUntilTheBetterOneIsBack) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
-    const Client client;
+TEST_F(KelBacklog, TheNextBestLogServesUntilTheBetterOneIsBack) {
     kel_set_limits(client.handle, {10, KEL_DEFAULT_BYTES, 0});
     journal.stop();
     client.send("console");
@@ -152,9 +116,9 @@ TEST(KelBacklog, TheNextBestLogServesUntilTheBetterOneIsBack) {
     EXPECT_EQ(journal.receiveField("MESSAGE"), "journal");
 }
 
-TEST(KelBacklog, AConsoleThatNobodyReadsHoldsNobodyUp) {
-    LogPlaces places;
-    const Client client("test");
+TEST_F(KelBacklog, AConsoleThatNobodyReadsHoldsNobodyUp) {
+    journal.stop();
+    kel_set_limits(client.handle, {1000, KEL_DEFAULT_BYTES, 0});
     const std::string end(3000, '.');
     constexpr int kCount = 100;  // several times what a pipe holds
     for (int i = 0; i < kCount; i++)
@@ -170,22 +134,7 @@ TEST(KelBacklog, AConsoleThatNobodyReadsHoldsNobodyUp) {
     EXPECT_EQ(text, expected);
 }
 
-TEST(KelBacklog, ClosingGivesUpWhatTheLogDoesNotTake) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
-    const kel_client_t client = kel_open("test", nullptr, 0);
-    const kel_message_t message = kel_new(0);
-    for (int i = 0; i < 50; i++)
-        kel_send(client, message);
-    kel_free(message);
-    const kel_statistics before = kel_get_statistics(client);
-    EXPECT_EQ(kel_close(client), 50 - before.sent);
-}
-
-TEST(KelBacklog, AForkedChildLogsAndLeavesItsParentsBacklogAlone) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
-    const Client client;
+TEST_F(KelBacklog, AForkedChildLogsAndLeavesItsParentsBacklogAlone) {
     journal.stop();
     client.send("parent");
     const pid_t child = ::fork();
@@ -203,20 +152,14 @@ TEST(KelBacklog, AForkedChildLogsAndLeavesItsParentsBacklogAlone) {
     EXPECT_FALSE(journal.hasMore());
 }
 
-TEST(KelBacklog, ACrashHandsOverWhatWaits) {
-    LogPlaces places;
-    FakeLog journal(places.journal());
-    const kel_client_t client = kel_open("test", nullptr, 0);  // not used after the crash
-    const kel_message_t message = kel_new(0);
+TEST_F(KelBacklog, ACrashHandsOverWhatWaits) {
+    static const auto& crashed = *new Client;  // not used afterwards
     std::uint64_t count = 0;
-    for (; kel_get_statistics(client).waiting < 3; count++) {
-        kel_set(message, "Number", std::to_string(count).c_str());
-        kel_send(client, message);
-    }
-    kel_free(message);
+    for (; crashed.statistics().waiting < 3; count++)
+        crashed.send({{"Number", std::to_string(count)}});
     for (std::uint64_t i = 0; i < count - 3; i++)
         EXPECT_EQ(journal.receiveField("NUMBER"), std::to_string(i));
-    EXPECT_TRUE(kel_flush_now(client));
+    EXPECT_TRUE(kel_flush_now(crashed.handle));
     for (std::uint64_t last = 0; last != count - 1;)  // some may come twice
         last = numberOf(journal.receiveFields(), "NUMBER");
 }

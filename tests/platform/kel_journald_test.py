@@ -39,10 +39,10 @@ def skip(reason):
 
 
 def enter_namespace():
-    for needed in (DAEMON, "/usr/bin/journalctl"):
+    for needed in (DAEMON, "/usr/bin/journalctl", "/etc/machine-id"):
         if not os.path.exists(needed):
-            skip(f"{needed} is not installed")
-    if not re.fullmatch(r"[0-9a-f]{32}\n?", read_machine_id()):
+            skip(f"{needed} is missing")
+    if not re.fullmatch(r"[0-9a-f]{32}\n?", pathlib.Path("/etc/machine-id").read_text()):
         skip("/etc/machine-id is not valid")
     unshare = ["unshare", "-m" if os.geteuid() == 0 else "-Urm", "--propagation", "private", "sh", "-c",
                'mount -t tmpfs -o mode=0755 tmpfs /run && exec "$@"', "sh"]
@@ -50,13 +50,6 @@ def enter_namespace():
     if trial.returncode != 0:
         skip(f"no private mount namespace: {trial.stderr.strip()}")
     os.execvp("unshare", [*unshare, sys.executable, "-B", __file__, WRITER, "--inside"])
-
-
-def read_machine_id():
-    try:
-        return pathlib.Path("/etc/machine-id").read_text()
-    except OSError:
-        return ""
 
 
 class Daemon:

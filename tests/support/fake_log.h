@@ -167,4 +167,11 @@ struct LogClient {
     const kel_client_t handle;
 };
 
+// A client that sends to a log of the test's own.
+struct LogClientFixture : testing::Test {
+    LogPlaces places;
+    FakeLog journal{places.journal()};
+    const LogClient client;
+};
+
 }  // namespace plr::test
