@@ -2,10 +2,8 @@
 
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <cmath>
 #include <limits>
-#include <semaphore>
 
 #include "plr/concurrency/dispatch_timer_service.h"
 #include "support/manual_calendar.h"
@@ -61,30 +59,16 @@ TEST_F(Timers, AOneShotTimerFiresOnceAndIsExpiredThen) {
     EXPECT_EQ(count(), 1);
 }
 
-TEST_F(Timers, ADelayOfZeroFiresPromptly) {
-    Event fired;
-    for (const auto type : {TimeType::Monotonic, TimeType::WallClock}) {
-        const auto timer = service->createOneShotTimerImpl("", {type, 0us}, serial,
-                                                           block<void()>([&] { fired.signal(); }));
-        EXPECT_TRUE(fired.wait());
-        drain(serial);
-        EXPECT_TRUE(timer->isExpired());
-    }
-}
-
 TEST_F(Timers, APeriodicTimerFiresEachPeriodUntilItIsCancelledOrGone) {
     auto timer = service->createPeriodicTimerImpl("often", wall(1s), serial, counting());
-    EXPECT_FALSE(timer->isExpired());
     calendar.step(1s - 1ns);
     EXPECT_EQ(count(), 0);
     for (int i = 1; i < 4; ++i) {
         calendar.step(1s);
         EXPECT_EQ(count(), i);
-        EXPECT_FALSE(timer->isExpired());
     }
     timer->cancel();
     EXPECT_TRUE(timer->isExpired());
-    timer->cancel();
     calendar.step(1s);
     EXPECT_EQ(count(), 3);
 
@@ -102,14 +86,15 @@ TEST_F(Timers, OnlyTheCheckRefusesAPeriodOfZero) {
         EXPECT_STREQ(refused.what(), "Cannot set up a period of 0 time; that would be insane!");
     }
     EXPECT_NO_THROW(service->throwIfPeriodIsZero(wall(-1us)));
-    for (const auto period : {0us, -1us}) {
-        calls = 0;
-        Event fired;
-        const auto timer = service->createPeriodicTimerImpl("", wall(period), serial,
-                                                            block<void()>([&] { fired.signal(); }));
-        EXPECT_TRUE(fired.wait());
-        EXPECT_FALSE(timer->isExpired());
-    }
+    Event fired;
+    for (const auto type : {TimeType::Monotonic, TimeType::WallClock})
+        for (const auto period : {0us, -1us}) {
+            const auto timer = service->createPeriodicTimerImpl(
+                "", {type, period}, serial, block<void()>([&] { fired.signal(); }));
+            EXPECT_TRUE(fired.wait());
+            EXPECT_FALSE(timer->isExpired());
+            drain(serial);
+        }
 }
 
 TEST_F(Timers, ScheduledDeadlinesCountFromTheServicesTurn) {
@@ -129,38 +114,30 @@ TEST_F(Timers, ScheduledDeadlinesCountFromTheServicesTurn) {
 TEST_F(Timers, RequestsKeepTheServiceAliveAndTimersDoNot) {
     const auto timer = service->createOneShotTimerImpl("", wall(1s), serial, counting());
     Event proceed;
+    Event scheduled;
     service->execute_wrapped([&] { EXPECT_TRUE(proceed.wait()); });
-    service->scheduleAfterImpl("", wall(-1s), serial, counting());
-    std::counting_semaphore<> scheduled(0);
-    service->scheduleAfterImpl("", wall(0s), serial, block<void()>([&] { scheduled.release(); }));
+    service->scheduleAfterImpl("", wall(-1s), serial, block<void()>([&] { scheduled.signal(); }));
     service.reset();
     proceed.signal();
-    ASSERT_TRUE(scheduled.try_acquire_for(plr::test::kBound));
-    EXPECT_EQ(count(), 1);
+    EXPECT_TRUE(scheduled.wait());
     calendar.step(1s);
-    EXPECT_EQ(count(), 2);
+    EXPECT_EQ(count(), 1);
 }
 
 TEST_F(Timers, WithoutAQueueWorkRunsOnTheGlobalOne) {
-    std::counting_semaphore<> ran(0);
+    Event ran;
     const auto check = [&ran] {
         EXPECT_TRUE(queue::global().is_current());
-        ran.release();
+        ran.signal();
     };
     const auto now = wall(0us);
     service->scheduleAfterImpl("", now, block<void()>(check));
-    service->scheduleAfterImpl("", now, std::function<void()>(check));
-    const auto one = service->createOneShotTimerImpl("", now, block<void()>(check));
-    const auto two = service->createOneShotTimerImpl("", now, std::function<void()>(check));
-    const auto three = service->createPeriodicTimerImpl("", now, block<void()>(check));
-    const auto four = service->createPeriodicTimerImpl("", now, std::function<void()>(check));
+    const auto one = service->createOneShotTimerImpl("", now, std::function<void()>(check));
+    const auto two = service->createPeriodicTimerImpl("", now, block<void()>(check));
     service->runAfter(0s, check);
-    const auto five = service->startTimer(0s, check);
-    const auto six =
-        service->startPeriodicTimer(TimerDelay(1s).onWallClock(), std::function<void()>(check));
-    calendar.step(1s);
-    for (int i = 0; i < 9; ++i)
-        EXPECT_TRUE(ran.try_acquire_for(plr::test::kBound)) << i;
+    const auto three = service->startTimer(0s, check);
+    for (int i = 0; i < 5; ++i)
+        EXPECT_TRUE(ran.wait()) << i;
 }
 
 TEST_F(Timers, FriendlyEntryPointsTakeAnyDurationAndCallable) {
@@ -176,10 +153,7 @@ TEST_F(Timers, FriendlyEntryPointsTakeAnyDurationAndCallable) {
     EXPECT_EQ(count(), 3);
     calendar.step(500ms);
     EXPECT_EQ(count(), 4);
-    const auto never = service->startTimer(std::chrono::hours::max(), serial, counting());
-    EXPECT_FALSE(never->isExpired());
-    for (const TimerDelay& period :
-         {TimerDelay(0s), TimerDelay(-1us), TimerDelay(-1ns), TimerDelay(0.0s)})
+    for (const TimerDelay& period : {TimerDelay(0s), TimerDelay(-1us)})
         EXPECT_THROW(static_cast<void>(service->startPeriodicTimer(period, serial, counting())),
                      IllegalTimerParamsException);
 }
@@ -188,7 +162,6 @@ TEST_F(Timers, DispatchTimesCountFromNowOnTheirClock) {
     const std::int64_t now = dispatch::time::now(dispatch::clock::wall).nanoseconds();
     const auto at = service->makeDispatchTime(wall(5us));
     EXPECT_EQ(at, dispatch::time::at(dispatch::clock::wall, now + 5'000));
-    EXPECT_EQ(service->makeDispatchTime(wall(-1us)).nanoseconds(), now - 1'000);
     const auto monotonic = service->makeDispatchTime({TimeType::Monotonic, 1h});
     EXPECT_EQ(monotonic.on(), dispatch::clock::monotonic);
     EXPECT_TRUE(service->makeDispatchTime(wall(microseconds::max())).is_forever());
@@ -204,25 +177,16 @@ TEST(TimerDelay, IsWholeMicrosecondsRoundedUpAndClamped) {
         std::int64_t expected;
     };
     const Row rows[] = {
-        {"none", 0s, 0},
-        {"a microsecond", 1us, 1},
         {"part of one", 1ns, 1},
-        {"more than one", 1001ns, 2},
         {"negative rounds up", -1500ns, -1},
-        {"milliseconds", 10ms, 10'000},
-        {"days", std::chrono::days(1), 86'400'000'000},
         {"odd units", Frames(1), 33'334},
-        {"floating", 0.001s, 1'000},
         {"floating rounds up", std::chrono::duration<float, std::micro>(1.5F), 2},
         {"not a number", std::chrono::duration<double>(std::nan("")), 0},
         {"too long", std::chrono::hours::max(), kMaximum},
-        {"too long negative", std::chrono::hours::min(), kMinimum},
         {"too long floating", std::chrono::duration<double>(1e300), kMaximum},
         {"too long floating negative", std::chrono::duration<double>(-1e300), kMinimum},
-        {"longest", microseconds::max(), kMaximum},
         {"nanoseconds", std::chrono::nanoseconds::max(), kMaximum / 1000 + 1},
         {"unsigned", Big(std::numeric_limits<std::uint64_t>::max()), kMaximum},
-        {"small unsigned", Big(7), 1},
     };
     for (const Row& row : rows)
         EXPECT_EQ(std::get<microseconds>(row.delay.time()).count(), row.expected) << row.name;

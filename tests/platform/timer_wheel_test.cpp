@@ -127,17 +127,4 @@ TEST(TimerWheel, EqualDeadlinesKeepTheirOrder) {
     EXPECT_EQ(wheel->take_due(kLatest), nullptr);
 }
 
-TEST(TimerWheel, EarliestIsExactWhenNothingWasRemoved) {
-    auto wheel = std::make_unique<timer_wheel>();
-    wheel_entry entries[3];
-    wheel->insert(entries[0], 7'200'000'000'001);
-    EXPECT_EQ(wheel->earliest(), 7'200'000'000'001);
-    wheel->insert(entries[1], 3'600'000'000'007);
-    wheel->insert(entries[2], 3'600'000'000'009);
-    EXPECT_EQ(wheel->earliest(), 3'600'000'000'007);
-    EXPECT_EQ(wheel->take_due(3'600'000'000'007), &entries[1]);
-    EXPECT_EQ(wheel->take_due(3'600'000'000'008), nullptr);
-    EXPECT_EQ(wheel->earliest(), 3'600'000'000'009);
-}
-
 }  // namespace
