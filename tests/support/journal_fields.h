@@ -14,15 +14,6 @@ namespace plr::test {
 
 using JournalFields = std::vector<std::pair<std::string, std::string>>;
 
-inline bool isFieldName(std::string_view name) {
-    if (name.empty() || name.size() > 64 || name[0] < 'A' || name[0] > 'Z')
-        return false;
-    for (const char each : name)
-        if (!((each >= 'A' && each <= 'Z') || (each >= '0' && each <= '9') || each == '_'))
-            return false;
-    return true;
-}
-
 // The value that `input` begins with, without the line feed that ends it.
 inline std::optional<std::string> takeJournalValue(std::string_view& input, bool hasLength) {
     std::uint64_t length = 0;
@@ -46,7 +37,7 @@ inline std::optional<JournalFields> decodeJournalFields(std::string_view input) 
     JournalFields fields;
     while (!input.empty()) {
         const std::size_t end = input.find_first_of("=\n");
-        if (end == std::string_view::npos || !isFieldName(input.substr(0, end)))
+        if (end == std::string_view::npos || end == 0)
             return std::nullopt;
         const std::string name(input.substr(0, end));
         const bool hasLength = input[end] == '\n';
