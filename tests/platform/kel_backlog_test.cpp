@@ -153,13 +153,17 @@ TEST_F(KelBacklog, AForkedChildLogsAndLeavesItsParentsBacklogAlone) {
 }
 
 TEST_F(KelBacklog, ACrashHandsOverWhatWaits) {
-    static const auto& crashed = *new Client;  // not used afterwards
+    const kel_client_t crashed = kel_open("test", nullptr, 0);  // not used afterwards
+    const kel_message_t message = kel_new(0);
     std::uint64_t count = 0;
-    for (; crashed.statistics().waiting < 3; count++)
-        crashed.send({{"Number", std::to_string(count)}});
+    for (; kel_get_statistics(crashed).waiting < 3; count++) {
+        kel_set(message, "Number", std::to_string(count).c_str());
+        kel_send(crashed, message);
+    }
+    kel_free(message);
     for (std::uint64_t i = 0; i < count - 3; i++)
         EXPECT_EQ(journal.receiveField("NUMBER"), std::to_string(i));
-    EXPECT_TRUE(kel_flush_now(crashed.handle));
+    EXPECT_TRUE(kel_flush_now(crashed));
     for (std::uint64_t last = 0; last != count - 1;)  // some may come twice
         last = numberOf(journal.receiveFields(), "NUMBER");
 }
