@@ -113,13 +113,13 @@ TEST(TimerWheel, AgreesWithASortedMap) {
 TEST(TimerWheel, EqualDeadlinesKeepTheirOrder) {
     auto wheel = std::make_unique<timer_wheel>();
     std::vector<wheel_entry> entries(6);
+    const auto before = std::make_unique<wheel_entry>();
     constexpr std::int64_t kDue = 5'000'000'123;
     for (int i = 0; i < 3; ++i)
         wheel->insert(entries[static_cast<std::size_t>(i)], kDue);
     EXPECT_EQ(wheel->take_due(kDue - 1), nullptr);
-    wheel_entry before;
-    wheel->insert(before, kDue - 7);  // opens the slot
-    EXPECT_EQ(wheel->take_due(kDue - 1), &before);
+    wheel->insert(*before, kDue - 7);  // opens the slot
+    EXPECT_EQ(wheel->take_due(kDue - 1), before.get());
     for (int i = 3; i < 6; ++i)
         wheel->insert(entries[static_cast<std::size_t>(i)], kDue);
     for (wheel_entry& each : entries)

@@ -3,6 +3,8 @@
 #include <pthread.h>
 #include <signal.h>
 
+#include <initializer_list>
+
 namespace dispatch::detail {
 
 // Starts a thread that nobody joins, with signals blocked: they are for the

@@ -105,13 +105,13 @@ void* timer_source::operator new(std::size_t size) {
     if constexpr (plr::detail::kRecycle)
         return timer_memories::take();
     else
-        return ::operator new(size, std::align_val_t{alignof(timer_source)});
+        return ::operator new (size, std::align_val_t{alignof(timer_source)});
 }
 void timer_source::operator delete(void* memory) noexcept {
     if constexpr (plr::detail::kRecycle)
         timer_memories::give(static_cast<timer_memory*>(memory));
     else
-        ::operator delete(memory, std::align_val_t{alignof(timer_source)});
+        ::operator delete (memory, std::align_val_t{alignof(timer_source)});
 }
 
 constinit spin_lock descriptor_lock;
