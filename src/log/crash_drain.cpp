@@ -52,11 +52,11 @@ void LogDelivery::drainInCrash() noexcept {
 // The worker sees the flag before it calls a writer again. It does not fence the
 // two for every message: a millisecond is ages for what it has stored.
 void LogDelivery::stopWriters() noexcept {
-    crashing_.store(true);
-    if (::pthread_equal(worker_.load(), ::pthread_self()) != 0)
+    progress_.crashing.store(true);
+    if (::pthread_equal(progress_.worker.load(), ::pthread_self()) != 0)
         return;
     restOneMillisecond();
-    static_cast<void>(waitUntil([this]() noexcept { return !atWork_.load(); }));
+    static_cast<void>(waitUntil([this]() noexcept { return !progress_.atWork.load(); }));
 }
 
 void LogDelivery::writeBatchInCrash() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
@@ -66,7 +66,7 @@ void LogDelivery::writeBatchInCrash() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
     if (startupBuffer_)
         for (const MessagePtr& message : startupBuffer_->messages_)
             writeInCrash(*message);
-    for (std::size_t i = next_.load(); i < batch_.messages.size(); ++i)
+    for (std::size_t i = progress_.next.load(); i < batch_.messages.size(); ++i)
         if (const MessagePtr& message = batch_.messages[i])
             writeInCrash(*message);
 }

@@ -40,14 +40,14 @@ bool isUrgent(LogLevel level) noexcept {
 class LogDelivery::AtWork {
   public:
     explicit AtWork(LogDelivery& owner) noexcept : owner_(owner) {
-        owner_.worker_.store(::pthread_self(), std::memory_order_relaxed);
-        owner_.atWork_.store(true, std::memory_order_release);
-        if (owner_.crashing_.load(std::memory_order_acquire)) [[unlikely]] {
-            owner_.atWork_.store(false, std::memory_order_release);
+        owner_.progress_.worker.store(::pthread_self(), std::memory_order_relaxed);
+        owner_.progress_.atWork.store(true, std::memory_order_release);
+        if (owner_.progress_.crashing.load(std::memory_order_acquire)) [[unlikely]] {
+            owner_.progress_.atWork.store(false, std::memory_order_release);
             restForEver();
         }
     }
-    ~AtWork() { owner_.atWork_.store(false, std::memory_order_release); }
+    ~AtWork() { owner_.progress_.atWork.store(false, std::memory_order_release); }
     AtWork(const AtWork&) = delete;
     AtWork& operator=(const AtWork&) = delete;
 
@@ -163,8 +163,8 @@ void LogDelivery::addWriter(std::shared_ptr<LogWriter>&& writer) {
     }));
 }
 
-void LogDelivery::flush(dispatch::group_session session) {
-    queueOperation(dispatch::block<void()>([this, session = std::move(session)] {
+void LogDelivery::flush(const dispatch::group_session& session) {
+    queueOperation(dispatch::block<void()>([this, session] {
         writersQueue_.assertCurrent();
         for (const Writer& to : writers_)
             to.writer->flush(session);
@@ -280,7 +280,7 @@ void LogDelivery::writeBatch() {
         if (i == batch_.messages.size())
             break;
         write(batch_.messages[i]);
-        next_.store(i + 1, std::memory_order_release);
+        progress_.next.store(i + 1, std::memory_order_release);
         batch_.messages[i].reset();
     }
     endBatch();
@@ -300,7 +300,7 @@ void LogDelivery::endBatch() {
             to.batching->endBatch();
     batch_.operations.clear();
     batch_.messages.clear();
-    next_.store(0, std::memory_order_release);
+    progress_.next.store(0, std::memory_order_release);
     if (batch_.messages.capacity() > kKeptCapacity)
         batch_ = Batch();
 }

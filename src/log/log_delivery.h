@@ -42,7 +42,7 @@ class LogDelivery {
     void limitPending(std::size_t messages, LogServer::WhenFull policy);
 
     void addWriter(std::shared_ptr<LogWriter>&& writer);
-    void flush(dispatch::group_session session);
+    void flush(const dispatch::group_session& session);
     void close();
     // These wait for the writers queue.
     void flushStartupMessages();
@@ -101,28 +101,32 @@ class LogDelivery {
     void writeBatchInCrash() noexcept;
     void writePendingInCrash() noexcept;
 
+    // What a crash must know about the writers queue. A cache line of its own: it
+    // changes with each message, while others call log().
+    struct alignas(64) Progress {
+        std::atomic<std::size_t> next{0};   // message of batch_ that is not written
+        std::atomic<pthread_t> worker{0};   // the thread that calls writers
+        std::atomic<bool> atWork{false};    // a writer is being called
+        std::atomic<bool> crashing{false};  // writers are not to be called any more
+    };
+
+    Progress progress_;
     LogServer& server_;
     const QueueRole writersQueue_;
-
-    detail::BriefMutex lock_;
-    Batch pending_ PLR_GUARDED_BY(lock_);
-    State state_ PLR_GUARDED_BY(lock_) = State::Idle;
-    std::size_t limit_ PLR_GUARDED_BY(lock_) = 0;  // messages; 0 for none
-    LogServer::WhenFull whenFull_ PLR_GUARDED_BY(lock_) = LogServer::WhenFull::Wait;
-    std::uint64_t dropped_ PLR_GUARDED_BY(lock_) = 0;  // behind what is in pending_
-    std::atomic<std::uint32_t> room_{0};               // counts times that pending_ was taken
 
     std::unique_ptr<MemoryBufferedLogWriter> startupBuffer_ PLR_CONFINED_TO(writersQueue_);
     std::vector<Writer> writers_ PLR_CONFINED_TO(writersQueue_);
     Batch batch_ PLR_CONFINED_TO(writersQueue_);
+
+    Batch pending_ PLR_GUARDED_BY(lock_);
+    std::size_t limit_ PLR_GUARDED_BY(lock_) = 0;      // messages; 0 for none
+    std::uint64_t dropped_ PLR_GUARDED_BY(lock_) = 0;  // behind what is in pending_
+    detail::BriefMutex lock_;
+    std::atomic<std::uint32_t> room_{0};  // counts times that pending_ was taken
+    LogServer::WhenFull whenFull_ PLR_GUARDED_BY(lock_) = LogServer::WhenFull::Wait;
+    State state_ PLR_GUARDED_BY(lock_) = State::Idle;
     bool timerIsSet_ PLR_CONFINED_TO(writersQueue_)
     = false;
-
-    // What a crash must know about the writers queue.
-    std::atomic<std::size_t> next_{0};   // message of batch_ that is not written
-    std::atomic<bool> atWork_{false};    // a writer is being called
-    std::atomic<pthread_t> worker_{0};   // the thread that calls it
-    std::atomic<bool> crashing_{false};  // writers are not to be called any more
 };
 
 }  // namespace plr
