@@ -43,16 +43,20 @@ bool waitUntil(Condition&& condition) noexcept {
 
 // ---- What a delivery does in a crash ----
 
-void LogDelivery::drainInCrash() noexcept {
+// The lock is taken first and for good: the worker then takes no more messages,
+// so that each is either in its batch or still pending.
+void LogDelivery::drainInCrash() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
+    progress_.crashing.store(true);
+    const bool locked = waitUntil([this]() noexcept { return lock_.tryLock(); });
     stopWriters();
     writeBatchInCrash();
-    writePendingInCrash();
+    if (locked)
+        writePendingInCrash();
 }
 
 // The worker sees the flag before it calls a writer again. It does not fence the
 // two for every message: a millisecond is ages for what it has stored.
 void LogDelivery::stopWriters() noexcept {
-    progress_.crashing.store(true);
     if (::pthread_equal(progress_.worker.load(), ::pthread_self()) != 0)
         return;
     restOneMillisecond();
@@ -72,9 +76,6 @@ void LogDelivery::writeBatchInCrash() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
 }
 
 void LogDelivery::writePendingInCrash() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
-    // Held for good: nobody else is to change the list any more.
-    if (!waitUntil([this]() noexcept { return lock_.tryLock(); }))
-        return;
     for (const MessagePtr& message : pending_.messages)
         writeInCrash(*message);
 }

@@ -308,14 +308,17 @@ void LogDelivery::endBatch() {
 void LogDelivery::writeStartupMessages() {
     if (!startupBuffer_)
         return;
-    const std::unique_ptr<MemoryBufferedLogWriter> buffer = std::move(startupBuffer_);
-    std::deque<MessagePtr> held = buffer->drain();
-    const std::int64_t dropped = buffer->getDroppedMessageCount();
-    if (dropped >= 1)
-        held.push_front(
-            note(static_cast<std::uint64_t>(dropped), " log messages dropped prior to log start"));
-    batch_.messages.assign(std::make_move_iterator(held.begin()),
-                           std::make_move_iterator(held.end()));
+    {
+        const AtWork guard(*this);  // a crash finds them in the one place or in the other
+        std::deque<MessagePtr> held = startupBuffer_->drain();
+        const std::int64_t dropped = startupBuffer_->getDroppedMessageCount();
+        if (dropped >= 1)
+            held.push_front(note(static_cast<std::uint64_t>(dropped),
+                                 " log messages dropped prior to log start"));
+        batch_.messages.assign(std::make_move_iterator(held.begin()),
+                               std::make_move_iterator(held.end()));
+        startupBuffer_ = nullptr;
+    }
     writeBatch();
 }
 
