@@ -19,7 +19,8 @@
 //
 // What a crash can lose:
 //  - everything after SIGKILL, and after the power goes;
-//  - messages logged by other threads while the crash is handled;
+//  - messages logged by other threads while the crash is handled; those threads
+//    stay in log() until the process ends;
 //  - what waits in log() itself: when the crash hits a thread that is adding a
 //    message, or happens while memory is so damaged that the list of messages
 //    cannot be read, the drain gives up;
