@@ -75,6 +75,10 @@ pelorin_component(vox_values LEVEL 1 LIBRARY platform
 pelorin_component(vox_connections LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/vox/connection.h
+    platform/include/vox/limits.h
+    platform/include/vox/listener.h
+    platform/include/vox/service.h
+    platform/include/vox/tap.h
     platform/include/vox/vox.h
   SOURCES
     platform/linux/vox/client_quota.cpp

@@ -8,6 +8,7 @@
 #include "plr/ipc/dict.h"
 #include "plr/ipc/object.h"
 #include "vox/connection.h"
+#include "vox/listener.h"
 
 // vox::connection holds a Vox connection or the null object, on which every
 // member does nothing. vox/connection.h says how connections behave.

@@ -4,6 +4,7 @@
 
 #include "dispatch/dispatch.h"
 #include "plr/base/export.h"
+#include "vox/limits.h"
 #include "vox/value.h"
 
 // Vox connections: messages between processes over AF_UNIX stream sockets.
@@ -35,43 +36,26 @@
 // by its error event, and when the peer is to blame also in one line through
 // the report hook.
 
-// What a listener grants its clients, and any connection its peer. The limits
-// in force are told to the peer when the connection starts, so that it refuses
-// to send what would not be accepted.
-typedef enum vox_overflow_policy {
-    VOX_OVERFLOW_DISCONNECT,  // the peer that does not read is disconnected (INVALID)
-    VOX_OVERFLOW_DROP,        // new messages for it are dropped and counted; it learns the count
-} vox_overflow_policy_t;
-
-typedef struct vox_limits {
-    uint32_t max_message_bytes;    // body of one message; default 16 MiB, at most 1 GiB. An eighth
-                                   // of it is the limit for the values in one message
-    uint32_t max_depth;            // nested arrays and dictionaries; default and most 64
-    uint32_t max_descriptors;      // in one message; default and most 64
-    uint32_t max_queued_bytes;     // waiting for a peer that does not read; default 16 MiB
-                                   // (a message is accepted when nothing waits, whatever its size)
-    uint32_t max_queued_messages;  // the same, in messages; default 65536
-    uint32_t max_connections;      // of one listener at once; default 4096
-    uint32_t max_connections_per_uid;  // of these by one user; default 2048
-    uint32_t incomplete_frame_ms;      // a started frame must be whole by then; default 30000
-    vox_overflow_policy_t overflow;    // default VOX_OVERFLOW_DISCONNECT
-} vox_limits_t;
-
 // Counters of one connection since it was made.
 typedef struct vox_statistics {
     uint64_t messages_sent;      // handed to the kernel completely
     uint64_t messages_received;  // delivered or waiting for delivery
     uint64_t messages_dropped;   // refused here by the overflow policy
     uint64_t peer_dropped;       // what the peer said it dropped for us
-    uint64_t queued_messages;    // waiting now to be written
+    uint64_t requests_refused;   // requests of the peer, for the limit of open ones
+    uint64_t replies_refused;    // requests of this side, for the limit of pending replies
+    // Now:
+    uint64_t queued_messages;  // waiting to be written
     uint64_t queued_bytes;
+    uint64_t pending_replies;   // requests of this side that wait for the peer
+    uint64_t open_requests;     // requests of the peer that wait for this side
+    uint64_t held_descriptors;  // as vox_limits_t has it
+    uint64_t partial_bytes;     // read of a frame that is not whole
 } vox_statistics_t;
 
 #ifdef __cplusplus
 extern "C" {
 #endif
-
-PLR_EXPORT vox_limits_t vox_limits_default(void);
 
 // ---- Making connections -------------------------------------------------------
 
@@ -81,18 +65,7 @@ PLR_EXPORT vox_limits_t vox_limits_default(void);
 // arrives as the error event.
 PLR_EXPORT vox_connection_t vox_connection_create(const char* name);
 
-// The listener of that name. `limits` null for the defaults. The directory is
-// made when missing (mode 0700; /run/vox 0755) and refused when it is a symbolic
-// link, belongs to another user than this one or root, or others may write to
-// it. A stale socket is replaced, a live one never (INVALID event, EADDRINUSE
-// in the text). The socket exists from vox_connection_resume() on.
-PLR_EXPORT vox_connection_t vox_connection_create_listener(const char* name,
-                                                           const vox_limits_t* limits);
-// A listener without name, reached through endpoints only.
-PLR_EXPORT vox_connection_t vox_connection_create_anonymous_listener(const vox_limits_t* limits);
-// A value that travels in messages and lets its holder connect to an anonymous
-// listener. The null object when `listener` is not one.
-PLR_EXPORT vox_endpoint_t vox_endpoint_create(vox_connection_t listener);
+// A client of the listener that made `endpoint` (vox/listener.h).
 PLR_EXPORT vox_connection_t vox_connection_create_from_endpoint(vox_endpoint_t endpoint);
 
 // Both ends of a new connection inside this process.
@@ -138,6 +111,17 @@ PLR_EXPORT void vox_connection_send_message_with_reply(
     vox_connection_t connection, vox_object_t message, const dispatch::queue* queue,
     const dispatch::block<void(vox_object_t)>* handler);
 
+// The same with a time limit and a number to cancel it by. `timeout_ms`: from now,
+// 0 for none. When it is over, `handler` gets REQUEST_TIMED_OUT, the pending entry is
+// gone at once, and the peer is told; a reply that comes later is ignored. Returns the
+// request's number, not 0; 0 when nothing was sent and the handler gets the error.
+PLR_EXPORT uint64_t vox_connection_send_request(vox_connection_t connection, vox_object_t message,
+                                                uint32_t timeout_ms, const dispatch::queue* queue,
+                                                const dispatch::block<void(vox_object_t)>* handler);
+// Gives up a request: its handler gets REQUEST_CANCELLED, and the peer is told.
+// Returns 0; ESRCH when its handler was called or queued already, or never was one.
+PLR_EXPORT int vox_connection_cancel_request(vox_connection_t connection, uint64_t number);
+
 // Runs `barrier` on the target queue once every message sent before was handed
 // to the kernel, or can never be. On a connection that was never resumed it
 // waits for the resume.
@@ -149,8 +133,17 @@ PLR_EXPORT void vox_connection_send_barrier(vox_connection_t connection,
 // A new dictionary that answers `request` when it is sent; a null pointer when
 // `request` is no received request, or has got its reply dictionary already. A
 // request that is released unanswered stays unanswered: its asker waits until
-// the connection ends.
+// its own time limit, or until the connection ends.
 PLR_EXPORT vox_object_t vox_dictionary_create_reply(vox_object_t request);
+// Whether nobody waits for the reply any more: the asker gave the request up, or
+// its connection ended. `message` is the request or the reply made for it; 0 for
+// others, and for those that were answered. Sending such a reply gives ECANCELED (EPIPE).
+PLR_EXPORT int vox_dictionary_is_cancelled(vox_object_t message);
+// Runs `handler` once, on the connection's target queue, when that happens, or
+// now if it has; released unrun once the reply is sent or can never be. One a
+// request: a second replaces the first. EINVAL for what is no open request.
+PLR_EXPORT int vox_dictionary_set_cancel_handler(vox_object_t message,
+                                                 const dispatch::block<void()>* handler);
 // The connection that a received message came on, or that a reply will go to
 // (lent); null pointer for others.
 PLR_EXPORT vox_connection_t vox_dictionary_get_remote_connection(vox_object_t message);
@@ -164,14 +157,12 @@ PLR_EXPORT const char* vox_connection_get_name(vox_connection_t connection);
 PLR_EXPORT pid_t vox_connection_get_pid(vox_connection_t connection);
 PLR_EXPORT uid_t vox_connection_get_uid(vox_connection_t connection);
 PLR_EXPORT gid_t vox_connection_get_gid(vox_connection_t connection);
+// Its supplementary groups, from then too (SO_PEERGROUPS): writes up to `most` to
+// `groups` and returns how many there are; 0 when not known.
+PLR_EXPORT size_t vox_connection_get_groups(vox_connection_t connection, gid_t* groups,
+                                            size_t most);
 PLR_EXPORT void vox_connection_get_statistics(vox_connection_t connection,
                                               vox_statistics_t* statistics);
-
-// A process-wide count of activities under way. More ends than begins stop the
-// process.
-PLR_EXPORT void vox_transaction_begin(void);
-PLR_EXPORT void vox_transaction_end(void);
-PLR_EXPORT uint64_t vox_transaction_count(void);
 
 #ifdef __cplusplus
 }

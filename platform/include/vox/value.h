@@ -126,7 +126,9 @@ PLR_EXPORT vox_object_t vox_dictionary_get_entry(vox_object_t dictionary, size_t
 typedef enum vox_error_code {
     VOX_ERROR_CONNECTION_INTERRUPTED = 1,  // the peer went away or is not there yet
     VOX_ERROR_CONNECTION_INVALID = 2,      // this connection will never be usable again
-    VOX_ERROR_MESSAGE_REFUSED = 3,         // this message could not be sent; see the description
+    VOX_ERROR_MESSAGE_REFUSED = 3,         // this message was not taken; see the description
+    VOX_ERROR_REQUEST_TIMED_OUT = 4,       // no reply came in time
+    VOX_ERROR_REQUEST_CANCELLED = 5,       // the asker gave it up
     VOX_ERROR_APPLICATION = 1000,          // the first code that is free for users
 } vox_error_code_t;
 PLR_EXPORT vox_object_t vox_error_create(int64_t code, const char* description);

@@ -1,4 +1,4 @@
-// The functions of vox/connection.h.
+// The functions of vox/connection.h, listener.h and service.h.
 #include "vox/connection.h"
 
 #include <sys/socket.h>
@@ -13,6 +13,8 @@
 #include "platform/linux/vox/peer_connection.h"
 #include "platform/linux/vox/request.h"
 #include "plr/base/assert.h"
+#include "vox/listener.h"
+#include "vox/service.h"
 
 using vox_link::connection;
 using vox_link::listener;

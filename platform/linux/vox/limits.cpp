@@ -39,8 +39,17 @@ extern "C" vox_limits_t vox_limits_default(void) {
             .max_descriptors = 64,
             .max_queued_bytes = 16u << 20,
             .max_queued_messages = 65536,
+            .max_pending_replies = 65536,
+            .max_open_requests = 4096,
+            .max_held_descriptors = 256,
+            .incomplete_frame_ms = 30000,
             .max_connections = 4096,
             .max_connections_per_uid = 2048,
-            .incomplete_frame_ms = 30000,
+            .max_queued_bytes_per_uid = 64u << 20,
+            .max_queued_messages_per_uid = 262144,
+            .max_pending_replies_per_uid = 262144,
+            .max_open_requests_per_uid = 16384,
+            .max_held_descriptors_per_uid = 512,
+            .max_partial_bytes_per_uid = 64u << 20,
             .overflow = VOX_OVERFLOW_DISCONNECT};
 }

@@ -2,7 +2,7 @@
 
 #include "platform/linux/vox/codec.h"
 #include "platform/linux/vox/frame.h"
-#include "vox/connection.h"
+#include "vox/limits.h"
 
 // The limits of connections in the forms that the layers want them in.
 namespace vox_link {

@@ -202,8 +202,14 @@ vox_statistics_t peer_connection::statistics() const {
             .messages_received = messages_received_.load(std::memory_order_relaxed),
             .messages_dropped = dropped_,
             .peer_dropped = peer_dropped_.load(std::memory_order_relaxed),
+            .requests_refused = 0,
+            .replies_refused = 0,
             .queued_messages = out_.messages() + early_.size(),
-            .queued_bytes = out_.bytes() + early_bytes_};
+            .queued_bytes = out_.bytes() + early_bytes_,
+            .pending_replies = replies_.size(),
+            .open_requests = 0,
+            .held_descriptors = 0,
+            .partial_bytes = 0};
 }
 
 std::string peer_connection::title() {
