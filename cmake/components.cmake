@@ -278,6 +278,15 @@ pelorin_component(ipc_endpoints LEVEL 3 LIBRARY pelorin
     src/ipc/vox_server.cpp
     src/ipc/vox_server_helper.cpp)
 
+pelorin_component(ipc_assertion LEVEL 3 LIBRARY pelorin
+  HEADERS
+    include/plr/ipc/result.h
+    include/plr/ipc/result_errors.h
+    include/plr/ipc/vox_drosk_assertion.h
+  SOURCES
+    src/ipc/result_errors.cpp
+    src/ipc/vox_drosk_assertion.cpp)
+
 pelorin_component(log_loggable LEVEL 4 LIBRARY pelorin
   HEADERS
     include/plr/log/loggable.h

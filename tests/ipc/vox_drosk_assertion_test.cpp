@@ -1,0 +1,119 @@
+#include "plr/ipc/vox_drosk_assertion.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <new>
+#include <thread>
+#include <utility>
+#include <vector>
+
+#include "support/waiting.h"
+#include "vox/service.h"
+
+// This program's allocations fail on demand: the one before which so many
+// others of the thread succeed.
+namespace {
+thread_local int succeeding = -1;  // negative: none fails
+}  // namespace
+
+void* operator new(std::size_t size) {
+    if (succeeding >= 0 && succeeding-- == 0)
+        throw std::bad_alloc();
+    if (void* memory = std::malloc(size != 0 ? size : 1))
+        return memory;
+    throw std::bad_alloc();
+}
+void operator delete(void* memory) noexcept {
+    std::free(memory);
+}
+void operator delete(void* memory, std::size_t) noexcept {
+    std::free(memory);
+}
+
+namespace {
+
+class DroskAssertion : public ::testing::Test {
+  protected:
+    ~DroskAssertion() override { EXPECT_EQ(vox_transaction_count(), 0u); }
+
+    std::shared_ptr<plr::VoxDroskAssertion> assertion =
+        plr::VoxDroskAssertion::create_default_global();
+};
+
+TEST_F(DroskAssertion, NamesWhatIsUnderWay) {
+    EXPECT_EQ(assertion->dumpState(), "No Assertions");
+    EXPECT_EQ(assertion->getAssertionCount(), 0u);
+    auto a = assertion->createActivity("a");
+    const auto b = assertion->createActivity("b");
+    const auto again = b;
+    EXPECT_EQ(*a, "a");
+    EXPECT_EQ(vox_transaction_count(), 2u);
+    EXPECT_EQ(assertion->dumpState(), "Assertions remaining: a,b");
+    a.reset();
+    EXPECT_EQ(vox_transaction_count(), 1u);
+    EXPECT_EQ(assertion->dumpState(), "Assertions remaining: b");
+    EXPECT_EQ(assertion->getAssertionCount(), 1u);
+}
+
+// What ended is in the list until it is tidied up: here it ends without the
+// object's knowledge.
+TEST_F(DroskAssertion, ShowsAndCountsWhatEndedUntilItIsTidiedUp) {
+    auto a = std::make_shared<std::string>("a");
+    assertion->addActivity(a);
+    auto b = assertion->createActivity("b");
+    a.reset();
+    EXPECT_EQ(assertion->dumpState(), "Assertions remaining: <expired>,b");
+    EXPECT_EQ(assertion->getAssertionCount(), 2u);
+    assertion->tidyUp();
+    EXPECT_EQ(assertion->getAssertionCount(), 1u);
+    b.reset();
+    assertion->addActivity(std::make_shared<std::string>("gone"));
+    EXPECT_EQ(assertion->dumpState(), "No Assertions");
+    EXPECT_EQ(assertion->getAssertionCount(), 1u);
+}
+
+TEST_F(DroskAssertion, IsOutlivedByItsActivities) {
+    auto activity = assertion->createActivity("a");
+    assertion.reset();
+    EXPECT_EQ(vox_transaction_count(), 1u);
+    activity.reset();
+}
+
+TEST_F(DroskAssertion, LeavesNoTransactionOpenWhenAnActivityCannotBegin) {
+    plr::VoxDroskAssertion unowned;
+    EXPECT_THROW(static_cast<void>(unowned.createActivity("a")), std::bad_weak_ptr);
+    EXPECT_EQ(vox_transaction_count(), 0u);
+    int failures = 0;
+    for (;; ++failures) {
+        std::string name = "a name that is too long to stand inside the string";
+        succeeding = failures;
+        std::shared_ptr<std::string> activity;
+        try {
+            activity = assertion->createActivity(std::move(name));
+        } catch (const std::bad_alloc&) {
+        }
+        const bool failed = std::exchange(succeeding, -1) < 0;
+        EXPECT_EQ(vox_transaction_count(), activity ? 1u : 0u) << "allocation " << failures;
+        EXPECT_EQ(activity == nullptr, failed);
+        if (activity)
+            break;
+    }
+    EXPECT_GE(failures, 2);  // the name's string and the handle
+}
+
+TEST_F(DroskAssertion, IsUsedByManyThreads) {
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 4; ++i)
+        threads.emplace_back([this] {
+            std::shared_ptr<std::string> last;
+            for (int n = 0; n < 2000; ++n)
+                last = assertion->createActivity(std::to_string(n));
+        });
+    for (std::thread& each : threads)
+        each.join();
+    EXPECT_EQ(vox_transaction_count(), 0u);
+    EXPECT_EQ(assertion->getAssertionCount(), 0u);
+}
+
+}  // namespace
