@@ -37,6 +37,7 @@ TAG_UUID = 37
 HEADER = struct.Struct("<4sBBHIIQ")
 MAGIC = b"VOX1"
 HELLO, MESSAGE, REQUEST, REPLY, CANCEL, PING, DROPPED = range(1, 8)
+TAP = 9
 PING_WANTS_ANSWER = 1
 LIMITS = {"min": 1, "max": 1, "bytes": 16 << 20, "depth": 64, "fds": 64}
 

@@ -37,10 +37,11 @@ Unsigned load(const std::uint8_t* in) noexcept {
 // The reason why a header with correct magic cannot be accepted; empty: it can.
 std::string refusal(const frame_header& header, const frame_limits& limits) {
     const auto type = static_cast<unsigned>(header.type);
-    if (type < 1 || type > 7)
+    if (type < 1 || (type > 7 && header.type != frame_type::tap))
         return "unknown frame type " + std::to_string(type);
     const bool message = carries_message(header.type);
-    const std::uint32_t most = message ? limits.body_bytes : kControlBodyBytes;
+    const std::uint32_t most =
+        message || header.type == frame_type::tap ? limits.body_bytes : kControlBodyBytes;
     if (header.length > most)
         return "frame of " + std::to_string(header.length) + " bytes is over the limit of " +
                std::to_string(most);
