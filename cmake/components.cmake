@@ -100,6 +100,7 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/limits.h
     platform/linux/vox/listener.cpp
     platform/linux/vox/listener.h
+    platform/linux/vox/listener_api.cpp
     platform/linux/vox/lock.h
     platform/linux/vox/names.cpp
     platform/linux/vox/names.h

@@ -267,7 +267,9 @@ TEST_F(VoxListener, EndpointsTravelInMessagesAndLeadToTheirListener) {
         expectServed(vox_connection_create_from_endpoint(endpoint));
         EXPECT_TRUE(first.works());
         EXPECT_EQ(vox_connection_get_pid(hidden.client(0)), ::getpid());
-        EXPECT_EQ(vox_get_type(Ref(vox_endpoint_create(broker.listener()))), VOX_TYPE_NULL);
+        // A listener with a name can be reached in both ways.
+        expectServed(
+            vox_connection_create_from_endpoint(Ref(vox_endpoint_create(broker.listener()))));
     }
     // It outlives its listener in vain.
     expectEnd(vox_connection_create_from_endpoint(endpoint), VOX_ERROR_CONNECTION_INTERRUPTED);

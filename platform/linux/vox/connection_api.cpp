@@ -1,4 +1,4 @@
-// The functions of vox/connection.h, listener.h and service.h.
+// The functions of vox/connection.h and the transactions of vox/service.h.
 #include "vox/connection.h"
 
 #include <sys/socket.h>
@@ -9,15 +9,12 @@
 #include <utility>
 
 #include "platform/linux/vox/limits.h"
-#include "platform/linux/vox/listener.h"
 #include "platform/linux/vox/peer_connection.h"
 #include "platform/linux/vox/request.h"
 #include "plr/base/assert.h"
-#include "vox/listener.h"
 #include "vox/service.h"
 
 using vox_link::connection;
-using vox_link::listener;
 using vox_link::peer_connection;
 using vox_link::peer_origin;
 
@@ -56,21 +53,6 @@ vox_connection_t vox_connection_create(const char* name) {
     peer_origin origin;
     origin.from = peer_origin::kind::service;
     return make_peer(name ? name : "", nullptr, std::move(origin));
-}
-
-vox_connection_t vox_connection_create_listener(const char* name, const vox_limits_t* limits) {
-    return new listener(name ? name : "", false, vox_link::usable_limits(limits));
-}
-
-vox_connection_t vox_connection_create_anonymous_listener(const vox_limits_t* limits) {
-    return new listener("", true, vox_link::usable_limits(limits));
-}
-
-vox_endpoint_t vox_endpoint_create(vox_connection_t object) {
-    connection* found = connection::from(object);
-    if (!found || !found->is_listener() || !static_cast<listener*>(found)->is_anonymous())
-        return vox_null_create();
-    return static_cast<listener*>(found)->make_endpoint();
 }
 
 vox_connection_t vox_connection_create_from_endpoint(vox_endpoint_t endpoint) {

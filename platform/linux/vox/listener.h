@@ -27,7 +27,6 @@ class listener final : public connection {
 
     // A new endpoint value; the null object when none can be made.
     [[nodiscard]] vox_object_t make_endpoint();
-    [[nodiscard]] bool is_anonymous() const noexcept { return anonymous_; }
     [[nodiscard]] bool is_listener() const noexcept override { return true; }
 
   protected:
