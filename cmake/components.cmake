@@ -81,8 +81,6 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/include/vox/tap.h
     platform/include/vox/vox.h
   SOURCES
-    platform/linux/vox/client_quota.cpp
-    platform/linux/vox/client_quota.h
     platform/linux/vox/complaint.cpp
     platform/linux/vox/complaint.h
     platform/linux/vox/connection.cpp
@@ -118,6 +116,8 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/request.h
     platform/linux/vox/send_turn.cpp
     platform/linux/vox/send_turn.h
+    platform/linux/vox/service_account.cpp
+    platform/linux/vox/service_account.h
     platform/linux/vox/service_socket.cpp
     platform/linux/vox/service_socket.h
     platform/linux/vox/socket_io.cpp

@@ -48,8 +48,7 @@ listener::listener(std::string name, bool anonymous, const vox_limits_t& limits)
     : connection(std::move(name)),
       limits_(limits),
       anonymous_(anonymous),
-      quota_(
-          std::make_shared<client_quota>(limits.max_connections, limits.max_connections_per_uid)) {}
+      account_(std::make_shared<service_account>(limits)) {}
 
 std::string listener::title() {
     return "listener '" + name() + "'";
@@ -264,11 +263,12 @@ void listener::welcome(int fd) {
     ucred peer = {0, static_cast<uid_t>(-1), 0};
     socklen_t size = sizeof peer;
     ::getsockopt(fd, SOL_SOCKET, SO_PEERCRED, &peer, &size);
-    client_quota::ticket place = quota_->take(peer.uid);
+    limit_hit hit;
+    service_account::ticket place = account_->take(peer.uid, hit);
     if (!place) {
         ::close(fd);
         complain(title() + " refused pid " + std::to_string(peer.pid) + " (uid " +
-                 std::to_string(peer.uid) + "): too many connections");
+                 std::to_string(peer.uid) + "): it has " + hit.text() + " clients");
         return;
     }
     peer_origin origin;
@@ -277,6 +277,7 @@ void listener::welcome(int fd) {
     origin.place = std::move(place);
     // Unless the handler keeps it, this reference is the only one.
     connection* client = new peer_connection(name(), limits_, std::move(origin));
+    account_->count(service_account::event::accepted);
     deliver(client);
     vox_release(client);
 }

@@ -7,8 +7,8 @@
 #include <optional>
 #include <string>
 
-#include "platform/linux/vox/client_quota.h"
 #include "platform/linux/vox/connection.h"
+#include "platform/linux/vox/service_account.h"
 #include "platform/linux/vox/service_socket.h"
 
 // A listener: takes the clients of a name, or of the endpoints made for it,
@@ -27,6 +27,8 @@ class listener final : public connection {
 
     // A new endpoint value; the null object when none can be made.
     [[nodiscard]] vox_object_t make_endpoint();
+    // What its clients cost.
+    [[nodiscard]] service_account& account() const noexcept { return *account_; }
     [[nodiscard]] bool is_listener() const noexcept override { return true; }
 
   protected:
@@ -67,7 +69,7 @@ class listener final : public connection {
 
     const vox_limits_t limits_;
     const bool anonymous_;
-    const std::shared_ptr<client_quota> quota_;
+    const std::shared_ptr<service_account> account_;
     std::optional<service_socket> service_ PLR_GUARDED_BY(lock_);
     std::list<std::unique_ptr<gate>> gates_ PLR_GUARDED_BY(lock_);
     bool opened_ PLR_GUARDED_BY(lock_) = false;

@@ -3,9 +3,21 @@
 
 #include "platform/linux/vox/limits.h"
 #include "platform/linux/vox/listener.h"
+#include "plr/base/assert.h"
 
 using vox_link::connection;
 using vox_link::listener;
+
+namespace {
+
+// The listener that a caller must have given.
+listener& required(vox_connection_t object) {
+    connection* found = connection::from(object);
+    PLR_ASSERT(found && found->is_listener(), "a Vox value that is no listener was used as one");
+    return *static_cast<listener*>(found);
+}
+
+}  // namespace
 
 vox_connection_t vox_connection_create_listener(const char* name, const vox_limits_t* limits) {
     return new listener(name ? name : "", false, vox_link::usable_limits(limits));
@@ -20,4 +32,15 @@ vox_endpoint_t vox_endpoint_create(vox_connection_t object) {
     if (!found || !found->is_listener())
         return vox_null_create();
     return static_cast<listener*>(found)->make_endpoint();
+}
+
+// ---- Looking -------------------------------------------------------------------------
+
+void vox_listener_get_statistics(vox_connection_t object, vox_listener_statistics_t* statistics) {
+    *statistics = required(object).account().statistics();
+}
+
+void vox_listener_get_user_statistics(vox_connection_t object, uid_t user,
+                                      vox_user_statistics_t* statistics) {
+    *statistics = required(object).account().user_statistics(user);
 }

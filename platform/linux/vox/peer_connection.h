@@ -10,12 +10,12 @@
 #include <vector>
 
 #include "dispatch/source.h"
-#include "platform/linux/vox/client_quota.h"
 #include "platform/linux/vox/codec.h"
 #include "platform/linux/vox/connection.h"
 #include "platform/linux/vox/frame_reader.h"
 #include "platform/linux/vox/output.h"
 #include "platform/linux/vox/reply_table.h"
+#include "platform/linux/vox/service_account.h"
 
 // A connection to one peer.
 //
@@ -38,7 +38,7 @@ struct peer_origin {
     int fd = -1;             // kind::socket: owned
     vox_object* endpoint{};  // kind::endpoint: an owned reference
     bool accepted = false;   // by a listener
-    client_quota::ticket place;
+    service_account::ticket place;
 };
 
 class peer_connection final : public connection {
