@@ -121,7 +121,9 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/service_socket.cpp
     platform/linux/vox/service_socket.h
     platform/linux/vox/socket_io.cpp
-    platform/linux/vox/socket_io.h)
+    platform/linux/vox/socket_io.h
+    platform/linux/vox/transactions.cpp
+    platform/linux/vox/transactions.h)
 
 pelorin_component(qf_core LEVEL 1 LIBRARY platform
   HEADERS

@@ -1,26 +1,22 @@
-// The functions of vox/connection.h and the transactions of vox/service.h.
+// The functions of vox/connection.h.
 #include "vox/connection.h"
 
 #include <sys/socket.h>
 #include <unistd.h>
 
 #include <array>
-#include <atomic>
 #include <utility>
 
 #include "platform/linux/vox/limits.h"
 #include "platform/linux/vox/peer_connection.h"
 #include "platform/linux/vox/request.h"
 #include "plr/base/assert.h"
-#include "vox/service.h"
 
 using vox_link::connection;
 using vox_link::peer_connection;
 using vox_link::peer_origin;
 
 namespace {
-
-std::atomic<std::uint64_t> transactions{0};
 
 // The connection that a caller must have given.
 connection& required(vox_connection_t object) {
@@ -158,19 +154,4 @@ gid_t vox_connection_get_gid(vox_connection_t object) {
 void vox_connection_get_statistics(vox_connection_t object, vox_statistics_t* statistics) {
     peer_connection* of = peer(object);
     *statistics = of ? of->statistics() : vox_statistics_t{};
-}
-
-// ---- Transactions --------------------------------------------------------------------
-
-void vox_transaction_begin(void) {
-    transactions.fetch_add(1, std::memory_order_relaxed);
-}
-
-void vox_transaction_end(void) {
-    const std::uint64_t before = transactions.fetch_sub(1, std::memory_order_release);
-    PLR_ASSERT(before > 0, "vox_transaction_end() without vox_transaction_begin()");
-}
-
-uint64_t vox_transaction_count(void) {
-    return transactions.load(std::memory_order_acquire);
 }
