@@ -13,6 +13,8 @@
 //
 // One value has one encoding: what decode() accepts is what encode() gives.
 // Neither recurses. Any thread.
+struct vox_custom_object;
+
 namespace vox_wire {
 
 // Bytes that were encoded and the descriptors that travel beside them.
@@ -45,10 +47,17 @@ struct codec_limits {
 // `descriptors`: the item names each of them once and in order, and they become
 // values; anything else is an error, and on error all are closed. Returns a new
 // object, or null with a reason for people in `why` (a string literal). Memory taken
-// is at most a constant times the bytes given, whatever they declare.
+// is at most a constant times the bytes given, whatever they declare. `from`, unless
+// null, is told of each descriptor when it is closed.
 [[nodiscard]] vox_object_t decode(std::span<const std::uint8_t> bytes,
                                   std::span<const int> descriptors, const codec_limits& limits,
-                                  const char*& why) noexcept;
+                                  const char*& why, vox_custom_object* from = nullptr) noexcept;
+
+// The same for an item whose descriptors did not come with it: they decode to the
+// null object.
+[[nodiscard]] vox_object_t decode_without_descriptors(std::span<const std::uint8_t> bytes,
+                                                      const codec_limits& limits,
+                                                      const char*& why) noexcept;
 
 // Whether `text` is well-formed UTF-8 (RFC 3629).
 [[nodiscard]] bool is_utf8(std::span<const std::uint8_t> text) noexcept;

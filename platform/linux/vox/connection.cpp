@@ -19,6 +19,10 @@ bool is_concurrent(const dispatch::queue& queue) noexcept {
 
 const vox_custom_vtable connection::kVtable = {
     [](vox_custom_object* object) noexcept { static_cast<connection*>(object)->references_gone(); },
+    [](vox_custom_object* remote, vox_dictionary_object& message) noexcept {
+        static_cast<connection*>(remote)->message_gone(message);
+    },
+    [](vox_custom_object* from) noexcept { static_cast<connection*>(from)->descriptor_gone(); },
     [](const vox_custom_object* object, std::string& out) {
         const auto* described = static_cast<const connection*>(object);
         out += described->is_listener() ? "listener" : "connection";
@@ -136,8 +140,10 @@ void connection::end() {
         const lock_guard guard(lock_);
         why = std::make_unique<ending>(*why_);
     }
-    if (why->blamed == blame::peer)
+    if (why->blamed != blame::nobody) {
         complain(title() + " ended: " + why->reason);
+        count_blame(why->blamed);
+    }
     const vox_object_t error = vox_error_create(why->code, why->reason.c_str());
     wind_up(error);
     deliver(error);

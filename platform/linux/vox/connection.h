@@ -43,11 +43,14 @@ class connection : public vox_custom_object {
     [[nodiscard]] const std::string& name() const noexcept { return name_; }
     [[nodiscard]] virtual bool is_listener() const noexcept = 0;
 
-    void hold() noexcept { holds_.fetch_add(1, std::memory_order_relaxed); }
+    void hold(std::uint32_t times = 1) noexcept {
+        holds_.fetch_add(times, std::memory_order_relaxed);
+    }
     void unhold() noexcept;
 
   protected:
-    enum class blame : std::uint8_t { nobody, peer };
+    // The peer broke the protocol, or went over a limit.
+    enum class blame : std::uint8_t { nobody, protocol, limit };
 
     explicit connection(std::string name);
     virtual ~connection() = default;
@@ -62,6 +65,12 @@ class connection : public vox_custom_object {
     // Gives up what is left, before the event handler hears of `error`.
     virtual void wind_up(vox_object_t error) PLR_ON(queue_role_)
     = 0;
+    virtual void count_blame(blame) PLR_ON(queue_role_)
+    {}
+    // A message that came on this connection, or a reply that would go to it, is
+    // being freed; a descriptor that came was closed. Any thread.
+    virtual void message_gone(vox_dictionary_object&) noexcept {}
+    virtual void descriptor_gone() noexcept {}
     // For report lines: "connection from pid 12 (uid 0) to 'net.example.radio'".
     [[nodiscard]] virtual std::string title() = 0;
 
@@ -76,6 +85,8 @@ class connection : public vox_custom_object {
     [[nodiscard]] bool is_suspended() const noexcept {
         return suspensions_.load(std::memory_order_acquire) > 0;
     }
+    // From the first resume on what was set up is fixed.
+    [[nodiscard]] bool is_started() const noexcept { return started_.load(); }
     [[nodiscard]] bool is_ending() const noexcept {
         return ending_.load(std::memory_order_acquire);
     }

@@ -21,10 +21,13 @@ using namespace vox_values;
 class decoder {
   public:
     decoder(std::span<const std::uint8_t> bytes, std::span<const int> descriptors,
-            const codec_limits& limits) noexcept
+            const codec_limits& limits, vox_custom_object* from,
+            bool descriptors_absent = false) noexcept
         : at_(bytes.data()),
           end_(bytes.data() + bytes.size()),
           descriptors_(descriptors),
+          from_(from),
+          descriptors_absent_(descriptors_absent),
           descriptor_limit_(std::min<std::size_t>(limits.descriptors, kMostDescriptors)),
           depth_limit_(std::min(limits.depth, kMostDepth)),
           byte_limit_(limits.bytes),
@@ -37,7 +40,7 @@ class decoder {
         why = why_;
         vox_release(root);
         for (const int descriptor : descriptors_.subspan(adopted_))
-            close(descriptor);
+            close_descriptor(descriptor, from_);
         return nullptr;
     }
 
@@ -392,13 +395,15 @@ class decoder {
         std::uint64_t index = 0;
         if (!read_head_of(major::unsigned_int, index, "a descriptor's index is not a number"))
             return nullptr;
+        if (descriptors_absent_)
+            return vox_null_create();
         if (index < adopted_)
             return fail("a descriptor is named twice");
         if (index >= descriptors_.size())
             return fail("a descriptor is named that did not come");
         if (index > adopted_)
             return fail("descriptors are not named in order");
-        return adopt_descriptor(type, descriptors_[adopted_++]);
+        return adopt_descriptor(type, descriptors_[adopted_++], from_);
     }
 
     // ---- State -------------------------------------------------------------------
@@ -419,6 +424,8 @@ class decoder {
     const std::uint8_t* at_;
     const std::uint8_t* const end_;
     const std::span<const int> descriptors_;
+    vox_custom_object* const from_;  // of the descriptors
+    const bool descriptors_absent_;  // each stands for null
     const std::size_t descriptor_limit_;
     const unsigned depth_limit_;
     const std::size_t byte_limit_;
@@ -433,8 +440,14 @@ class decoder {
 }  // namespace
 
 vox_object_t decode(std::span<const std::uint8_t> bytes, std::span<const int> descriptors,
-                    const codec_limits& limits, const char*& why) noexcept {
-    return decoder(bytes, descriptors, limits).run(why);
+                    const codec_limits& limits, const char*& why,
+                    vox_custom_object* from) noexcept {
+    return decoder(bytes, descriptors, limits, from).run(why);
+}
+
+vox_object_t decode_without_descriptors(std::span<const std::uint8_t> bytes,
+                                        const codec_limits& limits, const char*& why) noexcept {
+    return decoder(bytes, {}, limits, nullptr, true).run(why);
 }
 
 }  // namespace vox_wire

@@ -1,5 +1,6 @@
 // Descriptors and endpoints: objects that own one file descriptor.
 #include <fcntl.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <new>
@@ -10,10 +11,17 @@ using namespace vox_values;
 
 namespace vox_values {
 
-vox_object* adopt_descriptor(vox_type type, int descriptor) noexcept {
+vox_object* adopt_descriptor(vox_type type, int descriptor, vox_custom_object* from) noexcept {
     auto* object = new (allocate(sizeof(vox_descriptor_object))) vox_descriptor_object(type);
     object->descriptor = descriptor;
+    object->from = from;
     return object;
+}
+
+void close_descriptor(int descriptor, vox_custom_object* from) noexcept {
+    close(descriptor);
+    if (from)
+        from->vtable->descriptor_gone(from);
 }
 
 int duplicate_descriptor(vox_object* object) noexcept {

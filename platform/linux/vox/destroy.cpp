@@ -1,5 +1,3 @@
-#include <unistd.h>
-
 #include "platform/linux/vox/value_layout.h"
 
 // Taking objects apart. While a container's last element is taken apart, that
@@ -20,6 +18,13 @@ void drop_last(vox_container_object* container) noexcept {
         free_key(static_cast<vox_dictionary_object*>(container)->entries[container->count]);
 }
 
+void leave_remote(vox_dictionary_object& dictionary) noexcept {
+    auto* remote = static_cast<vox_custom_object*>(dictionary.remote);
+    if (remote && dictionary.reply_id != 0)
+        remote->vtable->message_gone(remote, dictionary);
+    vox_release(remote);
+}
+
 void free_container(vox_container_object* container) noexcept {
     if (container->type == VOX_TYPE_ARRAY) {
         auto* array = static_cast<vox_array_object*>(container);
@@ -30,7 +35,7 @@ void free_container(vox_container_object* container) noexcept {
         if (dictionary->entries != dictionary->inline_entries())
             deallocate(dictionary->entries);
         deallocate(dictionary->index);
-        vox_release(dictionary->remote);
+        leave_remote(*dictionary);
     }
     deallocate(container);
 }
@@ -43,9 +48,11 @@ void free_leaf(vox_object* object) noexcept {
             return;
         }
         case VOX_TYPE_FD:
-        case VOX_TYPE_ENDPOINT:
-            close(static_cast<vox_descriptor_object*>(object)->descriptor);
+        case VOX_TYPE_ENDPOINT: {
+            const auto* owner = static_cast<vox_descriptor_object*>(object);
+            close_descriptor(owner->descriptor, owner->from);
             break;
+        }
         case VOX_TYPE_ERROR:
             vox_release(static_cast<vox_error_object*>(object)->description);
             break;

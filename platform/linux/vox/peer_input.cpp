@@ -140,7 +140,7 @@ void peer_connection::read_failed(int error) {
 }
 
 void peer_connection::violation(std::string reason) {
-    fail(VOX_ERROR_CONNECTION_INVALID, std::move(reason), blame::peer);
+    fail(VOX_ERROR_CONNECTION_INVALID, std::move(reason), blame::protocol);
 }
 
 void peer_connection::handle(const frame& arrived) {

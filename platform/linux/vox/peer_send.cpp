@@ -177,7 +177,7 @@ int peer_connection::admit(frame_type kind, std::size_t size) {
     fail_locked(VOX_ERROR_CONNECTION_INVALID,
                 "the peer does not read: " + std::to_string(out_.messages() + early_.size()) +
                     " messages, " + std::to_string(out_.bytes() + early_bytes_) + " bytes wait",
-                blame::peer);
+                blame::limit);
     return EPIPE;
 }
 

@@ -53,10 +53,13 @@ struct vox_error_object : vox_object {
     vox_object* description = nullptr;  // owned string, or null
 };
 
+struct vox_custom_object;
+
 // A file descriptor; an endpoint is one as well: a socket that leads to its listener.
 struct vox_descriptor_object : vox_object {
     using vox_object::vox_object;
-    int descriptor = -1;  // owned, close-on-exec
+    int descriptor = -1;                // owned, close-on-exec
+    vox_custom_object* from = nullptr;  // who is told when it is closed; null: nobody
 };
 
 struct vox_container_object : vox_object {
@@ -101,12 +104,16 @@ struct vox_dictionary_object : vox_container_object {
     }
 };
 
-// An object whose type is implemented elsewhere. `destroy` frees it, after
-// its count fell to zero, on the thread that dropped the last reference.
+// An object whose type is implemented elsewhere. All on the thread that dropped a
+// last reference:
+//   `destroy` frees it, after its own count fell to zero;
+//   `message_gone`: a dictionary that has it as `remote`, and a reply_id, is being freed;
+//   `descriptor_gone`: a descriptor that is `from` it was closed.
 // `describe` appends a description for logs.
-struct vox_custom_object;
 struct vox_custom_vtable {
     void (*destroy)(vox_custom_object* object) noexcept;
+    void (*message_gone)(vox_custom_object* remote, vox_dictionary_object& message) noexcept;
+    void (*descriptor_gone)(vox_custom_object* from) noexcept;
     void (*describe)(const vox_custom_object* object, std::string& out);
 };
 struct vox_custom_object : vox_object {
@@ -138,8 +145,12 @@ void deallocate(void* memory) noexcept;
 
 // A bytes object of `type` whose `length` bytes the caller fills in; the NUL is set.
 [[nodiscard]] vox_bytes_object* make_bytes(vox_type type, std::size_t length) noexcept;
-// VOX_TYPE_FD or VOX_TYPE_ENDPOINT around `descriptor`, which it adopts.
-[[nodiscard]] vox_object* adopt_descriptor(vox_type type, int descriptor) noexcept;
+// VOX_TYPE_FD or VOX_TYPE_ENDPOINT around `descriptor`, which it adopts; `from` is
+// not retained.
+[[nodiscard]] vox_object* adopt_descriptor(vox_type type, int descriptor,
+                                           vox_custom_object* from = nullptr) noexcept;
+// Closes `descriptor`, and tells `from` unless that is null.
+void close_descriptor(int descriptor, vox_custom_object* from) noexcept;
 // A close-on-exec duplicate of its descriptor for the caller to close; -1 with
 // errno (EINVAL for other types).
 [[nodiscard]] int duplicate_descriptor(vox_object* object) noexcept;
