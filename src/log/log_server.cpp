@@ -60,6 +60,13 @@ void LogServer::registerLogger(const std::string& domain,
     });
 }
 
+void LogServer::tidyUp(const std::string& domain) {
+    execute_wrapped([this, domain] {
+        ownQueue_.assertCurrent();
+        tree_.tidyUpAt(domain);
+    });
+}
+
 LogLevel LogServer::getCurrentLogLevel(const std::string& domain) const {
     return levels_->lookUp(domain);
 }

@@ -74,10 +74,15 @@ LoggerTree& LoggerTree::getOrCreateFromPath(const std::string& path) {
     return *node;
 }
 
+LoggerTree::Children::const_iterator LoggerTree::placeOf(std::string_view name) const {
+    return std::ranges::lower_bound(children_, name, {}, &LoggerTree::name_);
+}
+
 LoggerTree& LoggerTree::getOrCreateChild(std::string_view name) {
-    const auto place = std::ranges::lower_bound(children_, name, {}, &LoggerTree::name_);
+    const auto place = placeOf(name);
+    const auto index = static_cast<std::size_t>(place - children_.begin());
     if (place != children_.end() && place->name_ == name)
-        return *place;
+        return children_[index];
     LoggerTree& child = *children_.emplace(place, std::string(name));
     child.updateParentLogLevel(getLogLevel());
     child.commit();
@@ -88,7 +93,7 @@ const LoggerTree& LoggerTree::getNearestToPath(const std::string& path) const {
     Names names(path);
     const LoggerTree* node = this;
     for (std::string_view name = names.next(); !name.empty(); name = names.next()) {
-        const auto place = std::ranges::lower_bound(node->children_, name, {}, &LoggerTree::name_);
+        const auto place = node->placeOf(name);
         if (place == node->children_.end() || place->name_ != name)
             break;
         node = &*place;
@@ -211,6 +216,31 @@ void LoggerTree::appendLoggers(const std::string& path, const vox::array& out, b
 
 void LoggerTree::tidyUp() {
     std::erase_if(loggers_, [](const auto& logger) { return logger.expired(); });
+}
+
+bool LoggerTree::isNeeded() const noexcept {
+    return !children_.empty() || !loggers_.empty() || committed_.local != LogLevel::Unset ||
+           pending_;
+}
+
+void LoggerTree::tidyUpAt(const std::string& path) {
+    Names names(path);
+    std::vector<LoggerTree*> way{this};
+    for (std::string_view name = names.next(); !name.empty(); name = names.next()) {
+        Children& children = way.back()->children_;
+        const auto index = static_cast<std::size_t>(way.back()->placeOf(name) - children.begin());
+        if (index == children.size() || children[index].name_ != name)
+            break;
+        way.push_back(&children[index]);
+    }
+    for (; !way.empty(); way.pop_back()) {
+        LoggerTree& node = *way.back();
+        node.tidyUp();
+        if (way.size() > 1 && !node.isNeeded()) {
+            Children& siblings = way[way.size() - 2]->children_;
+            siblings.erase(siblings.begin() + (&node - siblings.data()));
+        }
+    }
 }
 
 }  // namespace plr

@@ -118,6 +118,23 @@ TEST(LoggerTree, ForgetsLoggersThatAreGoneWhenAnotherComes) {
     EXPECT_TRUE(remembered.expired());
 }
 
+TEST(LoggerTree, ForgetsDomainsThatNobodyNeeds) {
+    LoggerTree root = infoRoot();
+    root.updateLogLevels(asDict({{"kept.level", number(Warn)}}));
+    root.commitConfigUpdate();
+    const auto living = insertNew(root, "kept.logger");
+    for (const char* path : {"kept.logger.x", "kept.level.x", "gone.x.y", "kept.x", "..dots", ""})
+        insertNew(root, path);  // gone
+    for (const char* path : {"kept.logger.x", "kept.level.x", "gone.x.y.z", "kept.x", "dots", ""})
+        root.tidyUpAt(path);
+    vox::dict config = vox::dict::create();
+    root.getFullConfig(config);
+    EXPECT_EQ(config["kDomainLogLevels"], asDict({{"", number(Info)},
+                                                  {"kept", number(Info)},
+                                                  {"kept.level", number(Warn)},
+                                                  {"kept.logger", number(Info)}}));
+}
+
 // A configuration comes from outside: no path of it may exhaust the stack, or
 // memory out of proportion.
 TEST(LoggerTree, APathOfAHundredThousandNamesIsOneLikeOthers) {

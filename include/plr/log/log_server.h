@@ -58,6 +58,9 @@ class PLR_EXPORT LogServer : public SharedSynchronizable<LogServer> {
     // The logger is told its level now when its domain has a configured one, and
     // again, and at every change, from the server's queue. Held weakly. Any thread.
     void registerLogger(const std::string& domain, const std::shared_ptr<TrackedLogger>& logger);
+    // Forgets loggers of `domain` that are gone, and the domain when nothing else
+    // needs it: for domains that others make up. Asynchronous. Any thread.
+    void tidyUp(const std::string& domain);
 
     // The level of the nearest configured domain above `domain`, without a lock:
     // Unset before start(). Any thread.

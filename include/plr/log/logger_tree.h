@@ -106,6 +106,9 @@ class PLR_EXPORT LoggerTree {
 
     // Forgets this node's loggers that are gone.
     void tidyUp();
+    // The same at `path` and on the way there; nodes that nobody needs go too:
+    // without a level of their own, loggers, and nodes below.
+    void tidyUpAt(const std::string& path);
 
   private:
     struct Levels {
@@ -117,13 +120,17 @@ class PLR_EXPORT LoggerTree {
     [[nodiscard]] const Levels& upcoming() const noexcept {
         return pending_ ? *pending_ : committed_;
     }
+    using Children = std::vector<LoggerTree>;
+    // The first child whose name is not less.
+    [[nodiscard]] Children::const_iterator placeOf(std::string_view name) const;
     [[nodiscard]] LoggerTree& getOrCreateChild(std::string_view name);
+    [[nodiscard]] bool isNeeded() const noexcept;
     void commit();
     void announce(LogLevel level);
     void fillConfig(vox::dict& config, bool full) const;
     void appendLoggers(const std::string& path, const vox::array& out, bool full) const;
 
-    std::vector<LoggerTree> children_;  // sorted by the bytes of their names
+    Children children_;  // sorted by the bytes of their names
     std::vector<std::weak_ptr<TrackedLogger>> loggers_;
     std::string name_;  // this node's alone
     Levels committed_;
