@@ -81,6 +81,8 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/include/vox/tap.h
     platform/include/vox/vox.h
   SOURCES
+    platform/linux/vox/admission.cpp
+    platform/linux/vox/admission.h
     platform/linux/vox/complaint.cpp
     platform/linux/vox/complaint.h
     platform/linux/vox/connection.cpp
@@ -102,10 +104,15 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/lock.h
     platform/linux/vox/names.cpp
     platform/linux/vox/names.h
+    platform/linux/vox/notify.cpp
     platform/linux/vox/output.cpp
     platform/linux/vox/output.h
+    platform/linux/vox/passed_sockets.cpp
+    platform/linux/vox/passed_sockets.h
     platform/linux/vox/peer_connection.cpp
     platform/linux/vox/peer_connection.h
+    platform/linux/vox/peer_identity.cpp
+    platform/linux/vox/peer_identity.h
     platform/linux/vox/peer_input.cpp
     platform/linux/vox/peer_send.cpp
     platform/linux/vox/peer_write.cpp

@@ -4,8 +4,10 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <utility>
+#include <vector>
 
 #include "platform/linux/vox/limits.h"
 #include "platform/linux/vox/peer_connection.h"
@@ -149,6 +151,13 @@ uid_t vox_connection_get_uid(vox_connection_t object) {
 gid_t vox_connection_get_gid(vox_connection_t object) {
     peer_connection* of = peer(object);
     return of ? of->credentials().gid : static_cast<gid_t>(-1);
+}
+
+size_t vox_connection_get_groups(vox_connection_t object, gid_t* groups, size_t most) {
+    peer_connection* of = peer(object);
+    const std::vector<gid_t> found = of ? of->groups() : std::vector<gid_t>();
+    std::copy_n(found.begin(), std::min(most, found.size()), groups);
+    return found.size();
 }
 
 void vox_connection_get_statistics(vox_connection_t object, vox_statistics_t* statistics) {

@@ -8,21 +8,17 @@
 #include <cstdint>
 #include <cstring>
 
+#include "platform/linux/vox/peer_identity.h"
 #include "platform/linux/vox/socket_io.h"
 #include "platform/linux/vox/value_layout.h"
 
 namespace vox_link {
 namespace {
 
-int option(int fd, int name) noexcept {
-    int value = -1;
-    socklen_t size = sizeof value;
-    return ::getsockopt(fd, SOL_SOCKET, name, &value, &size) == 0 ? value : -1;
-}
-
-bool is_client_socket(int fd) noexcept {
-    return option(fd, SO_DOMAIN) == AF_UNIX && option(fd, SO_TYPE) == SOCK_STREAM &&
-           option(fd, SO_ACCEPTCONN) == 0;
+// Whether `fd` ends in its sender. Somebody else's socket, passed on, would
+// make that somebody the client: what it sends would be taken for its wishes.
+bool is_client_socket(int fd, pid_t sender) noexcept {
+    return is_stream_socket(fd, false) && credentials_of(fd).pid == sender;
 }
 
 int send_client(int endpoint, int client) noexcept {
@@ -37,6 +33,13 @@ int make_endpoint_pair(int& listeners, int& holders) noexcept {
     std::array<int, 2> ends;
     if (::socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC | SOCK_NONBLOCK, 0, ends.data()) != 0)
         return errno;
+    const int on = 1;
+    if (::setsockopt(ends[0], SOL_SOCKET, SO_PASSCRED, &on, sizeof on) != 0) {
+        const int error = errno;
+        ::close(ends[0]);
+        ::close(ends[1]);
+        return error;
+    }
     listeners = ends[0];
     holders = ends[1];
     return 0;
@@ -77,7 +80,8 @@ int take_client(int listeners, int& fd) noexcept {
         return EMFILE;
     if (got.bytes == 0 && got.descriptor_count == 0)
         return ECONNRESET;
-    if (got.bytes == 1 && got.descriptor_count == 1 && is_client_socket(got.descriptors[0])) {
+    if (got.bytes == 1 && got.descriptor_count == 1 &&
+        is_client_socket(got.descriptors[0], got.sender)) {
         fd = got.descriptors[0];
         return 0;
     }

@@ -4,11 +4,13 @@
 
 #include "vox/value.h"
 
-// Endpoints: values that lead to an anonymous listener.
+// Endpoints: values that lead to a listener, whether it has a name or not.
 //
 // An endpoint is one end of a SOCK_SEQPACKET pair; its listener watches the
 // other. To connect is to make a stream pair and to send one end of it over
-// the endpoint, with one byte: packet = 0x00 beside exactly one descriptor.
+// the endpoint, with one byte: packet = 0x00 beside exactly one descriptor. The
+// process that sends it is the one that made it (SO_PASSCRED, SO_PEERCRED), so
+// that the client is who the kernel says it is.
 namespace vox_link {
 
 // The two ends of a new pair. Returns 0 or an error number.

@@ -10,16 +10,21 @@
 #include <chrono>
 #include <cstring>
 #include <utility>
+#include <vector>
 
 #include "platform/linux/vox/complaint.h"
 #include "platform/linux/vox/endpoint.h"
 #include "platform/linux/vox/peer_connection.h"
+#include "platform/linux/vox/peer_identity.h"
+#include "plr/base/assert.h"
 
 namespace vox_link {
 namespace {
 
 constexpr unsigned kClientsPerTurn = 64;
 constexpr std::chrono::milliseconds kPause(100);
+// Out of descriptors: clients that try again at once must not keep us busy.
+constexpr unsigned kRefusedBeforePause = 64;
 
 int open_reserve() noexcept {
     return ::open("/dev/null", O_RDONLY | O_CLOEXEC);
@@ -27,6 +32,15 @@ int open_reserve() noexcept {
 
 bool is_out_of_descriptors(int error) noexcept {
     return error == EMFILE || error == ENFILE;
+}
+
+bool is_out_of_memory(int error) noexcept {
+    return error == ENOMEM || error == ENOBUFS;
+}
+
+// From accept(2): somebody has shut down a socket that was passed to us.
+bool listens_no_more(int error) noexcept {
+    return error == EINVAL || error == EBADF || error == ENOTSOCK || error == EOPNOTSUPP;
 }
 
 }  // namespace
@@ -48,10 +62,20 @@ listener::listener(std::string name, bool anonymous, const vox_limits_t& limits)
     : connection(std::move(name)),
       limits_(limits),
       anonymous_(anonymous),
-      account_(std::make_shared<service_account>(limits)) {}
+      account_(std::make_shared<service_account>(limits)) {
+    set_policy(nullptr);
+}
 
 std::string listener::title() {
     return "listener '" + name() + "'";
+}
+
+void listener::set_policy(const vox_policy_t* policy) {
+    PLR_ASSERT(!is_started(), "vox_listener_set_policy() after the first resume");
+    if (policy)
+        admission_ = admission(*policy);
+    else
+        admission_ = anonymous_ ? admission::of_everybody() : admission();
 }
 
 // ---- Opening and closing ------------------------------------------------------------
@@ -59,7 +83,7 @@ std::string listener::title() {
 void listener::start() {
     service_socket service;
     std::string why;
-    if (!anonymous_ && open_service(name(), service, why) != 0) {
+    if (!anonymous_ && open_service(name(), admission_.lets_others_in(), service, why) != 0) {
         fail(VOX_ERROR_CONNECTION_INVALID, "cannot listen: " + why);
         return;
     }
@@ -220,13 +244,15 @@ listener::taken listener::accept_one(int listening) {
         return taken::client;
     if (is_out_of_descriptors(errno))
         return refuse_one(listening);
-    complain(title() + " cannot accept: " + ::strerrordesc_np(errno));
-    return taken::pause;
+    if (!listens_no_more(errno))
+        return out_of_memory(errno);
+    fail(VOX_ERROR_CONNECTION_INVALID, std::string("cannot accept: ") + ::strerrordesc_np(errno));
+    return taken::nothing;
 }
 
 // The reserve descriptor makes room to take the client and let it go.
 listener::taken listener::refuse_one(int listening) {
-    complain(title() + " is out of descriptors and refuses clients");
+    note_shortage("is out of descriptors and refuses clients");
     if (reserve_ >= 0)
         ::close(std::exchange(reserve_, -1));
     const int fd = ::accept4(listening, nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK);
@@ -236,7 +262,30 @@ listener::taken listener::refuse_one(int listening) {
     reserve_ = open_reserve();
     if (error == EAGAIN)
         return taken::nothing;
-    return error == 0 && reserve_ >= 0 ? taken::client : taken::pause;
+    const taken done = error == 0 ? refused_one() : taken::pause;
+    return reserve_ >= 0 ? done : taken::pause;
+}
+
+listener::taken listener::refused_one() {
+    account_->count(service_account::event::refused_without_descriptors);
+    return ++refused_ % kRefusedBeforePause == 0 ? taken::pause : taken::client;
+}
+
+listener::taken listener::out_of_memory(int error) {
+    note_shortage(std::string("cannot take clients: ") + ::strerrordesc_np(error));
+    return taken::pause;
+}
+
+// One line when a shortage begins and one when it is over.
+void listener::note_shortage(const std::string& what) {
+    if (!std::exchange(short_, true))
+        complain(title() + " " + what);
+}
+
+void listener::note_relief() {
+    if (std::exchange(short_, false))
+        complain(title() + " takes clients again, " + std::to_string(std::exchange(refused_, 0)) +
+                 " were refused");
 }
 
 listener::taken listener::take_from_endpoint(int pair) {
@@ -252,25 +301,24 @@ listener::taken listener::take_from_endpoint(int pair) {
             complain("an endpoint carried something that is no connection");
             return taken::client;
         case EMFILE:
-            complain("out of descriptors: a client of an endpoint was refused");
-            return taken::client;
+            note_shortage("is out of descriptors and refuses clients");
+            return refused_one();
         default:
-            return taken::gone;
+            return is_out_of_memory(error) ? out_of_memory(error) : taken::gone;
     }
 }
 
 void listener::welcome(int fd) {
-    ucred peer = {0, static_cast<uid_t>(-1), 0};
-    socklen_t size = sizeof peer;
-    ::getsockopt(fd, SOL_SOCKET, SO_PEERCRED, &peer, &size);
+    note_relief();
+    const ucred peer = credentials_of(fd);
+    if (!is_admitted(fd, peer)) {
+        account_->count(service_account::event::refused_by_policy);
+        return turn_away(fd, peer, "the policy does not let it in");
+    }
     limit_hit hit;
     service_account::ticket place = account_->take(peer.uid, hit);
-    if (!place) {
-        ::close(fd);
-        complain(title() + " refused pid " + std::to_string(peer.pid) + " (uid " +
-                 std::to_string(peer.uid) + "): it has " + hit.text() + " clients");
-        return;
-    }
+    if (!place)
+        return turn_away(fd, peer, "it has " + hit.text() + " clients");
     peer_origin origin;
     origin.fd = fd;
     origin.accepted = true;
@@ -280,6 +328,18 @@ void listener::welcome(int fd) {
     account_->count(service_account::event::accepted);
     deliver(client);
     vox_release(client);
+}
+
+bool listener::is_admitted(int fd, const ucred& client) const {
+    const std::vector<gid_t> groups =
+        admission_.names_groups() ? groups_of(fd) : std::vector<gid_t>();
+    return admission_.admits(::geteuid(), client.uid, client.gid, groups);
+}
+
+void listener::turn_away(int fd, const ucred& client, const std::string& why) {
+    ::close(fd);
+    complain(title() + " refused pid " + std::to_string(client.pid) + " (uid " +
+             std::to_string(client.uid) + "): " + why);
 }
 
 void listener::pause() {

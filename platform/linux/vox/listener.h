@@ -1,5 +1,7 @@
 #pragma once
 
+#include <sys/socket.h>
+
 #include <cstdint>
 #include <deque>
 #include <list>
@@ -7,6 +9,7 @@
 #include <optional>
 #include <string>
 
+#include "platform/linux/vox/admission.h"
 #include "platform/linux/vox/connection.h"
 #include "platform/linux/vox/service_account.h"
 #include "platform/linux/vox/service_socket.h"
@@ -15,9 +18,10 @@
 // and hands them as connection events to its handler.
 //
 // Owner:   as connection. Clients outlive their listener.
-// Limits:  clients in all and by user; one too many is closed at once. Out of
-//          descriptors, a reserve one lets waiting clients be refused instead of
-//          being left waiting; without it accepting pauses for a while.
+// Refusal: clients that the policy does not let in, or that are too many, in all or
+//          of their user, are closed at once. Out of descriptors, a reserve one
+//          lets waiting clients be refused instead of being left waiting, some
+//          hundred a second; without it accepting pauses for a while.
 namespace vox_link {
 
 class listener final : public connection {
@@ -25,6 +29,8 @@ class listener final : public connection {
     // Anonymous without a name.
     listener(std::string name, bool anonymous, const vox_limits_t& limits);
 
+    // Before the first resume.
+    void set_policy(const vox_policy_t* policy);
     // A new endpoint value; the null object when none can be made.
     [[nodiscard]] vox_object_t make_endpoint();
     // What its clients cost.
@@ -64,12 +70,19 @@ class listener final : public connection {
     [[nodiscard]] taken accept_one(int listening) PLR_ON(queue_role_);
     [[nodiscard]] taken refuse_one(int listening) PLR_ON(queue_role_);
     [[nodiscard]] taken take_from_endpoint(int pair) PLR_ON(queue_role_);
+    [[nodiscard]] taken refused_one() PLR_ON(queue_role_);
+    [[nodiscard]] taken out_of_memory(int error) PLR_ON(queue_role_);
+    void note_shortage(const std::string& what) PLR_ON(queue_role_);
+    void note_relief() PLR_ON(queue_role_);
     void welcome(int fd) PLR_ON(queue_role_);
+    [[nodiscard]] bool is_admitted(int fd, const ucred& client) const;
+    void turn_away(int fd, const ucred& client, const std::string& why) PLR_ON(queue_role_);
     void pause() PLR_ON(queue_role_);
 
     const vox_limits_t limits_;
     const bool anonymous_;
     const std::shared_ptr<service_account> account_;
+    admission admission_;  // fixed from the first resume on
     std::optional<service_socket> service_ PLR_GUARDED_BY(lock_);
     std::list<std::unique_ptr<gate>> gates_ PLR_GUARDED_BY(lock_);
     bool opened_ PLR_GUARDED_BY(lock_) = false;
@@ -77,6 +90,8 @@ class listener final : public connection {
     std::deque<gate*> ready_ PLR_GUARDED_BY(queue_role_);
     bool paused_ PLR_GUARDED_BY(queue_role_) = false;
     int reserve_ PLR_GUARDED_BY(queue_role_) = -1;
+    bool short_ PLR_GUARDED_BY(queue_role_) = false;  // of descriptors or memory, and said so
+    std::uint64_t refused_ PLR_GUARDED_BY(queue_role_) = 0;  // clients, since then
 };
 
 }  // namespace vox_link

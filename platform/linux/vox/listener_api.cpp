@@ -34,6 +34,10 @@ vox_endpoint_t vox_endpoint_create(vox_connection_t object) {
     return static_cast<listener*>(found)->make_endpoint();
 }
 
+void vox_listener_set_policy(vox_connection_t object, const vox_policy_t* policy) {
+    required(object).set_policy(policy);
+}
+
 // ---- Looking -------------------------------------------------------------------------
 
 void vox_listener_get_statistics(vox_connection_t object, vox_listener_statistics_t* statistics) {

@@ -12,6 +12,7 @@
 #include "platform/linux/vox/endpoint.h"
 #include "platform/linux/vox/hello.h"
 #include "platform/linux/vox/limits.h"
+#include "platform/linux/vox/peer_identity.h"
 #include "platform/linux/vox/service_socket.h"
 
 namespace vox_link {
@@ -59,10 +60,8 @@ peer_connection::peer_connection(std::string name, const vox_limits_t& limits, p
     build_hello(accepts_, hello);
     const lock_guard guard(lock_);
     out_.append(hello);
-    if (origin_.from == peer_origin::kind::socket) {
-        socklen_t size = sizeof credentials_;
-        ::getsockopt(origin_.fd, SOL_SOCKET, SO_PEERCRED, &credentials_, &size);
-    }
+    if (origin_.from == peer_origin::kind::socket)
+        credentials_ = credentials_of(origin_.fd);
 }
 
 peer_connection::~peer_connection() {
@@ -73,7 +72,7 @@ peer_connection::~peer_connection() {
 
 void peer_connection::start() {
     if (origin_.from == peer_origin::kind::socket)
-        open(std::exchange(origin_.fd, -1));
+        open(origin_.fd);
     else
         try_to_connect(0);
 }
@@ -107,12 +106,12 @@ void peer_connection::connect_failed(int error, const std::string& why) {
 
 void peer_connection::open(int fd) {
     const lock_guard guard(lock_);
+    origin_.fd = -1;
     if (abandoned_) {
         ::close(fd);
         return;
     }
-    socklen_t size = sizeof credentials_;
-    ::getsockopt(fd, SOL_SOCKET, SO_PEERCRED, &credentials_, &size);
+    credentials_ = credentials_of(fd);
     fd_ = fd;
     hold();
     if (const int error = watch_.start(fd, EPOLLIN | EPOLLRDHUP, queue().get()); error != 0) {
@@ -194,6 +193,11 @@ void peer_connection::run_reply(waiting_reply& reply, vox_object_t result) {
 ucred peer_connection::credentials() const {
     const lock_guard guard(lock_);
     return credentials_;
+}
+
+std::vector<gid_t> peer_connection::groups() const {
+    const lock_guard guard(lock_);
+    return groups_of(fd_ >= 0 ? fd_.load() : origin_.fd);
 }
 
 vox_statistics_t peer_connection::statistics() const {

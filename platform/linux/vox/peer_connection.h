@@ -54,6 +54,8 @@ class peer_connection final : public connection {
     static void fail_request(waiting_reply reply, int error);
 
     [[nodiscard]] ucred credentials() const;
+    // Supplementary ones; empty when not known, or no more.
+    [[nodiscard]] std::vector<gid_t> groups() const;
     [[nodiscard]] vox_statistics_t statistics() const;
     [[nodiscard]] bool is_listener() const noexcept override { return false; }
 

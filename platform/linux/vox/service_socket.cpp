@@ -19,6 +19,7 @@ namespace {
 
 constexpr int kBacklog = 4096;  // the kernel caps it (net.core.somaxconn)
 constexpr mode_t kOwnerOnly = 0600;
+constexpr mode_t kEverybody = 0666;
 
 class descriptor {
   public:
@@ -96,17 +97,20 @@ int remove_stale(const std::string& path, const sockaddr_un& address, std::strin
     return ::unlink(path.c_str()) == 0 || errno == ENOENT ? 0 : failure(errno, path, why);
 }
 
-int bind_socket(const sockaddr_un& address, service_socket& made, std::string& why) {
+int bind_socket(const sockaddr_un& address, bool for_everybody, service_socket& made,
+                std::string& why) {
     descriptor listening(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
     if (listening.get() < 0)
         return failure(errno, "socket", why);
-    // The file gets the mode that the socket has now: it is never open to others.
+    // The file gets the mode that the socket has now, less the umask: it is never
+    // open to others before it is meant to be.
     if (::fchmod(listening.get(), kOwnerOnly) != 0)
         return failure(errno, "fchmod", why);
     if (::bind(listening.get(), generic(address), sizeof address) != 0)
         return failure(errno, made.path, why);
     struct stat file {};
-    if (::listen(listening.get(), kBacklog) != 0 || ::lstat(made.path.c_str(), &file) != 0) {
+    if ((for_everybody && ::chmod(made.path.c_str(), kEverybody) != 0) ||
+        ::listen(listening.get(), kBacklog) != 0 || ::lstat(made.path.c_str(), &file) != 0) {
         const int error = errno;
         ::unlink(made.path.c_str());
         return failure(error, made.path, why);
@@ -117,13 +121,8 @@ int bind_socket(const sockaddr_un& address, service_socket& made, std::string& w
     return 0;
 }
 
-}  // namespace
-
-int open_service(const std::string& name, service_socket& made, std::string& why) {
-    if (!is_service_name(name)) {
-        why = "'" + name + "' is no name of a service";
-        return EINVAL;
-    }
+int make_socket(const std::string& name, bool for_everybody, service_socket& made,
+                std::string& why) {
     const std::string directory = runtime_directory();
     if (const int error = check_directory(directory, true, why); error != 0)
         return error;
@@ -136,10 +135,24 @@ int open_service(const std::string& name, service_socket& made, std::string& why
         return -lock;
     const descriptor held(lock);
     const int error = remove_stale(made.path, address, why);
-    return error != 0 ? error : bind_socket(address, made, why);
+    return error != 0 ? error : bind_socket(address, for_everybody, made, why);
+}
+
+}  // namespace
+
+int open_service(const std::string& name, bool for_everybody, service_socket& made,
+                 std::string& why) {
+    if (!is_service_name(name)) {
+        why = "'" + name + "' is no name of a service";
+        return EINVAL;
+    }
+    const int error = take_passed_socket(name, made.passed, made.fd, why);
+    return error == ENOENT ? make_socket(name, for_everybody, made, why) : error;
 }
 
 void withdraw_service(const service_socket& served) noexcept {
+    if (served.passed)
+        return give_back_passed_socket(*served.passed);
     ::shutdown(served.fd, SHUT_RDWR);
     struct stat file {};
     if (::lstat(served.path.c_str(), &file) == 0 && file.st_dev == served.device &&

@@ -14,11 +14,25 @@ constexpr std::size_t kMostSent = 64;
 
 template <std::size_t Count>
 struct control_buffer {
-    alignas(cmsghdr) std::byte bytes[CMSG_SPACE(Count * sizeof(int))];
+    alignas(cmsghdr) std::byte bytes[CMSG_SPACE(sizeof(ucred)) + CMSG_SPACE(Count * sizeof(int))];
 };
 
-void take_descriptors(msghdr& message, received& result) noexcept {
+int option(int fd, int name) noexcept {
+    int value = -1;
+    socklen_t size = sizeof value;
+    return ::getsockopt(fd, SOL_SOCKET, name, &value, &size) == 0 ? value : -1;
+}
+
+void take_sender(cmsghdr* part, received& result) noexcept {
+    ucred sender;
+    std::memcpy(&sender, CMSG_DATA(part), sizeof sender);
+    result.sender = sender.pid;
+}
+
+void take_control(msghdr& message, received& result) noexcept {
     for (cmsghdr* part = CMSG_FIRSTHDR(&message); part; part = CMSG_NXTHDR(&message, part)) {
+        if (part->cmsg_level == SOL_SOCKET && part->cmsg_type == SCM_CREDENTIALS)
+            take_sender(part, result);
         if (part->cmsg_level != SOL_SOCKET || part->cmsg_type != SCM_RIGHTS)
             continue;
         const std::size_t count = (part->cmsg_len - CMSG_LEN(0)) / sizeof(int);
@@ -53,6 +67,11 @@ ssize_t send_once(int fd, std::span<iovec> pieces, std::span<const int> descript
 
 }  // namespace
 
+bool is_stream_socket(int fd, bool listening) noexcept {
+    return option(fd, SO_DOMAIN) == AF_UNIX && option(fd, SO_TYPE) == SOCK_STREAM &&
+           option(fd, SO_ACCEPTCONN) == (listening ? 1 : 0);
+}
+
 io_result send_pieces(int fd, std::span<iovec> pieces, std::span<const int> descriptors) noexcept {
     for (;;) {
         const ssize_t sent = send_once(fd, pieces, descriptors);
@@ -74,6 +93,7 @@ void receive_once(int fd, std::span<std::uint8_t> space, received& result) noexc
     result.error = 0;
     result.lost_descriptors = false;
     result.descriptor_count = 0;
+    result.sender = 0;
     iovec piece = {space.data(), space.size()};
     control_buffer<kMostReceived> control;
     msghdr message = {};
@@ -93,7 +113,7 @@ void receive_once(int fd, std::span<std::uint8_t> space, received& result) noexc
         }
     }
     if (message.msg_controllen > 0)
-        take_descriptors(message, result);
+        take_control(message, result);
     result.lost_descriptors = (message.msg_flags & MSG_CTRUNC) != 0;
 }
 

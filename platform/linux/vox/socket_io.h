@@ -12,6 +12,9 @@
 // descriptors beside the bytes.
 namespace vox_link {
 
+// Whether `fd` is an AF_UNIX stream socket, and `listening` or not.
+[[nodiscard]] bool is_stream_socket(int fd, bool listening) noexcept;
+
 struct io_result {
     std::size_t bytes = 0;
     int error = 0;  // 0, EAGAIN, or what ended the stream
@@ -27,6 +30,7 @@ struct received {
     std::size_t bytes = 0;  // 0 without error: end of file
     int error = 0;
     bool lost_descriptors = false;  // this process could not take all
+    pid_t sender = 0;               // sockets with SO_PASSCRED only
     std::size_t descriptor_count = 0;
     std::array<int, kMostReceived> descriptors;  // close-on-exec; the caller's
 
