@@ -115,6 +115,7 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/peer_identity.h
     platform/linux/vox/peer_input.cpp
     platform/linux/vox/peer_send.cpp
+    platform/linux/vox/peer_tap.cpp
     platform/linux/vox/peer_write.cpp
     platform/linux/vox/read_memory.cpp
     platform/linux/vox/read_memory.h
@@ -129,6 +130,8 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/service_socket.h
     platform/linux/vox/socket_io.cpp
     platform/linux/vox/socket_io.h
+    platform/linux/vox/tap_hub.cpp
+    platform/linux/vox/tap_hub.h
     platform/linux/vox/transactions.cpp
     platform/linux/vox/transactions.h)
 

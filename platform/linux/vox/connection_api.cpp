@@ -13,6 +13,7 @@
 #include "platform/linux/vox/peer_connection.h"
 #include "platform/linux/vox/request.h"
 #include "plr/base/assert.h"
+#include "vox/tap.h"
 
 using vox_link::connection;
 using vox_link::peer_connection;
@@ -31,6 +32,12 @@ connection& required(vox_connection_t object) {
 peer_connection* peer(vox_connection_t object) {
     connection& found = required(object);
     return found.is_listener() ? nullptr : static_cast<peer_connection*>(&found);
+}
+
+// The same; null for taps too.
+peer_connection* sender(vox_connection_t object) {
+    peer_connection* found = peer(object);
+    return found && !found->is_tap() ? found : nullptr;
 }
 
 vox_connection_t make_peer(const char* name, const vox_limits_t* limits, peer_origin origin) {
@@ -58,6 +65,13 @@ vox_connection_t vox_connection_create_from_endpoint(vox_endpoint_t endpoint) {
     origin.from = peer_origin::kind::endpoint;
     origin.endpoint = vox_retain(endpoint);
     return make_peer("", nullptr, std::move(origin));
+}
+
+vox_connection_t vox_connection_create_tap(const char* name) {
+    peer_origin origin;
+    origin.from = peer_origin::kind::service;
+    origin.tap = true;
+    return make_peer(name ? name : "", nullptr, std::move(origin));
 }
 
 void vox_connection_create_pair(vox_connection_t* left, vox_connection_t* right,
@@ -100,7 +114,7 @@ void vox_connection_cancel(vox_connection_t object) {
 // ---- Sending -------------------------------------------------------------------------
 
 int vox_connection_send_message(vox_connection_t object, vox_object_t message) {
-    peer_connection* to = peer(object);
+    peer_connection* to = sender(object);
     return to ? to->send_message(message) : EINVAL;
 }
 
@@ -108,7 +122,7 @@ void vox_connection_send_message_with_reply(vox_connection_t object, vox_object_
                                             const dispatch::queue* queue,
                                             const dispatch::block<void(vox_object_t)>* handler) {
     PLR_ASSERT(queue && *queue && handler && *handler, "a Vox reply needs a queue and a handler");
-    if (peer_connection* to = peer(object))
+    if (peer_connection* to = sender(object))
         to->send_request(message, *queue, *handler);
     else
         peer_connection::fail_request({.id = 0, .queue = *queue, .handler = *handler}, EINVAL);

@@ -80,6 +80,20 @@ void skip_header(vox_wire::encoded& out) noexcept {
     out.bytes.set_size(kHeaderBytes);
 }
 
+int build_frame(frame_type type, std::uint64_t id, vox_object_t value,
+                const vox_wire::codec_limits& limits, vox_wire::encoded& out) {
+    skip_header(out);
+    if (const int error = vox_wire::encode(value, limits, out); error != 0)
+        return error;
+    write_header({.type = type,
+                  .flags = 0,
+                  .descriptors = static_cast<std::uint16_t>(out.descriptors.size()),
+                  .length = static_cast<std::uint32_t>(out.bytes.size() - kHeaderBytes),
+                  .id = id},
+                 out.bytes.data());
+    return 0;
+}
+
 void build_control(frame_type type, std::uint8_t flags, std::uint64_t id, vox_object_t value,
                    vox_wire::encoded& out) {
     skip_header(out);

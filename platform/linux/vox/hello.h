@@ -14,6 +14,11 @@ namespace vox_link {
 // Leaves room for the header in `out`, which is empty.
 void skip_header(vox_wire::encoded& out) noexcept;
 
+// Builds a frame whose body is `value` in `out`, which is empty. Returns an error
+// number as encode() does.
+[[nodiscard]] int build_frame(frame_type type, std::uint64_t id, vox_object_t value,
+                              const vox_wire::codec_limits& limits, vox_wire::encoded& out);
+
 // Builds a frame whose body is `value` (taken over) in `out`, which is empty.
 void build_control(frame_type type, std::uint8_t flags, std::uint64_t id, vox_object_t value,
                    vox_wire::encoded& out);

@@ -322,6 +322,7 @@ void listener::welcome(int fd) {
     peer_origin origin;
     origin.fd = fd;
     origin.accepted = true;
+    origin.taps = taps_;
     origin.place = std::move(place);
     // Unless the handler keeps it, this reference is the only one.
     connection* client = new peer_connection(name(), limits_, std::move(origin));

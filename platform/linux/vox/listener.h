@@ -13,6 +13,7 @@
 #include "platform/linux/vox/connection.h"
 #include "platform/linux/vox/service_account.h"
 #include "platform/linux/vox/service_socket.h"
+#include "platform/linux/vox/tap_hub.h"
 
 // A listener: takes the clients of a name, or of the endpoints made for it,
 // and hands them as connection events to its handler.
@@ -36,6 +37,7 @@ class listener final : public connection {
     // What its clients cost.
     [[nodiscard]] service_account& account() const noexcept { return *account_; }
     [[nodiscard]] bool is_listener() const noexcept override { return true; }
+    [[nodiscard]] tap_hub& taps() const noexcept { return *taps_; }
 
   protected:
     void start() override;
@@ -82,6 +84,7 @@ class listener final : public connection {
     const vox_limits_t limits_;
     const bool anonymous_;
     const std::shared_ptr<service_account> account_;
+    const std::shared_ptr<tap_hub> taps_ = std::make_shared<tap_hub>();
     admission admission_;  // fixed from the first resume on
     std::optional<service_socket> service_ PLR_GUARDED_BY(lock_);
     std::list<std::unique_ptr<gate>> gates_ PLR_GUARDED_BY(lock_);

@@ -1,9 +1,10 @@
-// The functions of vox/listener.h.
+// The functions of vox/listener.h, and vox_listener_set_taps().
 #include "vox/listener.h"
 
 #include "platform/linux/vox/limits.h"
 #include "platform/linux/vox/listener.h"
 #include "plr/base/assert.h"
+#include "vox/tap.h"
 
 using vox_link::connection;
 using vox_link::listener;
@@ -36,6 +37,10 @@ vox_endpoint_t vox_endpoint_create(vox_connection_t object) {
 
 void vox_listener_set_policy(vox_connection_t object, const vox_policy_t* policy) {
     required(object).set_policy(policy);
+}
+
+void vox_listener_set_taps(vox_connection_t object, int allowed) {
+    required(object).taps().set_allowed(allowed != 0);
 }
 
 // ---- Looking -------------------------------------------------------------------------

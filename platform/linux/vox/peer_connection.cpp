@@ -62,6 +62,12 @@ peer_connection::peer_connection(std::string name, const vox_limits_t& limits, p
     out_.append(hello);
     if (origin_.from == peer_origin::kind::socket)
         credentials_ = credentials_of(origin_.fd);
+    tapped_.bind(std::move(origin_.taps), credentials_);
+    if (origin_.tap) {
+        vox_wire::encoded wish;
+        build_control(frame_type::tap, 0, 0, vox_null_create(), wish);
+        out_.append(wish);
+    }
 }
 
 peer_connection::~peer_connection() {
@@ -174,6 +180,10 @@ void peer_connection::wind_up(vox_object_t error) {
         run_reply(reply, error);
     for (const waiting_barrier& barrier : barriers)
         barrier.work();
+    if (stage_ == stage::tap && tapped_.hub())
+        tapped_.hub()->remove(this);
+    else
+        tapped_.closed(error);
     origin_.place = {};
 }
 

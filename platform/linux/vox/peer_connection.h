@@ -16,11 +16,13 @@
 #include "platform/linux/vox/output.h"
 #include "platform/linux/vox/reply_table.h"
 #include "platform/linux/vox/service_account.h"
+#include "platform/linux/vox/tap_hub.h"
 
 // A connection to one peer.
 //
 // Files:   peer_connection.cpp connects and ends, peer_input.cpp reads and
-//          delivers, peer_send.cpp takes what is to be sent, peer_write.cpp writes it.
+//          delivers, peer_send.cpp takes what is to be sent, peer_write.cpp writes it,
+//          peer_tap.cpp has those that only look on.
 // Threads: everything received is read, decoded and delivered on the target
 //          queue. Senders encode on their own thread without the lock; then one
 //          of them writes at a time, without the lock, and takes along what the
@@ -39,6 +41,8 @@ struct peer_origin {
     vox_object* endpoint{};  // kind::endpoint: an owned reference
     bool accepted = false;   // by a listener
     service_account::ticket place;
+    bool tap = false;               // asks to be one
+    std::shared_ptr<tap_hub> taps;  // of the listener
 };
 
 class peer_connection final : public connection {
@@ -62,6 +66,13 @@ class peer_connection final : public connection {
     // Writes what a turn of the calling thread had put together.
     void flush_turn();
 
+    // A tap's own end: sending fails.
+    [[nodiscard]] bool is_tap() const noexcept { return origin_.tap; }
+    // The service's end of a tap, for its hub.
+    [[nodiscard]] bool has_room_for_entry() const;
+    void send_entry(vox_object_t entry, std::uint64_t left_out);
+    void leave_out(std::uint64_t entries);
+
   protected:
     void start() override;
     void turn() PLR_REQUIRES(queue_role_) override;
@@ -70,6 +81,8 @@ class peer_connection final : public connection {
     [[nodiscard]] std::string title() override;
 
   private:
+    // Of what the peer sends: its hello, then messages, or none from a tap or its service.
+    enum class stage : std::uint8_t { hello, messages, tap };
     struct waiting_barrier {
         std::uint64_t behind;  // frames; before the hello, messages that wait for it
         dispatch::block<void()> work;
@@ -134,19 +147,35 @@ class peer_connection final : public connection {
     void unblock();
     void retry_later() PLR_REQUIRES(lock_);
 
+    // peer_tap.cpp
+    // Hot path: a frame that is accepted for sending, or dropped.
+    void show(const vox_wire::encoded& made, bool as_dropped = false) PLR_REQUIRES(lock_) {
+        if (tapped_.is_watched()) [[unlikely]]
+            show_frame(made, as_dropped);
+    }
+    void show_frame(const vox_wire::encoded& made, bool as_dropped) PLR_REQUIRES(lock_);
+    void handle_tap(const frame& arrived) PLR_ON(queue_role_);
+    void refuse_tap(const char* why);
+    void handle_stray(const frame& arrived) PLR_ON(queue_role_);
+    void unblock_tap();
+    void handle_entry(const frame& arrived) PLR_ON(queue_role_);
+    void show_value(vox_dictionary_object& entry) const;
+    void deliver_missed(std::uint64_t entries) PLR_ON(queue_role_);
+
     const vox_limits_t limits_;
     const vox_wire::codec_limits accepts_;  // what this side decodes
 
     // Set up.
     peer_origin origin_;
     watch watch_;
+    tapped_client tapped_;
     ucred credentials_ PLR_GUARDED_BY(lock_) = {-1, static_cast<uid_t>(-1), static_cast<gid_t>(-1)};
 
     // Receiving.
     frame_reader reader_ PLR_GUARDED_BY(queue_role_);
     bool readable_ PLR_GUARDED_BY(queue_role_) = false;
     bool hung_up_ PLR_GUARDED_BY(queue_role_) = false;  // an end of file is to be read
-    bool greeted_by_peer_ PLR_GUARDED_BY(queue_role_) = false;
+    stage stage_ PLR_GUARDED_BY(queue_role_) = stage::hello;
     bool watch_over_ PLR_GUARDED_BY(queue_role_) = false;  // one call still comes
     dispatch::source incomplete_timer_ PLR_GUARDED_BY(queue_role_);
     bool incomplete_armed_ PLR_GUARDED_BY(queue_role_) = false;
@@ -164,6 +193,7 @@ class peer_connection final : public connection {
     bool blocked_ PLR_GUARDED_BY(lock_) = false;  // until the peer has read
     std::atomic<bool> broken_{false};  // the peer reads no more; changes under lock_ only
     bool abandoned_ PLR_GUARDED_BY(lock_) = false;  // cut off
+    bool is_tap_ PLR_GUARDED_BY(lock_) = false;     // the service's end of one
     bool closing_ PLR_GUARDED_BY(lock_) = false;    // the writer closes the socket
     bool wound_up_ PLR_GUARDED_BY(lock_) = false;
     bool in_turn_ PLR_GUARDED_BY(lock_) = false;  // a turn will flush

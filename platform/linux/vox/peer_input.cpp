@@ -40,8 +40,12 @@ void peer_connection::handle_events() {
         readable_ = true;
     if ((events & (EPOLLRDHUP | EPOLLHUP | EPOLLERR)) != 0)
         hung_up_ = true;
-    if ((events & (EPOLLOUT | EPOLLHUP | EPOLLERR)) != 0)
-        unblock();
+    if ((events & (EPOLLOUT | EPOLLHUP | EPOLLERR)) != 0) {
+        if (stage_ == stage::tap && tapped_.hub()) [[unlikely]]
+            unblock_tap();
+        else
+            unblock();
+    }
     if (may_deliver())
         read_turn();
 }
@@ -62,6 +66,8 @@ void peer_connection::read_turn() {
     unsigned reads = kReadsPerTurn;
     while (deliver_frames(sends, frames) && reads > 0 && receive(memory.bytes()))
         --reads;
+    if (stage_ == stage::messages)
+        tapped_.opened();
     reader_.keep();
     if (!may_deliver())
         return;
@@ -144,24 +150,28 @@ void peer_connection::violation(std::string reason) {
 }
 
 void peer_connection::handle(const frame& arrived) {
-    if (carries_message(arrived.header.type) && greeted_by_peer_) [[likely]]
+    const bool message = carries_message(arrived.header.type);
+    if (message && stage_ == stage::messages) [[likely]]
         return handle_message(arrived);
     if (arrived.header.type == frame_type::hello)
         return handle_hello(arrived);
-    if (greeted_by_peer_)
-        return handle_control(arrived);
-    close_all(arrived.descriptors);
-    violation("the first frame is not a hello");
+    if (stage_ == stage::hello) {
+        close_all(arrived.descriptors);
+        return violation("the first frame is not a hello");
+    }
+    if (message)
+        return handle_stray(arrived);
+    handle_control(arrived);
 }
 
 void peer_connection::handle_hello(const frame& arrived) {
-    if (greeted_by_peer_)
+    if (stage_ != stage::hello)
         return violation("second hello");
     vox_wire::codec_limits accepted;
     std::string why;
     if (!read_hello(arrived.body, accepted, why))
         return violation(std::move(why));
-    greeted_by_peer_ = true;
+    stage_ = origin_.tap ? stage::tap : stage::messages;
     greet(accepted);
 }
 
@@ -173,6 +183,8 @@ void peer_connection::handle_message(const frame& arrived) {
     messages_received_.store(messages_received_.load(std::memory_order_relaxed) + 1,
                              std::memory_order_relaxed);
     heard_.store(true, std::memory_order_relaxed);
+    if (tapped_.is_watched()) [[unlikely]]
+        tapped_.show(tap_way::in, arrived.header, arrived.body);
     if (arrived.header.type == frame_type::reply) {
         waiting_reply reply;
         {
@@ -210,15 +222,23 @@ void peer_connection::handle_control(const frame& arrived) {
         case frame_type::cancel:
             if (!is_null_body(arrived.body))
                 return violation("ping or cancel with a body that is not null");
+            if (arrived.header.type == frame_type::cancel && tapped_.is_watched())
+                tapped_.show(tap_way::in, arrived.header, arrived.body);
             if (arrived.header.type == frame_type::ping &&
                 (arrived.header.flags & kPingWantsAnswer) != 0)
                 send_control(frame_type::ping, 0, arrived.header.id, vox_null_create());
             return;
+        case frame_type::tap:
+            return handle_tap(arrived);
         default: {
             const std::int64_t count = read_dropped(arrived.body);
             if (count < 0)
                 return violation("count of dropped messages is no number");
             peer_dropped_.fetch_add(static_cast<std::uint64_t>(count), std::memory_order_relaxed);
+            if (origin_.tap)
+                deliver_missed(static_cast<std::uint64_t>(count));
+            else if (tapped_.is_watched())
+                tapped_.show(tap_way::in, arrived.header, arrived.body);
         }
     }
 }

@@ -25,20 +25,6 @@ vox_wire::encoded& scratch() {
     return memory;
 }
 
-int encode_frame(vox_object_t message, frame_type type, std::uint64_t id,
-                 const vox_wire::codec_limits& limits, vox_wire::encoded& out) {
-    skip_header(out);
-    if (const int error = vox_wire::encode(message, limits, out); error != 0)
-        return error;
-    write_header({.type = type,
-                  .flags = 0,
-                  .descriptors = static_cast<std::uint16_t>(out.descriptors.size()),
-                  .length = static_cast<std::uint32_t>(out.bytes.size() - kHeaderBytes),
-                  .id = id},
-                 out.bytes.data());
-    return 0;
-}
-
 }  // namespace
 
 int peer_connection::send_message(vox_object_t message) {
@@ -112,7 +98,7 @@ int peer_connection::send(vox_object_t message, frame_type kind, std::uint64_t i
         const bool greeted = greeted_.load(std::memory_order_acquire);
         vox_wire::encoded& made = scratch();
         if (const int error =
-                encode_frame(message, kind, id, greeted ? peer_accepts_ : accepts_, made);
+                build_frame(kind, id, message, greeted ? peer_accepts_ : accepts_, made);
             error != 0)
             return error;
         const lock_guard guard(lock_);
@@ -128,13 +114,17 @@ int peer_connection::send(vox_object_t message, frame_type kind, std::uint64_t i
 }
 
 int peer_connection::accept(vox_wire::encoded& made, frame_type kind, waiting_reply* reply) {
-    if (const int error = admit(kind, made.bytes.size()); error != 0)
+    if (const int error = admit(kind, made.bytes.size()); error != 0) {
+        if (error == ENOBUFS)
+            show(made, true);
         return error;
+    }
     if (reply) {
         reply->id = ++last_id_;
         write_header_id(reply->id, made.bytes.data());
         replies_.insert(std::move(*reply));
     }
+    show(made);
     if (greeted_.load(std::memory_order_relaxed)) {
         put(made, kind);
     } else {
@@ -156,6 +146,10 @@ bool peer_connection::has_room(std::size_t size, unsigned times) const {
 int peer_connection::admit(frame_type kind, std::size_t size) {
     if (abandoned_ || broken_)
         return EPIPE;
+    if (is_tap_ && carries_message(kind)) [[unlikely]] {
+        ++dropped_;
+        return ENOBUFS;
+    }
     if (has_room(size, 1)) [[likely]]
         return 0;
     if (can_write()) {
@@ -186,8 +180,11 @@ void peer_connection::send_control(frame_type kind, std::uint8_t marks, std::uin
     vox_wire::encoded made;
     build_control(kind, marks, id, value, made);
     const lock_guard guard(lock_);
-    if (admit(kind, made.bytes.size()) == 0)
-        put(made, kind);
+    if (admit(kind, made.bytes.size()) != 0)
+        return;
+    if (kind == frame_type::cancel)
+        show(made);
+    put(made, kind);
 }
 
 // ---- The peer's hello ---------------------------------------------------------------
@@ -238,7 +235,7 @@ bool peer_connection::fit_to_peer(vox_wire::encoded& made) {
     made.descriptors.clear();
     vox_wire::encoded again;
     const int error =
-        message ? encode_frame(message, header.type, header.id, peer_accepts_, again) : EINVAL;
+        message ? build_frame(header.type, header.id, message, peer_accepts_, again) : EINVAL;
     vox_release(message);
     if (error == 0)
         std::swap(made, again);
@@ -253,6 +250,7 @@ std::size_t peer_connection::give_up(vox_wire::encoded& made) {
             fail_request(std::move(reply), EMSGSIZE);
     }
     ++dropped_;
+    show(made, true);
     discard(made);
     return header.length;
 }
