@@ -10,9 +10,10 @@
 #include <cstdio>
 #include <filesystem>
 #include <string>
+#include <vector>
 
-// A test program that is its own service: started with the argument "service"
-// it serves, says so by serviceIsReady() and runs until it is killed.
+// A test program that is its own service: started with the argument "service", or
+// others, it serves, says so by serviceIsReady() and runs until it is killed.
 namespace plr::test {
 
 // In the service: it can be reached now. Never returns.
@@ -27,16 +28,19 @@ namespace plr::test {
 class ServiceProcess {
   public:
     // Returns when the service is ready.
-    ServiceProcess() {
+    explicit ServiceProcess(std::vector<std::string> words = {"service"}) {
         std::string program = std::filesystem::read_symlink("/proc/self/exe").string();
-        std::string role = "service";
-        char* arguments[] = {program.data(), role.data(), nullptr};
+        std::vector<char*> arguments{program.data()};
+        for (std::string& word : words)
+            arguments.push_back(word.data());
+        arguments.push_back(nullptr);
         int ends[2];
         EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
         posix_spawn_file_actions_t actions;
         posix_spawn_file_actions_init(&actions);
         posix_spawn_file_actions_adddup2(&actions, ends[1], STDOUT_FILENO);
-        EXPECT_EQ(::posix_spawn(&pid_, program.c_str(), &actions, nullptr, arguments, environ), 0);
+        EXPECT_EQ(
+            ::posix_spawn(&pid_, program.c_str(), &actions, nullptr, arguments.data(), environ), 0);
         posix_spawn_file_actions_destroy(&actions);
         ::close(ends[1]);
         char byte = 0;
