@@ -96,6 +96,8 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/frame_reader.h
     platform/linux/vox/hello.cpp
     platform/linux/vox/hello.h
+    platform/linux/vox/id_table.cpp
+    platform/linux/vox/id_table.h
     platform/linux/vox/limits.cpp
     platform/linux/vox/limits.h
     platform/linux/vox/listener.cpp
@@ -114,13 +116,13 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/peer_identity.cpp
     platform/linux/vox/peer_identity.h
     platform/linux/vox/peer_input.cpp
+    platform/linux/vox/peer_limits.cpp
+    platform/linux/vox/peer_requests.cpp
     platform/linux/vox/peer_send.cpp
     platform/linux/vox/peer_tap.cpp
     platform/linux/vox/peer_write.cpp
     platform/linux/vox/read_memory.cpp
     platform/linux/vox/read_memory.h
-    platform/linux/vox/reply_table.cpp
-    platform/linux/vox/reply_table.h
     platform/linux/vox/request.h
     platform/linux/vox/send_turn.cpp
     platform/linux/vox/send_turn.h

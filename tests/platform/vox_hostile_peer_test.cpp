@@ -69,7 +69,7 @@ std::vector<Attack> brokenFrames() {
         {"garbage", join({plain, garbage}), 0, "does not begin with VOX1"},
         {"one wrong byte of the magic", bytesOf("VOY"), 0, "does not begin with VOX1"},
         {"type 0", changed(plain, 4, 0), 0, "unknown frame type 0"},
-        {"type 8", changed(plain, 4, 8), 0, "unknown frame type 8"},
+        {"type 10", changed(plain, 4, 10), 0, "unknown frame type 10"},
         {"flags of a message", changed(plain, 5, 1), 0, "unknown flags 1"},
         {"flags of a ping", frame({.type = frame_type::ping, .flags = 2}, one), 0, "flags 2"},
         {"reserved field", changed(plain, 13, 1), 0, "reserved field"},
@@ -107,6 +107,8 @@ std::vector<Attack> wrongFrames() {
         {"ping with a body", frame({.type = frame_type::ping}, message(1)), 0, "ping"},
         {"cancel with a body", frame({.type = frame_type::cancel, .id = 1}, message(1)), 0,
          "cancel"},
+        {"refused without error", frame({.type = frame_type::refused, .id = 1}, null), 0,
+         "refused"},
         {"dropped without number", frame({.type = frame_type::dropped}, null), 0, "dropped"},
     };
 }

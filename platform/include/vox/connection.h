@@ -44,6 +44,7 @@ typedef struct vox_statistics {
     uint64_t peer_dropped;       // what the peer said it dropped for us
     uint64_t requests_refused;   // requests of the peer, for the limit of open ones
     uint64_t replies_refused;    // requests of this side, for the limit of pending replies
+    uint64_t peer_refused;       // requests of this side that the peer refused
     // Now:
     uint64_t queued_messages;  // waiting to be written
     uint64_t queued_bytes;

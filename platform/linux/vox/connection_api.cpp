@@ -40,6 +40,12 @@ peer_connection* sender(vox_connection_t object) {
     return found && !found->is_tap() ? found : nullptr;
 }
 
+// Of a request or the reply made for it; null for others.
+peer_connection* asker_of(const vox_dictionary_object& message) {
+    return message.reply_id != 0 ? static_cast<peer_connection*>(connection::from(message.remote))
+                                 : nullptr;
+}
+
 vox_connection_t make_peer(const char* name, const vox_limits_t* limits, peer_origin origin) {
     return new peer_connection(name, vox_link::usable_limits(limits), std::move(origin));
 }
@@ -121,11 +127,22 @@ int vox_connection_send_message(vox_connection_t object, vox_object_t message) {
 void vox_connection_send_message_with_reply(vox_connection_t object, vox_object_t message,
                                             const dispatch::queue* queue,
                                             const dispatch::block<void(vox_object_t)>* handler) {
+    vox_connection_send_request(object, message, 0, queue, handler);
+}
+
+uint64_t vox_connection_send_request(vox_connection_t object, vox_object_t message,
+                                     uint32_t timeout_ms, const dispatch::queue* queue,
+                                     const dispatch::block<void(vox_object_t)>* handler) {
     PLR_ASSERT(queue && *queue && handler && *handler, "a Vox reply needs a queue and a handler");
     if (peer_connection* to = sender(object))
-        to->send_request(message, *queue, *handler);
-    else
-        peer_connection::fail_request({.id = 0, .queue = *queue, .handler = *handler}, EINVAL);
+        return to->send_request(message, timeout_ms, *queue, *handler);
+    peer_connection::fail_request({.queue = *queue, .handler = *handler}, EINVAL);
+    return 0;
+}
+
+int vox_connection_cancel_request(vox_connection_t object, uint64_t number) {
+    peer_connection* of = peer(object);
+    return of ? of->cancel_request(number) : ESRCH;
 }
 
 void vox_connection_send_barrier(vox_connection_t object, const dispatch::block<void()>* barrier) {
@@ -139,6 +156,19 @@ void vox_connection_send_barrier(vox_connection_t object, const dispatch::block<
 vox_object_t vox_dictionary_create_reply(vox_object_t request) {
     vox_dictionary_object* dictionary = vox_values::as_dictionary(request);
     return dictionary ? vox_link::make_reply(*dictionary) : nullptr;
+}
+
+int vox_dictionary_is_cancelled(vox_object_t message) {
+    vox_dictionary_object* dictionary = vox_values::as_dictionary(message);
+    peer_connection* asker = dictionary ? asker_of(*dictionary) : nullptr;
+    return asker && asker->is_cancelled(*dictionary) ? 1 : 0;
+}
+
+int vox_dictionary_set_cancel_handler(vox_object_t message,
+                                      const dispatch::block<void()>* handler) {
+    vox_dictionary_object* dictionary = vox_values::as_dictionary(message);
+    peer_connection* asker = dictionary ? asker_of(*dictionary) : nullptr;
+    return asker ? asker->set_cancel_handler(*dictionary, handler ? *handler : nullptr) : EINVAL;
 }
 
 vox_connection_t vox_dictionary_get_remote_connection(vox_object_t message) {

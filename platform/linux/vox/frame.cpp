@@ -37,7 +37,7 @@ Unsigned load(const std::uint8_t* in) noexcept {
 // The reason why a header with correct magic cannot be accepted; empty: it can.
 std::string refusal(const frame_header& header, const frame_limits& limits) {
     const auto type = static_cast<unsigned>(header.type);
-    if (type < 1 || (type > 7 && header.type != frame_type::tap))
+    if (type < 1 || type > 9)
         return "unknown frame type " + std::to_string(type);
     const bool message = carries_message(header.type);
     const std::uint32_t most =
@@ -53,9 +53,9 @@ std::string refusal(const frame_header& header, const frame_limits& limits) {
                std::to_string(message ? limits.descriptors : 0);
     if ((header.flags & ~(header.type == frame_type::ping ? kPingWantsAnswer : 0)) != 0)
         return "frame with unknown flags " + std::to_string(header.flags);
-    const bool names_request = header.type == frame_type::request ||
-                               header.type == frame_type::reply ||
-                               header.type == frame_type::cancel;
+    const bool names_request =
+        header.type == frame_type::request || header.type == frame_type::reply ||
+        header.type == frame_type::cancel || header.type == frame_type::refused;
     if (header.type != frame_type::ping && names_request != (header.id != 0))
         return names_request ? "frame needs the id of a request" : "frame with an unexpected id";
     return {};

@@ -11,15 +11,17 @@
 //   header = magic type flags descriptors length zero id     ; 24 bytes, little-endian
 //   magic  = "VOX1"
 //   type   = u8          ; 1 hello, 2 message, 3 request, 4 reply, 5 cancel, 6 ping, 7 dropped,
-//                        ; 9 tap
+//                        ; 8 refused, 9 tap
 //   flags  = u8          ; ping: bit 0 asks for an answer; 0 otherwise
 //   descriptors = u16    ; in message, request and reply; they arrive by SCM_RIGHTS
 //                        ; with a byte of this frame
 //   length = u32         ; bytes of the body, at least 1
 //   zero   = u32         ; 0
-//   id     = u64         ; request, reply, cancel: of the request, from 1; ping: any; else 0
+//   id     = u64         ; request, reply, cancel, refused: of the request, from 1; ping: any;
+//                        ; else 0
 //   body   = one CBOR item that fills it: hello {"min","max","bytes","depth","fds"};
 //            message, request, reply a dictionary; cancel, ping null; dropped an integer;
+//            refused an error;
 //            tap null from a client, a dictionary or an error from a service
 //
 // The first frame in each direction is a hello, and no other is.
@@ -38,6 +40,7 @@ enum class frame_type : std::uint8_t {
     cancel = 5,
     ping = 6,
     dropped = 7,
+    refused = 8,
     tap = 9,
 };
 inline constexpr std::uint8_t kPingWantsAnswer = 1;

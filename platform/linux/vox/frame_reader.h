@@ -61,6 +61,11 @@ class frame_reader {
     // Whether bytes of an incomplete frame are held, once next() said `more`.
     [[nodiscard]] bool in_frame() const noexcept { return at_ != end_; }
     [[nodiscard]] const std::string& error() const noexcept { return error_; }
+    // Bytes that arrived and were not taken by next(); descriptors the same.
+    [[nodiscard]] std::size_t waiting_bytes() const noexcept { return left(); }
+    [[nodiscard]] std::size_t waiting_descriptors() const noexcept {
+        return descriptors_.size() - next_descriptor_;
+    }
     // Memory held, in bytes.
     [[nodiscard]] std::size_t held() const noexcept { return kept_.capacity(); }
 
@@ -68,9 +73,6 @@ class frame_reader {
 
   private:
     [[nodiscard]] std::size_t left() const noexcept { return static_cast<std::size_t>(end_ - at_); }
-    [[nodiscard]] std::size_t waiting_descriptors() const noexcept {
-        return descriptors_.size() - next_descriptor_;
-    }
     [[nodiscard]] bool read_next_header();
     [[nodiscard]] outcome incomplete();
     [[nodiscard]] outcome refuse(std::string why);

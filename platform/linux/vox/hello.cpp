@@ -137,6 +137,14 @@ bool is_null_body(std::span<const std::uint8_t> body) noexcept {
     return null;
 }
 
+vox_object_t read_refused(std::span<const std::uint8_t> body) noexcept {
+    const vox_object_t value = decode_control(body);
+    if (value && vox_get_type(value) == VOX_TYPE_ERROR)
+        return value;
+    vox_release(value);
+    return nullptr;
+}
+
 std::int64_t read_dropped(std::span<const std::uint8_t> body) noexcept {
     const vox_object_t value = decode_control(body);
     const std::int64_t count = number_of(value);

@@ -32,6 +32,8 @@ void build_hello(const vox_wire::codec_limits& accepted, vox_wire::encoded& out)
 
 // Whether `body` is the null value, as in cancel and ping.
 [[nodiscard]] bool is_null_body(std::span<const std::uint8_t> body) noexcept;
+// The error in a refused frame, for the caller to release; null when it is none.
+[[nodiscard]] vox_object_t read_refused(std::span<const std::uint8_t> body) noexcept;
 // The count in a dropped frame; negative when it is none.
 [[nodiscard]] std::int64_t read_dropped(std::span<const std::uint8_t> body) noexcept;
 

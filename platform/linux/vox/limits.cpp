@@ -16,8 +16,10 @@ vox_limits_t usable_limits(const vox_limits_t* given) noexcept {
     limits.max_message_bytes = std::clamp(limits.max_message_bytes, 1u, kLargestMessage);
     limits.max_depth = std::clamp(limits.max_depth, 1u, kMostDepth);
     limits.max_descriptors = std::min(limits.max_descriptors, kMostDescriptors);
+    limits.incomplete_frame_ms = std::max(limits.incomplete_frame_ms, 1u);
     limits.max_connections = std::max(limits.max_connections, 1u);
     limits.max_connections_per_uid = std::max(limits.max_connections_per_uid, 1u);
+    limits.max_partial_bytes_per_uid = std::max(limits.max_partial_bytes_per_uid, 1u);
     return limits;
 }
 

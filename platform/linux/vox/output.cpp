@@ -35,8 +35,7 @@ void output::append(vox_wire::encoded& made) {
         last.bytes = std::move(made.bytes);
     }
     if (!joins)
-        last.descriptors = std::move(made.descriptors);
-    made.descriptors.clear();
+        adopt_descriptors(last, made);
     tail_open_ = true;
 }
 
@@ -46,8 +45,7 @@ void output::put_back(vox_wire::encoded& made, std::size_t sent) {
     chunk& first = chunks_.emplace_front();
     first.bytes = std::move(made.bytes);
     first.at = sent;
-    first.descriptors = std::move(made.descriptors);
-    made.descriptors.clear();
+    adopt_descriptors(first, made);
 }
 
 void output::count_waiting(const std::uint8_t* frame, std::size_t bytes) noexcept {
@@ -122,7 +120,14 @@ void output::clear() noexcept {
     finished_ = accepted_;
 }
 
+void output::adopt_descriptors(chunk& into, vox_wire::encoded& made) noexcept {
+    descriptors_ += made.descriptors.size();
+    into.descriptors = std::move(made.descriptors);
+    made.descriptors.clear();
+}
+
 void output::close_descriptors(chunk& done) noexcept {
+    descriptors_ -= done.descriptors.size();
     for (const int descriptor : done.descriptors)
         ::close(descriptor);
     done.descriptors.clear();

@@ -56,8 +56,8 @@ class output {
 
     [[nodiscard]] bool empty() const noexcept { return chunks_.empty(); }
     [[nodiscard]] std::size_t bytes() const noexcept { return bytes_; }
-    [[nodiscard]] std::uint64_t frames() const noexcept { return accepted_ - finished_; }
     [[nodiscard]] std::uint64_t messages() const noexcept { return messages_; }
+    [[nodiscard]] std::uint64_t descriptors() const noexcept { return descriptors_; }
     // Frames that ever came, and those that were written or given up.
     [[nodiscard]] std::uint64_t accepted() const noexcept { return accepted_; }
     [[nodiscard]] std::uint64_t finished() const noexcept { return finished_; }
@@ -71,13 +71,15 @@ class output {
         std::vector<int> descriptors;  // owned; leave with the first byte
     };
     void count_waiting(const std::uint8_t* frame, std::size_t bytes) noexcept;
+    void adopt_descriptors(chunk& into, vox_wire::encoded& made) noexcept;
     void close_descriptors(chunk& done) noexcept;
     void count_frames(chunk& progressed) noexcept;
 
     std::list<chunk> chunks_;
-    bool tail_open_ = false;      // the last chunk may grow: nobody is writing it
-    std::size_t bytes_ = 0;       // waiting
-    std::uint64_t messages_ = 0;  // waiting, without frames that are no messages
+    bool tail_open_ = false;         // the last chunk may grow: nobody is writing it
+    std::size_t bytes_ = 0;          // waiting
+    std::uint64_t messages_ = 0;     // waiting, without frames that are no messages
+    std::uint64_t descriptors_ = 0;  // waiting
     std::uint64_t accepted_ = 0;
     std::uint64_t finished_ = 0;
     std::uint64_t messages_written_ = 0;

@@ -55,9 +55,12 @@ peer_connection::peer_connection(std::string name, const vox_limits_t& limits, p
       accepts_(codec_limits_of(limits)),
       origin_(std::move(origin)),
       watch_(this),
+      user_(origin_.place.user()),
       reader_(frame_limits_of(limits)) {
     vox_wire::encoded hello;
     build_hello(accepts_, hello);
+    if (user_)
+        user_->service().enter(*this);
     const lock_guard guard(lock_);
     out_.append(hello);
     if (origin_.from == peer_origin::kind::socket)
@@ -71,6 +74,8 @@ peer_connection::peer_connection(std::string name, const vox_limits_t& limits, p
 }
 
 peer_connection::~peer_connection() {
+    if (user_)
+        user_->service().leave(*this);
     if (origin_.from == peer_origin::kind::socket && origin_.fd >= 0)
         ::close(origin_.fd);
     vox_release(origin_.endpoint);
@@ -128,6 +133,8 @@ void peer_connection::open(int fd) {
     }
     watching_ = true;
     write_waiting();
+    if (origin_.accepted)
+        schedule();  // its time to say hello begins
 }
 
 void peer_connection::cut_off() {
@@ -136,10 +143,12 @@ void peer_connection::cut_off() {
         discard(waiting);
     early_.clear();
     early_bytes_ = 0;
+    early_descriptors_ = 0;
     if (fd_ >= 0)
         ::shutdown(fd_, SHUT_RDWR);
     if (!writing_)
         out_.clear();
+    settle();
 }
 
 // The watch may call once more after it was stopped; that call drops its hold.
@@ -164,18 +173,25 @@ void peer_connection::close_socket() {
 
 void peer_connection::wind_up(vox_object_t error) {
     close_socket();
+    for (std::size_t left = reader_.waiting_descriptors(); left > 0; --left)
+        descriptor_gone();
     reader_.clear();
+    static_cast<void>(count_partial());
     if (incomplete_timer_)
         incomplete_timer_.cancel();
     incomplete_timer_ = {};
+    std::vector<dispatch::block<void()>> cancel_handlers;
     std::vector<waiting_reply> replies;
     std::list<waiting_barrier> barriers;
     {
         const lock_guard guard(lock_);
+        cancel_handlers = cancel_all_open();
         wound_up_ = true;
-        replies = replies_.take_all();
+        replies = take_all_waiting();
         barriers.swap(barriers_);
     }
+    for (const dispatch::block<void()>& handler : cancel_handlers)
+        handler();
     for (waiting_reply& reply : replies)
         run_reply(reply, error);
     for (const waiting_barrier& barrier : barriers)
@@ -187,19 +203,6 @@ void peer_connection::wind_up(vox_object_t error) {
     origin_.place = {};
 }
 
-// `result` is lent.
-void peer_connection::run_reply(waiting_reply& reply, vox_object_t result) {
-    if (reply.queue == queue()) {
-        reply.handler(result);
-        return;
-    }
-    vox_retain(result);
-    reply.queue.async([handler = std::move(reply.handler), result] {
-        handler(result);
-        vox_release(result);
-    });
-}
-
 ucred peer_connection::credentials() const {
     const lock_guard guard(lock_);
     return credentials_;
@@ -208,22 +211,6 @@ ucred peer_connection::credentials() const {
 std::vector<gid_t> peer_connection::groups() const {
     const lock_guard guard(lock_);
     return groups_of(fd_ >= 0 ? fd_.load() : origin_.fd);
-}
-
-vox_statistics_t peer_connection::statistics() const {
-    const lock_guard guard(lock_);
-    return {.messages_sent = out_.messages_written(),
-            .messages_received = messages_received_.load(std::memory_order_relaxed),
-            .messages_dropped = dropped_,
-            .peer_dropped = peer_dropped_.load(std::memory_order_relaxed),
-            .requests_refused = 0,
-            .replies_refused = 0,
-            .queued_messages = out_.messages() + early_.size(),
-            .queued_bytes = out_.bytes() + early_bytes_,
-            .pending_replies = replies_.size(),
-            .open_requests = 0,
-            .held_descriptors = 0,
-            .partial_bytes = 0};
 }
 
 std::string peer_connection::title() {

@@ -5,16 +5,20 @@
 #include <chrono>
 #include <cstdint>
 #include <list>
+#include <memory>
+#include <set>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "dispatch/source.h"
 #include "platform/linux/vox/codec.h"
 #include "platform/linux/vox/connection.h"
 #include "platform/linux/vox/frame_reader.h"
+#include "platform/linux/vox/id_table.h"
 #include "platform/linux/vox/output.h"
-#include "platform/linux/vox/reply_table.h"
+#include "platform/linux/vox/request.h"
 #include "platform/linux/vox/service_account.h"
 #include "platform/linux/vox/tap_hub.h"
 
@@ -22,6 +26,7 @@
 //
 // Files:   peer_connection.cpp connects and ends, peer_input.cpp reads and
 //          delivers, peer_send.cpp takes what is to be sent, peer_write.cpp writes it,
+//          peer_requests.cpp has what is outstanding, peer_limits.cpp what all that costs,
 //          peer_tap.cpp has those that only look on.
 // Threads: everything received is read, decoded and delivered on the target
 //          queue. Senders encode on their own thread without the lock; then one
@@ -45,17 +50,24 @@ struct peer_origin {
     std::shared_ptr<tap_hub> taps;  // of the listener
 };
 
-class peer_connection final : public connection {
+class peer_connection final : public connection, counted_client {
   public:
     // `name` is the service's, or empty. Starts with one reference.
     peer_connection(std::string name, const vox_limits_t& limits, peer_origin origin);
 
     // As vox_connection_send_message() says.
     [[nodiscard]] int send_message(vox_object_t message);
-    void send_request(vox_object_t message, dispatch::queue queue, reply_block handler);
+    // As vox_connection_send_request() says.
+    std::uint64_t send_request(vox_object_t message, std::uint32_t timeout_ms,
+                               dispatch::queue queue, reply_block handler);
+    [[nodiscard]] int cancel_request(std::uint64_t number);
     void send_barrier(dispatch::block<void()> barrier);
     // Gives the handler of a request that could not be sent its error.
     static void fail_request(waiting_reply reply, int error);
+    // For a request that came on this connection, or a reply that will go to it.
+    [[nodiscard]] bool is_cancelled(const vox_dictionary_object& message);
+    [[nodiscard]] int set_cancel_handler(const vox_dictionary_object& message,
+                                         dispatch::block<void()> handler);
 
     [[nodiscard]] ucred credentials() const;
     // Supplementary ones; empty when not known, or no more.
@@ -79,6 +91,9 @@ class peer_connection final : public connection {
     void cut_off() PLR_REQUIRES(lock_) override;
     void wind_up(vox_object_t error) PLR_REQUIRES(queue_role_) override;
     [[nodiscard]] std::string title() override;
+    void count_blame(blame blamed) PLR_REQUIRES(queue_role_) override;
+    void message_gone(vox_dictionary_object& message) noexcept override;
+    void descriptor_gone() noexcept override;
 
   private:
     // Of what the peer sends: its hello, then messages, or none from a tap or its service.
@@ -86,6 +101,13 @@ class peer_connection final : public connection {
     struct waiting_barrier {
         std::uint64_t behind;  // frames; before the hello, messages that wait for it
         dispatch::block<void()> work;
+    };
+    // What waits for the peer to read.
+    struct burden {
+        std::uint64_t bytes = 0;
+        std::uint64_t messages = 0;
+        std::uint64_t descriptors = 0;
+        bool operator==(const burden&) const = default;
     };
     struct watch : dispatch::detail::io_watch {
         explicit watch(peer_connection* of) noexcept;
@@ -98,7 +120,6 @@ class peer_connection final : public connection {
     void connect_failed(int error, const std::string& why);
     void open(int fd);
     void close_socket() PLR_ON(queue_role_);
-    void run_reply(waiting_reply& reply, vox_object_t result) PLR_ON(queue_role_);
 
     // peer_input.cpp
     void handle_events();
@@ -113,16 +134,13 @@ class peer_connection final : public connection {
     [[nodiscard]] vox_dictionary_object* decode(const frame& arrived) PLR_ON(queue_role_);
     void read_failed(int error) PLR_ON(queue_role_);
     void violation(std::string reason);
-    void limit_incomplete_frame() PLR_ON(queue_role_);
-    void incomplete_frame_due();
 
     // peer_send.cpp
     [[nodiscard]] int send(vox_object_t message, frame_type kind, std::uint64_t id,
                            waiting_reply* reply);
     [[nodiscard]] int accept(vox_wire::encoded& made, frame_type kind, waiting_reply* reply)
         PLR_REQUIRES(lock_);
-    [[nodiscard]] int admit(frame_type kind, std::size_t size) PLR_REQUIRES(lock_);
-    [[nodiscard]] bool has_room(std::size_t size, unsigned times) const PLR_REQUIRES(lock_);
+    [[nodiscard]] int admit(frame_type kind, const vox_wire::encoded& made) PLR_REQUIRES(lock_);
     void send_control(frame_type kind, std::uint8_t marks, std::uint64_t id, vox_object_t value);
     [[nodiscard]] bool is_finished(const waiting_barrier& barrier) const PLR_REQUIRES(lock_);
     void run_finished_barriers() PLR_REQUIRES(lock_);
@@ -147,6 +165,40 @@ class peer_connection final : public connection {
     void unblock();
     void retry_later() PLR_REQUIRES(lock_);
 
+    // peer_requests.cpp
+    [[nodiscard]] bool expect_reply(waiting_reply& reply) PLR_REQUIRES(lock_);
+    [[nodiscard]] waiting_reply take_waiting(std::uint64_t id) PLR_REQUIRES(lock_);
+    [[nodiscard]] std::vector<waiting_reply> take_all_waiting() PLR_REQUIRES(lock_);
+    void tell_given_up(std::span<const waiting_reply> given_up) PLR_REQUIRES(lock_);
+    void arm_deadline() PLR_REQUIRES(lock_);
+    void deadline_due();
+    static void fail_request(waiting_reply reply, std::int64_t code, const std::string& why);
+    void run_reply(waiting_reply& reply, vox_object_t result) PLR_ON(queue_role_);
+    void handle_refused(const frame& arrived) PLR_ON(queue_role_);
+    [[nodiscard]] bool nobody_waits_for(const vox_wire::encoded& made) PLR_REQUIRES(lock_);
+    [[nodiscard]] bool enter_request(const frame& arrived) PLR_ON(queue_role_);
+    [[nodiscard]] open_request take_open(std::uint64_t id) PLR_REQUIRES(lock_);
+    [[nodiscard]] bool is_given_up(std::uint64_t id) PLR_REQUIRES(lock_);
+    void handle_cancel(std::uint64_t id) PLR_ON(queue_role_);
+    [[nodiscard]] std::vector<dispatch::block<void()>> cancel_all_open() PLR_REQUIRES(lock_);
+
+    // peer_limits.cpp
+    [[nodiscard]] burden waiting() const PLR_REQUIRES(lock_);
+    [[nodiscard]] limit_hit over(const vox_wire::encoded& made, unsigned times) PLR_REQUIRES(lock_);
+    [[nodiscard]] limit_hit charge(const burden& all, unsigned times) PLR_REQUIRES(lock_);
+    void settle() PLR_REQUIRES(lock_);
+    void overflow(const limit_hit& hit) PLR_REQUIRES(lock_);
+    [[nodiscard]] bool hold_descriptors(std::size_t count);
+    void let_go(std::span<const int> descriptors) noexcept;
+    [[nodiscard]] bool count_partial() PLR_ON(queue_role_);
+    [[nodiscard]] bool is_silent() const PLR_ON(queue_role_)
+    { return origin_.accepted && stage_ == stage::hello; }
+    void limit_incomplete_frame() PLR_ON(queue_role_);
+    void arm_incomplete_timer(std::chrono::nanoseconds delay) PLR_ON(queue_role_);
+    void incomplete_frame_due();
+    void limit_exceeded(std::string reason);
+    void add_counts(vox_listener_statistics_t& sums) const override;
+
     // peer_tap.cpp
     // Hot path: a frame that is accepted for sending, or dropped.
     void show(const vox_wire::encoded& made, bool as_dropped = false) PLR_REQUIRES(lock_) {
@@ -169,6 +221,7 @@ class peer_connection final : public connection {
     peer_origin origin_;
     watch watch_;
     tapped_client tapped_;
+    const std::shared_ptr<user_account> user_;  // who pays; null unless accepted
     ucred credentials_ PLR_GUARDED_BY(lock_) = {-1, static_cast<uid_t>(-1), static_cast<gid_t>(-1)};
 
     // Receiving.
@@ -180,6 +233,8 @@ class peer_connection final : public connection {
     dispatch::source incomplete_timer_ PLR_GUARDED_BY(queue_role_);
     bool incomplete_armed_ PLR_GUARDED_BY(queue_role_) = false;
     std::int64_t incomplete_since_ PLR_GUARDED_BY(queue_role_) = 0;  // ns; 0: no frame begun
+    std::atomic<std::uint64_t> partial_bytes_{0};                    // changes on the queue only
+    std::atomic<std::uint64_t> held_{0};  // descriptors that came; grows under lock_ only
     std::atomic<std::uint64_t> messages_received_{0};
     std::atomic<std::uint64_t> peer_dropped_{0};
 
@@ -203,9 +258,22 @@ class peer_connection final : public connection {
     output out_ PLR_GUARDED_BY(lock_);
     std::list<vox_wire::encoded> early_ PLR_GUARDED_BY(lock_);  // wait for the peer's hello
     std::size_t early_bytes_ PLR_GUARDED_BY(lock_) = 0;
+    std::size_t early_descriptors_ PLR_GUARDED_BY(lock_) = 0;
+    burden charged_ PLR_GUARDED_BY(lock_);  // of what waits, to the user
     std::list<waiting_barrier> barriers_ PLR_GUARDED_BY(lock_);
-    reply_table replies_ PLR_GUARDED_BY(lock_);
+
+    // Requests.
+    id_table<waiting_reply> replies_ PLR_GUARDED_BY(lock_);
     std::uint64_t last_id_ PLR_GUARDED_BY(lock_) = 0;
+    std::set<std::pair<std::int64_t, std::uint64_t>> deadlines_ PLR_GUARDED_BY(lock_);  // and id
+    dispatch::source deadline_timer_ PLR_GUARDED_BY(lock_);
+    std::int64_t armed_for_ PLR_GUARDED_BY(lock_) = 0;  // a deadline; 0: not armed
+    id_table<open_request> open_ PLR_GUARDED_BY(lock_);
+    std::uint64_t requests_refused_ PLR_GUARDED_BY(lock_) = 0;
+    std::uint64_t replies_refused_ PLR_GUARDED_BY(lock_) = 0;
+    std::uint64_t peer_refused_ PLR_GUARDED_BY(lock_) = 0;
+
+    // Overflow.
     std::uint64_t dropped_ PLR_GUARDED_BY(lock_) = 0;
     std::uint64_t dropped_untold_ PLR_GUARDED_BY(lock_) = 0;
 };

@@ -22,11 +22,6 @@ namespace {
 constexpr unsigned kFramesPerTurn = 256;
 constexpr unsigned kReadsPerTurn = 4;
 
-void close_all(std::span<const int> descriptors) noexcept {
-    for (const int descriptor : descriptors)
-        ::close(descriptor);
-}
-
 }  // namespace
 
 void peer_connection::handle_events() {
@@ -69,7 +64,7 @@ void peer_connection::read_turn() {
     if (stage_ == stage::messages)
         tapped_.opened();
     reader_.keep();
-    if (!may_deliver())
+    if (!count_partial() || !may_deliver())
         return;
     if (frames == 0 || reads == 0)
         schedule();
@@ -107,7 +102,7 @@ bool peer_connection::receive(std::span<std::uint8_t> memory) {
     if (fd < 0)
         return false;
     const bool broken = broken_.load(std::memory_order_acquire);
-    if (!readable_ && !broken)
+    if ((!readable_ && !broken) || !count_partial())
         return false;
     const std::span<std::uint8_t> space = reader_.space(memory);
     received got;
@@ -120,7 +115,12 @@ bool peer_connection::receive(std::span<std::uint8_t> memory) {
     }
     if (got.lost_descriptors) {
         got.close_descriptors();
-        violation("descriptors were lost: no more can be open in this process, or too many came");
+        limit_exceeded(
+            "descriptors were lost: no more can be open in this process, or too many came");
+        return false;
+    }
+    if (got.descriptor_count > 0 && !hold_descriptors(got.descriptor_count)) {
+        got.close_descriptors();
         return false;
     }
     if (got.bytes == 0) {
@@ -156,7 +156,7 @@ void peer_connection::handle(const frame& arrived) {
     if (arrived.header.type == frame_type::hello)
         return handle_hello(arrived);
     if (stage_ == stage::hello) {
-        close_all(arrived.descriptors);
+        let_go(arrived.descriptors);
         return violation("the first frame is not a hello");
     }
     if (message)
@@ -172,10 +172,16 @@ void peer_connection::handle_hello(const frame& arrived) {
     if (!read_hello(arrived.body, accepted, why))
         return violation(std::move(why));
     stage_ = origin_.tap ? stage::tap : stage::messages;
+    if (incomplete_timer_)
+        incomplete_timer_.cancel();
+    incomplete_timer_ = {};
+    incomplete_armed_ = false;
     greet(accepted);
 }
 
 void peer_connection::handle_message(const frame& arrived) {
+    if (arrived.header.type == frame_type::request && !enter_request(arrived))
+        return;
     vox_dictionary_object* message = decode(arrived);
     if (!message)
         return;
@@ -189,7 +195,7 @@ void peer_connection::handle_message(const frame& arrived) {
         waiting_reply reply;
         {
             const lock_guard guard(lock_);
-            reply = replies_.take(arrived.header.id);
+            reply = take_waiting(arrived.header.id);
         }
         // One that nobody waits for is ignored.
         if (reply.id != 0)
@@ -207,7 +213,8 @@ void peer_connection::handle_message(const frame& arrived) {
 // The message in `arrived`; null when it is none, and the connection fails.
 vox_dictionary_object* peer_connection::decode(const frame& arrived) {
     const char* why = nullptr;
-    const vox_object_t value = vox_wire::decode(arrived.body, arrived.descriptors, accepts_, why);
+    const vox_object_t value =
+        vox_wire::decode(arrived.body, arrived.descriptors, accepts_, why, this);
     vox_dictionary_object* message = vox_values::as_dictionary(value);
     if (message) [[likely]]
         return message;
@@ -222,12 +229,16 @@ void peer_connection::handle_control(const frame& arrived) {
         case frame_type::cancel:
             if (!is_null_body(arrived.body))
                 return violation("ping or cancel with a body that is not null");
-            if (arrived.header.type == frame_type::cancel && tapped_.is_watched())
-                tapped_.show(tap_way::in, arrived.header, arrived.body);
-            if (arrived.header.type == frame_type::ping &&
-                (arrived.header.flags & kPingWantsAnswer) != 0)
+            if (arrived.header.type == frame_type::cancel) {
+                if (tapped_.is_watched())
+                    tapped_.show(tap_way::in, arrived.header, arrived.body);
+                handle_cancel(arrived.header.id);
+            } else if ((arrived.header.flags & kPingWantsAnswer) != 0) {
                 send_control(frame_type::ping, 0, arrived.header.id, vox_null_create());
+            }
             return;
+        case frame_type::refused:
+            return handle_refused(arrived);
         case frame_type::tap:
             return handle_tap(arrived);
         default: {
@@ -241,48 +252,6 @@ void peer_connection::handle_control(const frame& arrived) {
                 tapped_.show(tap_way::in, arrived.header, arrived.body);
         }
     }
-}
-
-// ---- Frames that do not get whole ---------------------------------------------------
-
-// The timer is left running when the frame gets whole in time; it then finds
-// nothing to do. So a stream that is always cut somewhere costs one timer call
-// in all that time.
-void peer_connection::limit_incomplete_frame() {
-    if (!reader_.in_frame() || incomplete_since_ != 0)
-        return;
-    incomplete_since_ = dispatch::time::now().nanoseconds();
-    if (incomplete_armed_)
-        return;
-    if (!incomplete_timer_) {
-        incomplete_timer_ = dispatch::source::timer(queue());
-        // The source is cancelled before this object can go.
-        incomplete_timer_.set_event_handler(
-            dispatch::block<void()>([this] { incomplete_frame_due(); }));
-        incomplete_timer_.resume();
-    }
-    incomplete_armed_ = true;
-    incomplete_timer_.set_timer(
-        dispatch::time::after(std::chrono::milliseconds(limits_.incomplete_frame_ms)),
-        dispatch::kOnce);
-}
-
-void peer_connection::incomplete_frame_due() {
-    queue_role_.entered();
-    incomplete_armed_ = false;
-    if (incomplete_since_ == 0 || is_ending())
-        return;
-    const std::int64_t now = dispatch::time::now().nanoseconds();
-    const std::chrono::nanoseconds limit = std::chrono::milliseconds(limits_.incomplete_frame_ms);
-    // Nothing is read while suspended: the peer is not to blame.
-    if (is_suspended())
-        incomplete_since_ = now;
-    const std::chrono::nanoseconds left = limit - std::chrono::nanoseconds(now - incomplete_since_);
-    if (left.count() <= 0)
-        return violation("a frame was not whole after " +
-                         std::to_string(limits_.incomplete_frame_ms) + " ms");
-    incomplete_armed_ = true;
-    incomplete_timer_.set_timer(dispatch::time::after(left), dispatch::kOnce);
 }
 
 }  // namespace vox_link

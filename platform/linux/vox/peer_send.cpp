@@ -43,30 +43,6 @@ int peer_connection::send_message(vox_object_t message) {
     return error;
 }
 
-void peer_connection::send_request(vox_object_t message, dispatch::queue queue,
-                                   reply_block handler) {
-    vox_dictionary_object* dictionary = vox_values::as_dictionary(message);
-    waiting_reply reply{.id = 0, .queue = std::move(queue), .handler = std::move(handler)};
-    const int error = !dictionary || is_reply(*dictionary)
-                          ? EINVAL
-                          : send(message, frame_type::request, 0, &reply);
-    if (error != 0)
-        fail_request(std::move(reply), error);
-}
-
-void peer_connection::fail_request(waiting_reply reply, int error) {
-    const std::int64_t code =
-        error == EPIPE ? VOX_ERROR_CONNECTION_INVALID : VOX_ERROR_MESSAGE_REFUSED;
-    const std::string why = error == EPIPE
-                                ? std::string("the connection has ended")
-                                : std::string("cannot send: ") + ::strerrordesc_np(error);
-    reply.queue.async(
-        [handler = std::move(reply.handler), result = vox_error_create(code, why.c_str())] {
-            handler(result);
-            vox_release(result);
-        });
-}
-
 void peer_connection::send_barrier(dispatch::block<void()> barrier) {
     const lock_guard guard(lock_);
     const bool greeted = greeted_.load(std::memory_order_relaxed);
@@ -94,6 +70,7 @@ void peer_connection::run_finished_barriers() {
 // Hot path: bench/vox_cases.h.
 int peer_connection::send(vox_object_t message, frame_type kind, std::uint64_t id,
                           waiting_reply* reply) {
+    open_request answered;  // its handler is not released under the lock
     for (;;) {
         const bool greeted = greeted_.load(std::memory_order_acquire);
         vox_wire::encoded& made = scratch();
@@ -106,72 +83,70 @@ int peer_connection::send(vox_object_t message, frame_type kind, std::uint64_t i
             discard(made);
             continue;
         }
-        const int error = accept(made, kind, reply);
+        const int error =
+            kind == frame_type::reply && is_given_up(id) ? ECANCELED : accept(made, kind, reply);
         if (error != 0)
             discard(made);
+        else if (kind == frame_type::reply)
+            answered = take_open(id);
         return error;
     }
 }
 
 int peer_connection::accept(vox_wire::encoded& made, frame_type kind, waiting_reply* reply) {
-    if (const int error = admit(kind, made.bytes.size()); error != 0) {
+    if (const int error = admit(kind, made); error != 0) {
         if (error == ENOBUFS)
             show(made, true);
         return error;
     }
     if (reply) {
-        reply->id = ++last_id_;
+        if (!expect_reply(*reply)) {
+            settle();
+            return EDQUOT;
+        }
         write_header_id(reply->id, made.bytes.data());
-        replies_.insert(std::move(*reply));
     }
     show(made);
     if (greeted_.load(std::memory_order_relaxed)) {
         put(made, kind);
     } else {
         early_bytes_ += made.bytes.size();
+        early_descriptors_ += made.descriptors.size();
         early_.push_back(std::exchange(made, {}));
     }
     return 0;
 }
 
-// Whether `times` the limits leave room for one more message of `size` bytes.
-bool peer_connection::has_room(std::size_t size, unsigned times) const {
-    const std::size_t bytes = out_.bytes() + early_bytes_;
-    const std::uint64_t messages = out_.messages() + early_.size();
-    return (out_.empty() && early_.empty()) ||
-           (bytes + size <= std::uint64_t{times} * limits_.max_queued_bytes &&
-            messages < std::uint64_t{times} * limits_.max_queued_messages);
-}
-
-int peer_connection::admit(frame_type kind, std::size_t size) {
+int peer_connection::admit(frame_type kind, const vox_wire::encoded& made) {
     if (abandoned_ || broken_)
         return EPIPE;
     if (is_tap_ && carries_message(kind)) [[unlikely]] {
         ++dropped_;
         return ENOBUFS;
     }
-    if (has_room(size, 1)) [[likely]]
+    limit_hit hit = over(made, 1);
+    if (!hit) [[likely]]
         return 0;
     if (can_write()) {
         write_waiting();  // it was only put together
         if (abandoned_ || broken_)
             return EPIPE;
-        if (has_room(size, 1))
+        hit = over(made, 1);
+        if (!hit)
             return 0;
     }
     if (limits_.overflow == VOX_OVERFLOW_DROP) {
         if (kind == frame_type::message || kind == frame_type::request) {
             ++dropped_;
             ++dropped_untold_;
+            settle();
             return ENOBUFS;
         }
-        if (has_room(size, 2))
+        hit = over(made, 2);
+        if (!hit)
             return 0;
     }
-    fail_locked(VOX_ERROR_CONNECTION_INVALID,
-                "the peer does not read: " + std::to_string(out_.messages() + early_.size()) +
-                    " messages, " + std::to_string(out_.bytes() + early_bytes_) + " bytes wait",
-                blame::limit);
+    overflow(hit);
     return EPIPE;
 }
 
@@ -180,9 +155,9 @@ void peer_connection::send_control(frame_type kind, std::uint8_t marks, std::uin
     vox_wire::encoded made;
     build_control(kind, marks, id, value, made);
     const lock_guard guard(lock_);
-    if (admit(kind, made.bytes.size()) != 0)
+    if (admit(kind, made) != 0)
         return;
-    if (kind == frame_type::cancel)
+    if (kind == frame_type::refused)
         show(made);
     put(made, kind);
 }
@@ -202,7 +177,9 @@ void peer_connection::greet(const vox_wire::codec_limits& peer) {
         };
         place_barriers();
         for (vox_wire::encoded& waiting : early_) {
-            if (fit_to_peer(waiting))
+            if (nobody_waits_for(waiting))
+                discard(waiting);
+            else if (fit_to_peer(waiting))
                 out_.append(waiting);
             else
                 given_up.push_back(give_up(waiting));
@@ -211,9 +188,12 @@ void peer_connection::greet(const vox_wire::codec_limits& peer) {
         }
         early_.clear();
         early_bytes_ = 0;
+        early_descriptors_ = 0;
         greeted_.store(true, std::memory_order_release);
         if (can_write())
             write_waiting();
+        else
+            settle();
     }
     for (const std::size_t bytes : given_up)
         complain("a message of " + std::to_string(bytes) + " bytes to '" + name() +
@@ -246,7 +226,7 @@ bool peer_connection::fit_to_peer(vox_wire::encoded& made) {
 std::size_t peer_connection::give_up(vox_wire::encoded& made) {
     const frame_header header = read_own_header(made.bytes.data());
     if (header.type == frame_type::request) {
-        if (waiting_reply reply = replies_.take(header.id); reply.id != 0)
+        if (waiting_reply reply = take_waiting(header.id); reply.id != 0)
             fail_request(std::move(reply), EMSGSIZE);
     }
     ++dropped_;

@@ -1,12 +1,34 @@
 #pragma once
 
+#include <cstdint>
+
+#include "dispatch/queue.h"
 #include "platform/linux/vox/value_layout.h"
 
-// Dictionaries that are requests or replies: the marks they carry.
+// Requests on both ends: what their connections keep of them, and the marks of the
+// dictionaries that are requests or replies.
 //
 // A received request may get one reply dictionary. A reply dictionary knows its
 // connection and the request's id, and is sent once.
 namespace vox_link {
+
+using reply_block = dispatch::block<void(vox_object_t)>;
+
+// A request of this side.
+struct waiting_reply {
+    std::uint64_t id = 0;
+    dispatch::queue queue;
+    reply_block handler;
+    std::int64_t deadline = 0;  // ns, monotonic; 0 for none
+};
+
+// A request of the peer that has got no reply. Stays when it is cancelled, until the
+// service lets go of it: what it holds is not less for that.
+struct open_request {
+    std::uint64_t id = 0;
+    bool cancelled = false;
+    dispatch::block<void()> cancel_handler = {};
+};
 
 inline constexpr std::uint8_t kOpenRequest = 1;  // received, no reply made yet
 inline constexpr std::uint8_t kReply = 2;
@@ -14,6 +36,12 @@ inline constexpr std::uint8_t kReplySent = 4;
 
 [[nodiscard]] inline bool is_reply(const vox_dictionary_object& dictionary) noexcept {
     return (dictionary.flags.load(std::memory_order_relaxed) & kReply) != 0;
+}
+// Whether it is the one that keeps its request open: the request while it has no
+// reply, then the reply until it is sent.
+[[nodiscard]] inline bool keeps_request_open(const vox_dictionary_object& dictionary) noexcept {
+    const std::uint8_t marks = dictionary.flags.load(std::memory_order_acquire);
+    return (marks & kOpenRequest) != 0 || (marks & (kReply | kReplySent)) == kReply;
 }
 // Whether the caller is the one that may send this reply now.
 [[nodiscard]] inline bool claim_reply(vox_dictionary_object& reply) noexcept {
