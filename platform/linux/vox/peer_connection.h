@@ -109,6 +109,12 @@ class peer_connection final : public connection, counted_client {
         std::uint64_t descriptors = 0;
         bool operator==(const burden&) const = default;
     };
+    struct outgoing {
+        frame_type kind;
+        std::uint64_t id = 0;        // of a reply
+        waiting_reply request = {};  // of a request; its handler is taken with it
+        open_request answered = {};  // by a reply; not released under the lock
+    };
     struct watch : dispatch::detail::io_watch {
         explicit watch(peer_connection* of) noexcept;
         peer_connection* owner;
@@ -136,10 +142,8 @@ class peer_connection final : public connection, counted_client {
     void violation(std::string reason);
 
     // peer_send.cpp
-    [[nodiscard]] int send(vox_object_t message, frame_type kind, std::uint64_t id,
-                           waiting_reply* reply);
-    [[nodiscard]] int accept(vox_wire::encoded& made, frame_type kind, waiting_reply* reply)
-        PLR_REQUIRES(lock_);
+    [[nodiscard]] int send(vox_object_t message, outgoing& what);
+    [[nodiscard]] int accept(vox_wire::encoded& made, outgoing& what) PLR_REQUIRES(lock_);
     [[nodiscard]] int admit(frame_type kind, const vox_wire::encoded& made) PLR_REQUIRES(lock_);
     void send_control(frame_type kind, std::uint8_t marks, std::uint64_t id, vox_object_t value);
     [[nodiscard]] bool is_finished(const waiting_barrier& barrier) const PLR_REQUIRES(lock_);
@@ -166,7 +170,7 @@ class peer_connection final : public connection, counted_client {
     void retry_later() PLR_REQUIRES(lock_);
 
     // peer_requests.cpp
-    [[nodiscard]] bool expect_reply(waiting_reply& reply) PLR_REQUIRES(lock_);
+    [[nodiscard]] bool expect_reply(waiting_reply& request) PLR_REQUIRES(lock_);
     [[nodiscard]] waiting_reply take_waiting(std::uint64_t id) PLR_REQUIRES(lock_);
     [[nodiscard]] std::vector<waiting_reply> take_all_waiting() PLR_REQUIRES(lock_);
     void tell_given_up(std::span<const waiting_reply> given_up) PLR_REQUIRES(lock_);

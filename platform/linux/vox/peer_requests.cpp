@@ -22,16 +22,16 @@ std::int64_t now() noexcept {
 std::uint64_t peer_connection::send_request(vox_object_t message, std::uint32_t timeout_ms,
                                             dispatch::queue queue, reply_block handler) {
     vox_dictionary_object* dictionary = vox_values::as_dictionary(message);
-    waiting_reply reply{.id = 0, .queue = std::move(queue), .handler = std::move(handler)};
+    outgoing what{.kind = frame_type::request};
+    what.request.queue = std::move(queue);
+    what.request.handler = std::move(handler);
     if (timeout_ms != 0)
-        reply.deadline = now() + std::int64_t{timeout_ms} * 1'000'000;
-    const int error = !dictionary || is_reply(*dictionary)
-                          ? EINVAL
-                          : send(message, frame_type::request, 0, &reply);
+        what.request.deadline = now() + std::int64_t{timeout_ms} * 1'000'000;
+    const int error = !dictionary || is_reply(*dictionary) ? EINVAL : send(message, what);
     if (error == 0)
-        return reply.id;
-    if (reply.handler)
-        fail_request(std::move(reply), error);
+        return what.request.id;
+    if (what.request.handler)
+        fail_request(std::move(what.request), error);
     return 0;
 }
 
@@ -50,7 +50,7 @@ int peer_connection::cancel_request(std::uint64_t number) {
 
 // Gives a request that was admitted its id and enters it. Unless too many wait:
 // then its handler hears of that.
-bool peer_connection::expect_reply(waiting_reply& reply) {
+bool peer_connection::expect_reply(waiting_reply& request) {
     limit_hit hit;
     if (replies_.size() >= limits_.max_pending_replies)
         hit = {"max_pending_replies", limits_.max_pending_replies};
@@ -58,19 +58,19 @@ bool peer_connection::expect_reply(waiting_reply& reply) {
         hit = user_->limit(cost::pending_replies);
     if (hit) {
         ++replies_refused_;
-        fail_request(std::move(reply), VOX_ERROR_MESSAGE_REFUSED,
+        fail_request(std::move(request), VOX_ERROR_MESSAGE_REFUSED,
                      "too many requests wait for their replies: " + hit.text());
         return false;
     }
-    reply.id = ++last_id_;
-    if (reply.deadline != 0) {
-        deadlines_.emplace_hint(deadlines_.end(), reply.deadline, reply.id);
+    request.id = ++last_id_;
+    if (request.deadline != 0) {
+        deadlines_.emplace_hint(deadlines_.end(), request.deadline, request.id);
         arm_deadline();
     }
-    replies_.insert({.id = reply.id,
-                     .queue = std::move(reply.queue),
-                     .handler = std::move(reply.handler),
-                     .deadline = reply.deadline});
+    replies_.insert({.id = request.id,
+                     .queue = std::move(request.queue),
+                     .handler = std::move(request.handler),
+                     .deadline = request.deadline});
     return true;
 }
 
@@ -193,6 +193,8 @@ void peer_connection::handle_refused(const frame& arrived) {
     const vox_object_t error = read_refused(arrived.body);
     if (!error)
         return violation("refused without an error");
+    if (tapped_.is_watched())
+        tapped_.show(tap_way::in, arrived.header, arrived.body);
     waiting_reply reply;
     {
         const lock_guard guard(lock_);

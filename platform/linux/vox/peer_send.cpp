@@ -31,13 +31,15 @@ int peer_connection::send_message(vox_object_t message) {
     vox_dictionary_object* dictionary = vox_values::as_dictionary(message);
     if (!dictionary)
         return EINVAL;
+    outgoing what{.kind = frame_type::message};
     if (!is_reply(*dictionary))
-        return send(message, frame_type::message, 0, nullptr);
+        return send(message, what);
     if (dictionary->remote != this)
         return EINVAL;
     if (!claim_reply(*dictionary))
         return EALREADY;
-    const int error = send(message, frame_type::reply, dictionary->reply_id, nullptr);
+    what = {.kind = frame_type::reply, .id = dictionary->reply_id};
+    const int error = send(message, what);
     if (error != 0)
         unclaim_reply(*dictionary);
     return error;
@@ -68,14 +70,12 @@ void peer_connection::run_finished_barriers() {
 }
 
 // Hot path: bench/vox_cases.h.
-int peer_connection::send(vox_object_t message, frame_type kind, std::uint64_t id,
-                          waiting_reply* reply) {
-    open_request answered;  // its handler is not released under the lock
+int peer_connection::send(vox_object_t message, outgoing& what) {
     for (;;) {
         const bool greeted = greeted_.load(std::memory_order_acquire);
         vox_wire::encoded& made = scratch();
         if (const int error =
-                build_frame(kind, id, message, greeted ? peer_accepts_ : accepts_, made);
+                build_frame(what.kind, what.id, message, greeted ? peer_accepts_ : accepts_, made);
             error != 0)
             return error;
         const lock_guard guard(lock_);
@@ -83,32 +83,33 @@ int peer_connection::send(vox_object_t message, frame_type kind, std::uint64_t i
             discard(made);
             continue;
         }
-        const int error =
-            kind == frame_type::reply && is_given_up(id) ? ECANCELED : accept(made, kind, reply);
+        const int error = accept(made, what);
         if (error != 0)
             discard(made);
-        else if (kind == frame_type::reply)
-            answered = take_open(id);
         return error;
     }
 }
 
-int peer_connection::accept(vox_wire::encoded& made, frame_type kind, waiting_reply* reply) {
-    if (const int error = admit(kind, made); error != 0) {
+int peer_connection::accept(vox_wire::encoded& made, outgoing& what) {
+    if (what.kind == frame_type::reply && is_given_up(what.id))
+        return ECANCELED;
+    if (const int error = admit(what.kind, made); error != 0) {
         if (error == ENOBUFS)
             show(made, true);
         return error;
     }
-    if (reply) {
-        if (!expect_reply(*reply)) {
+    if (what.kind == frame_type::request) {
+        if (!expect_reply(what.request)) {
             settle();
             return EDQUOT;
         }
-        write_header_id(reply->id, made.bytes.data());
+        write_header_id(what.request.id, made.bytes.data());
+    } else if (what.kind == frame_type::reply) {
+        what.answered = take_open(what.id);
     }
     show(made);
     if (greeted_.load(std::memory_order_relaxed)) {
-        put(made, kind);
+        put(made, what.kind);
     } else {
         early_bytes_ += made.bytes.size();
         early_descriptors_ += made.descriptors.size();

@@ -46,8 +46,7 @@ void peer_connection::refuse_tap(const char* why) {
 
 // A message from a tap, or one that the service sent to it before it knew.
 void peer_connection::handle_stray(const frame& arrived) {
-    for (const int descriptor : arrived.descriptors)
-        ::close(descriptor);
+    let_go(arrived.descriptors);
     if (!origin_.tap)
         violation("a tap sent a message");
 }

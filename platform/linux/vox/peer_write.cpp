@@ -214,6 +214,7 @@ void peer_connection::finish_writing() {
         if (std::exchange(closing_, false))
             ::close(fd_.exchange(-1));
     }
+    settle();
     if (!barriers_.empty()) [[unlikely]]
         run_finished_barriers();
 }
