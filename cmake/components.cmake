@@ -98,11 +98,14 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/hello.h
     platform/linux/vox/id_table.cpp
     platform/linux/vox/id_table.h
+    platform/linux/vox/idle_exit.cpp
+    platform/linux/vox/idle_exit.h
     platform/linux/vox/limits.cpp
     platform/linux/vox/limits.h
     platform/linux/vox/listener.cpp
     platform/linux/vox/listener.h
     platform/linux/vox/listener_api.cpp
+    platform/linux/vox/listener_idle.cpp
     platform/linux/vox/lock.h
     platform/linux/vox/names.cpp
     platform/linux/vox/names.h
@@ -113,6 +116,7 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/passed_sockets.h
     platform/linux/vox/peer_connection.cpp
     platform/linux/vox/peer_connection.h
+    platform/linux/vox/peer_idle.cpp
     platform/linux/vox/peer_identity.cpp
     platform/linux/vox/peer_identity.h
     platform/linux/vox/peer_input.cpp

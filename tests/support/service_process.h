@@ -27,8 +27,8 @@ namespace plr::test {
 // A running service process of this program; killed at the end.
 class ServiceProcess {
   public:
-    // Returns when the service is ready.
-    explicit ServiceProcess(std::vector<std::string> words = {"service"}) {
+    // Returns when the service is ready. `passed` is its descriptor 3 unless negative.
+    explicit ServiceProcess(std::vector<std::string> words = {"service"}, int passed = -1) {
         std::string program = std::filesystem::read_symlink("/proc/self/exe").string();
         std::vector<char*> arguments{program.data()};
         for (std::string& word : words)
@@ -39,6 +39,8 @@ class ServiceProcess {
         posix_spawn_file_actions_t actions;
         posix_spawn_file_actions_init(&actions);
         posix_spawn_file_actions_adddup2(&actions, ends[1], STDOUT_FILENO);
+        if (passed >= 0)
+            posix_spawn_file_actions_adddup2(&actions, passed, 3);
         EXPECT_EQ(
             ::posix_spawn(&pid_, program.c_str(), &actions, nullptr, arguments.data(), environ), 0);
         posix_spawn_file_actions_destroy(&actions);
@@ -57,10 +59,12 @@ class ServiceProcess {
             ::kill(pid_, SIGKILL);
         wait();
     }
-    // Until it has ended by itself.
-    void wait() {
-        EXPECT_TRUE(pid_ < 0 || ::waitpid(pid_, nullptr, 0) == pid_);
+    // Until it has ended by itself. Returns its status, see wait(2); 0 after the first time.
+    int wait() {
+        int status = 0;
+        EXPECT_TRUE(pid_ < 0 || ::waitpid(pid_, &status, 0) == pid_);
         pid_ = -1;
+        return status;
     }
     [[nodiscard]] pid_t pid() const { return pid_; }
 

@@ -64,6 +64,7 @@ listener::listener(std::string name, bool anonymous, const vox_limits_t& limits)
       anonymous_(anonymous),
       account_(std::make_shared<service_account>(limits)) {
     set_policy(nullptr);
+    enlist();
 }
 
 std::string listener::title() {
@@ -145,6 +146,7 @@ void listener::cut_off() {
 }
 
 void listener::wind_up(vox_object_t) {
+    discharge();
     for (;;) {
         gate* last = nullptr;
         {

@@ -11,6 +11,7 @@
 
 #include "platform/linux/vox/admission.h"
 #include "platform/linux/vox/connection.h"
+#include "platform/linux/vox/idle_exit.h"
 #include "platform/linux/vox/service_account.h"
 #include "platform/linux/vox/service_socket.h"
 #include "platform/linux/vox/tap_hub.h"
@@ -25,7 +26,7 @@
 //          hundred a second; without it accepting pauses for a while.
 namespace vox_link {
 
-class listener final : public connection {
+class listener final : public connection, private idle_participant {
   public:
     // Anonymous without a name.
     listener(std::string name, bool anonymous, const vox_limits_t& limits);
@@ -81,6 +82,11 @@ class listener final : public connection {
     void turn_away(int fd, const ucred& client, const std::string& why) PLR_ON(queue_role_);
     void pause() PLR_ON(queue_role_);
 
+    // listener_idle.cpp
+    [[nodiscard]] sight look() override;
+    [[nodiscard]] bool leave(leaving_stage now) override;
+    void take_last() PLR_ON(queue_role_);
+
     const vox_limits_t limits_;
     const bool anonymous_;
     const std::shared_ptr<service_account> account_;
@@ -90,6 +96,8 @@ class listener final : public connection {
     std::list<std::unique_ptr<gate>> gates_ PLR_GUARDED_BY(lock_);
     bool opened_ PLR_GUARDED_BY(lock_) = false;
     bool closed_ PLR_GUARDED_BY(lock_) = false;
+    bool leaving_ PLR_GUARDED_BY(lock_) = false;  // with the process
+    bool left_ PLR_GUARDED_BY(lock_) = false;     // no client comes any more
     std::deque<gate*> ready_ PLR_GUARDED_BY(queue_role_);
     bool paused_ PLR_GUARDED_BY(queue_role_) = false;
     int reserve_ PLR_GUARDED_BY(queue_role_) = -1;

@@ -61,16 +61,19 @@ peer_connection::peer_connection(std::string name, const vox_limits_t& limits, p
     build_hello(accepts_, hello);
     if (user_)
         user_->service().enter(*this);
-    const lock_guard guard(lock_);
-    out_.append(hello);
-    if (origin_.from == peer_origin::kind::socket)
-        credentials_ = credentials_of(origin_.fd);
-    tapped_.bind(std::move(origin_.taps), credentials_);
-    if (origin_.tap) {
-        vox_wire::encoded wish;
-        build_control(frame_type::tap, 0, 0, vox_null_create(), wish);
-        out_.append(wish);
+    {
+        const lock_guard guard(lock_);
+        out_.append(hello);
+        if (origin_.from == peer_origin::kind::socket)
+            credentials_ = credentials_of(origin_.fd);
+        tapped_.bind(std::move(origin_.taps), credentials_);
+        if (origin_.tap) {
+            vox_wire::encoded wish;
+            build_control(frame_type::tap, 0, 0, vox_null_create(), wish);
+            out_.append(wish);
+        }
     }
+    enlist();
 }
 
 peer_connection::~peer_connection() {
@@ -172,6 +175,7 @@ void peer_connection::close_socket() {
 }
 
 void peer_connection::wind_up(vox_object_t error) {
+    discharge();
     close_socket();
     for (std::size_t left = reader_.waiting_descriptors(); left > 0; --left)
         descriptor_gone();

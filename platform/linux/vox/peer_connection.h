@@ -17,6 +17,7 @@
 #include "platform/linux/vox/connection.h"
 #include "platform/linux/vox/frame_reader.h"
 #include "platform/linux/vox/id_table.h"
+#include "platform/linux/vox/idle_exit.h"
 #include "platform/linux/vox/output.h"
 #include "platform/linux/vox/request.h"
 #include "platform/linux/vox/service_account.h"
@@ -50,7 +51,7 @@ struct peer_origin {
     std::shared_ptr<tap_hub> taps;  // of the listener
 };
 
-class peer_connection final : public connection, counted_client {
+class peer_connection final : public connection, counted_client, idle_participant {
   public:
     // `name` is the service's, or empty. Starts with one reference.
     peer_connection(std::string name, const vox_limits_t& limits, peer_origin origin);
@@ -152,6 +153,14 @@ class peer_connection final : public connection, counted_client {
     [[nodiscard]] bool fit_to_peer(vox_wire::encoded& made) PLR_REQUIRES(lock_);
     [[nodiscard]] std::size_t give_up(vox_wire::encoded& made) PLR_REQUIRES(lock_);
 
+    // peer_idle.cpp
+    [[nodiscard]] sight look() override;
+    [[nodiscard]] bool leave(leaving_stage now) override;
+    [[nodiscard]] int socket() const PLR_REQUIRES(lock_);
+    [[nodiscard]] bool has_open_work() const PLR_REQUIRES(lock_);
+    [[nodiscard]] bool has_unread() const PLR_REQUIRES(lock_);
+    [[nodiscard]] bool is_own_end() PLR_ON(queue_role_);
+
     // peer_write.cpp
     void put(vox_wire::encoded& made, frame_type kind) PLR_REQUIRES(lock_);
     void tell_dropped() PLR_REQUIRES(lock_);
@@ -241,6 +250,9 @@ class peer_connection final : public connection, counted_client {
     std::atomic<std::uint64_t> held_{0};  // descriptors that came; grows under lock_ only
     std::atomic<std::uint64_t> messages_received_{0};
     std::atomic<std::uint64_t> peer_dropped_{0};
+    std::atomic<bool> undelivered_{false};         // after the last turn, bytes that were read
+    std::atomic<bool> receives_no_more_{false};    // the process leaves; changes under lock_ only
+    bool all_read_ PLR_GUARDED_BY(lock_) = false;  // what came before that is delivered
 
     // Sending.
     std::atomic<bool> greeted_{false};  // peer_accepts_ is set and the gate open

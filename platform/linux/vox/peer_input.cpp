@@ -64,6 +64,7 @@ void peer_connection::read_turn() {
     if (stage_ == stage::messages)
         tapped_.opened();
     reader_.keep();
+    undelivered_.store(reader_.in_frame(), std::memory_order_relaxed);
     if (!count_partial() || !may_deliver())
         return;
     if (frames == 0 || reads == 0)
@@ -124,7 +125,8 @@ bool peer_connection::receive(std::span<std::uint8_t> memory) {
         return false;
     }
     if (got.bytes == 0) {
-        read_failed(ECONNRESET);
+        if (!is_own_end())
+            read_failed(ECONNRESET);
         return false;
     }
     // The kernel ends a read behind bytes that came with descriptors, so only
