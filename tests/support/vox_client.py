@@ -36,7 +36,7 @@ TAG_UUID = 37
 
 HEADER = struct.Struct("<4sBBHIIQ")
 MAGIC = b"VOX1"
-HELLO, MESSAGE, REQUEST, REPLY, CANCEL, PING, DROPPED = range(1, 8)
+HELLO, MESSAGE, REQUEST, REPLY, CANCEL, PING, DROPPED, REFUSED = range(1, 9)
 TAP = 9
 PING_WANTS_ANSWER = 1
 LIMITS = {"min": 1, "max": 1, "bytes": 16 << 20, "depth": 64, "fds": 64}
@@ -44,6 +44,10 @@ LIMITS = {"min": 1, "max": 1, "bytes": 16 << 20, "depth": 64, "fds": 64}
 
 class ProtocolError(Exception):
     """The peer sent what the protocol does not allow."""
+
+
+class Refused(Exception):
+    """The peer did not take a request; the argument is its Error."""
 
 
 # ---- Values -----------------------------------------------------------------------
@@ -224,13 +228,16 @@ class Connection:
 
     def request(self, message):
         """Sends `message` and returns its reply. Messages that come meanwhile
-        wait for receive()."""
+        wait for receive(). Raises Refused when the peer has too many to answer."""
         self._last_id += 1
         self._write(REQUEST, message, self._last_id)
         deadline = time.monotonic() + self.timeout
         while self._last_id not in self._replies:
             self._handle_frame(deadline)
-        return self._replies.pop(self._last_id)
+        reply = self._replies.pop(self._last_id)
+        if isinstance(reply, Error):
+            raise Refused(reply)
+        return reply
 
     def receive(self):
         """The next message and its request id, None when it wants no reply."""
@@ -252,7 +259,7 @@ class Connection:
             self._messages.append((value, None))
         elif kind == REQUEST:
             self._messages.append((value, request_id))
-        elif kind == REPLY:
+        elif kind in (REPLY, REFUSED):  # a reply is a dictionary, a refusal an error
             self._replies[request_id] = value
         elif kind == PING and flags & PING_WANTS_ANSWER:
             self._write(PING, None, request_id)
