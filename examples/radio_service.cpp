@@ -60,14 +60,21 @@ void RadioService::init_sync() {
     server_->registerResource("/log", std::make_shared<LogLevels>(levelsLogger));
 }
 
-void RadioService::serve(const char* name, std::function<void()> onFailure) {
+bool RadioService::serve(const vox::connection& listener, std::function<void()> onFailure) {
     server_->setListenerErrorHandler(plr::whileAlive(
         weak_from_this(),
         [onFailure = std::move(onFailure)](RadioService& self, const vox::object& error) {
+            self.ownQueue_.assertCurrent();
+            self.failed_ = true;
             log(self.logger(), LogLevel::Error, "cannot serve: ", oneLine(error));
             onFailure();
         }));
-    server_->connect(vox::connection::create_listener(name));
+    server_->connect(listener);
+    // A name that is taken is on the queue as an error by now.
+    return execute_wrapped_sync([this] {
+        ownQueue_.assertCurrent();
+        return !failed_;
+    });
 }
 
 void RadioService::publish(const std::string& path, const vox::object& value) {

@@ -30,8 +30,9 @@ class RadioService : public plr::SharedLoggable<RadioService> {
         const std::shared_ptr<plr::LogServer>& logServer,
         std::shared_ptr<plr::TimerService> timers);
 
-    // Any thread. `onFailure` is called on the queue when the name is taken.
-    void serve(const char* name, std::function<void()> onFailure);
+    // Returns whether clients can come; `onFailure` is called on the queue when they
+    // cannot, or can no more. Any thread but the queue.
+    bool serve(const vox::connection& listener, std::function<void()> onFailure);
     // Sets a property as a client would. Any thread.
     void publish(const std::string& path, const vox::object& value);
 
@@ -47,6 +48,8 @@ class RadioService : public plr::SharedLoggable<RadioService> {
 
     const std::shared_ptr<plr::rest::RestServerExample> server_;  // on the same queue
     const std::shared_ptr<plr::TimerService> timers_;
+    bool failed_ PLR_CONFINED_TO(ownQueue_)
+    = false;  // the listener
     std::unique_ptr<plr::Timer> statusTimer_ PLR_CONFINED_TO(ownQueue_);
     std::uint64_t published_ PLR_CONFINED_TO(ownQueue_)
     = 0;  // reports

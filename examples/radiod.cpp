@@ -1,18 +1,24 @@
 // radiod: a radio service. It reads what a modem says, line by line, and
 // publishes it as properties and events under the name net.example.radio.
 //
-//   radiod --modem PATH [--log PLACE]...
+//   radiod --modem PATH [--log PLACE]... [--group NAME]
 //
 //   --modem PATH    a terminal, a FIFO or a file with a recorded session
 //   --log PLACE     console (standard error; used when there is no --log), system,
 //                   or the path of a file
+//   --group NAME    its members may be clients; without it only this user and root
+//
+// systemd may start it (systemd/net.example.radio.service).
 //
 // radio_service.h says what clients find, radio_reports.h which result code
 // becomes which path and value.
 
+#include <grp.h>
+
 #include <exception>
 #include <iostream>
 #include <memory>
+#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -21,6 +27,7 @@
 #include "examples/logging.h"
 #include "examples/modem_reader.h"
 #include "examples/radio_service.h"
+#include "vox/service.h"
 
 namespace {
 
@@ -31,6 +38,7 @@ constexpr const char* kService = "net.example.radio";
 struct Options {
     std::string modem;
     std::vector<std::string> logs;
+    std::string group;
 };
 
 // False when they are wrong.
@@ -40,6 +48,8 @@ bool parse(int argc, char** argv, Options& options) {
             options.modem = argv[i + 1];
         else if (std::string_view(argv[i]) == "--log")
             options.logs.emplace_back(argv[i + 1]);
+        else if (std::string_view(argv[i]) == "--group")
+            options.group = argv[i + 1];
         else
             return false;
     }
@@ -48,19 +58,36 @@ bool parse(int argc, char** argv, Options& options) {
     return argc % 2 == 1 && !options.modem.empty();
 }
 
-int serve(const std::string& modem, const std::shared_ptr<plr::LogServer>& logServer,
+vox::connection createListener(const std::string& groupName) {
+    auto listener = vox::connection::create_listener(kService);
+    if (groupName.empty())
+        return listener;
+    const group* const found = ::getgrnam(groupName.c_str());  // NOLINT(concurrency-mt-unsafe)
+    if (!found)
+        throw std::invalid_argument("there is no group " + groupName);
+    vox_policy_t policy = {};
+    policy.groups = &found->gr_gid;
+    policy.group_count = 1;
+    vox_listener_set_policy(listener.get(), &policy);
+    return listener;
+}
+
+int serve(const Options& options, const std::shared_ptr<plr::LogServer>& logServer,
           radio::EndSignals& end) {
     const auto service =
         radio::RadioService::create(logServer, plr::DispatchTimerService::create(logServer));
     const auto reader = radio::ModemReader::create(
-        logServer, modem, [service](const std::string& path, const vox::object& value) {
+        logServer, options.modem, [service](const std::string& path, const vox::object& value) {
             service->publish(path, value);
         });
-    service->serve(kService, [&end] { end.raise(1); });
-    reader->start();
     const plr::StaticLogger logger("radio", logServer);
-    radio::log(logger, LogLevel::Notice, "serving ", kService);
+    if (service->serve(createListener(options.group), [&end] { end.raise(1); })) {
+        radio::log(logger, LogLevel::Notice, "serving ", kService);
+        vox_notify_ready();
+    }
+    reader->start();
     const int status = end.wait();
+    vox_notify_stopping();
     radio::log(logger, LogLevel::Notice, "ending");
     return status;
 }
@@ -70,7 +97,7 @@ int run(const Options& options, radio::EndSignals& end) {
     const auto logServer = radio::startLog("radiod", options.logs);
     const plr::ScopedLogFlusher flusher(logServer);
     try {
-        return serve(options.modem, logServer, end);
+        return serve(options, logServer, end);
     } catch (const std::exception& error) {
         radio::log(plr::StaticLogger("radio", logServer), LogLevel::Fatal, error.what());
         return 1;
@@ -82,7 +109,7 @@ int run(const Options& options, radio::EndSignals& end) {
 int main(int argc, char** argv) {
     Options options;
     if (!parse(argc, argv, options)) {
-        std::cerr << "usage: radiod --modem PATH [--log console|system|PATH]...\n";
+        std::cerr << "usage: radiod --modem PATH [--log console|system|PATH]... [--group NAME]\n";
         return 2;
     }
     radio::EndSignals end;

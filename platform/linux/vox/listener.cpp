@@ -38,11 +38,6 @@ bool is_out_of_memory(int error) noexcept {
     return error == ENOMEM || error == ENOBUFS;
 }
 
-// From accept(2): somebody has shut down a socket that was passed to us.
-bool listens_no_more(int error) noexcept {
-    return error == EINVAL || error == EBADF || error == ENOTSOCK || error == EOPNOTSUPP;
-}
-
 }  // namespace
 
 listener::gate::gate(listener* of, int adopted, bool accepts) noexcept
@@ -194,7 +189,10 @@ void listener::gate_called(gate* called) {
         unhold();
         return;
     }
-    static_cast<void>(called->take_events());
+    const std::uint32_t events = called->take_events();
+    // Not by us: then it is ending already.
+    if (called->listening && (events & EPOLLHUP) != 0)
+        return fail(VOX_ERROR_CONNECTION_INVALID, "somebody shut the listening socket down");
     if (!std::exchange(called->ready, true))
         ready_.push_back(called);
     if (may_take())
@@ -246,10 +244,7 @@ listener::taken listener::accept_one(int listening) {
         return taken::client;
     if (is_out_of_descriptors(errno))
         return refuse_one(listening);
-    if (!listens_no_more(errno))
-        return out_of_memory(errno);
-    fail(VOX_ERROR_CONNECTION_INVALID, std::string("cannot accept: ") + ::strerrordesc_np(errno));
-    return taken::nothing;
+    return cannot_take(errno);
 }
 
 // The reserve descriptor makes room to take the client and let it go.
@@ -273,7 +268,7 @@ listener::taken listener::refused_one() {
     return ++refused_ % kRefusedBeforePause == 0 ? taken::pause : taken::client;
 }
 
-listener::taken listener::out_of_memory(int error) {
+listener::taken listener::cannot_take(int error) {
     note_shortage(std::string("cannot take clients: ") + ::strerrordesc_np(error));
     return taken::pause;
 }
@@ -306,7 +301,7 @@ listener::taken listener::take_from_endpoint(int pair) {
             note_shortage("is out of descriptors and refuses clients");
             return refused_one();
         default:
-            return is_out_of_memory(error) ? out_of_memory(error) : taken::gone;
+            return is_out_of_memory(error) ? cannot_take(error) : taken::gone;
     }
 }
 

@@ -74,7 +74,7 @@ class listener final : public connection, private idle_participant {
     [[nodiscard]] taken refuse_one(int listening) PLR_ON(queue_role_);
     [[nodiscard]] taken take_from_endpoint(int pair) PLR_ON(queue_role_);
     [[nodiscard]] taken refused_one() PLR_ON(queue_role_);
-    [[nodiscard]] taken out_of_memory(int error) PLR_ON(queue_role_);
+    [[nodiscard]] taken cannot_take(int error) PLR_ON(queue_role_);
     void note_shortage(const std::string& what) PLR_ON(queue_role_);
     void note_relief() PLR_ON(queue_role_);
     void welcome(int fd) PLR_ON(queue_role_);
