@@ -329,6 +329,22 @@ pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
     src/rest/operation.cpp
     src/rest/value_coding.cpp)
 
+pelorin_component(log_remote LEVEL 5 LIBRARY pelorin
+  HEADERS
+    include/plr/log/vox_log_server.h
+    include/plr/log/vox_logger.h
+    include/plr/log/vox_logger_proxy.h
+  SOURCES
+    src/log/remote_log_buffer.cpp
+    src/log/remote_log_buffer.h
+    src/log/remote_log_format.cpp
+    src/log/remote_log_format.h
+    src/log/remote_log_sender.cpp
+    src/log/remote_log_sender.h
+    src/log/vox_log_server.cpp
+    src/log/vox_logger.cpp
+    src/log/vox_logger_proxy.cpp)
+
 pelorin_component(timers LEVEL 5 LIBRARY pelorin
   HEADERS
     include/plr/concurrency/dispatch_timer.h

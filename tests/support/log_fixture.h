@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <deque>
 #include <memory>
 #include <string>
 #include <vector>
@@ -32,11 +33,15 @@ class LogFixture : public testing::Test {
         server_->debugFlush();
     }
 
-    // What was logged since the last call, as "level's letter, domain, text".
-    std::vector<std::string> takeLines() {
+    // What was logged since the last call.
+    std::deque<std::shared_ptr<LogMessage>> takeMessages() {
         server_->debugFlush();
+        return written_->drain();
+    }
+    // The same, as "level's letter, domain, text".
+    std::vector<std::string> takeLines() {
         std::vector<std::string> lines;
-        for (const auto& message : written_->drain())
+        for (const auto& message : takeMessages())
             lines.push_back(std::string(1, asChar(message->getLevel())) + " " +
                             message->getDomain() + " " + message->getText());
         return lines;

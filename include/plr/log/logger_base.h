@@ -8,8 +8,10 @@
 #include "plr/log/logger_common_base.h"
 #include "plr/log/trel_context.h"
 
-// LoggerBase<Server> is a logger that sends its messages to a server. The one
-// that exists is LoggerBase<std::shared_ptr<LogServer>>.
+// LoggerBase<Server> is a logger that sends its messages to a server: to a
+// LogServer of this process, LoggerBase<std::shared_ptr<LogServer>>. The other
+// one, LoggerBase<DummyLogServer>, has none, and is what loggers that send
+// elsewhere derive from (vox_logger.h).
 //
 //   if (logger.enabled(LogLevel::Debug)) {
 //       LogMessageBuffer text;
@@ -57,6 +59,15 @@ class PLR_EXPORT LoggerBase<std::shared_ptr<LogServer>> : public LoggerCommonBas
 
   private:
     std::shared_ptr<LogServer> server_;
+};
+
+struct DummyLogServer {};
+
+template <>
+class LoggerBase<DummyLogServer> : public LoggerCommonBase {
+  public:
+    // Without a trace-log handle.
+    explicit LoggerBase(const std::string& domain) : LoggerCommonBase(domain, nullptr) {}
 };
 
 }  // namespace plr
