@@ -48,7 +48,8 @@ Bytes helloOf(std::int64_t lowest, std::int64_t highest) {
                                                           {"max", number(highest)},
                                                           {"bytes", number(1000)},
                                                           {"depth", number(10)},
-                                                          {"fds", number(0)}}));
+                                                          {"fds", number(0)},
+                                                          {"later", number(1)}}));
 }
 
 struct Attack {
@@ -123,11 +124,34 @@ std::vector<Attack> firstFrames() {
          frame({.type = frame_type::request, .descriptors = 1, .id = 1}, message(1)), 1,
          "not a hello"},
         {"ping", frame({.type = frame_type::ping}, null), 0, "not a hello"},
-        {"version 99", helloOf(99, 100), 0, "the peer speaks 99 to 100, this side 1 to 1"},
-        {"version 0", helloOf(0, 0), 0, "speaks 0 to 0"},
         {"null", frame({.type = frame_type::hello}, null), 0, "hello"},
         {"no limits", frame({.type = frame_type::hello}, message(1)), 0, "hello"},
     };
+}
+
+TEST_F(VoxHostilePeer, OfAnotherVersionIsTakenWhenItSpeaksThisOneAsWell) {
+    struct Row {
+        const char* name;
+        std::int64_t lowest, highest;
+        const char* why;  // it is refused; null when it is not
+    };
+    for (const Row& row :
+         {Row{"newer, and this one", 1, 7, nullptr}, Row{"older, and this one", 0, 1, nullptr},
+          Row{"newer only", 2, 7, "the peer speaks 2 to 7, this side 1 to 1"},
+          Row{"older only", 0, 0, "speaks 0 to 0, this side"},
+          Row{"an empty range", 7, 1, "speaks 7 to 1"}}) {
+        SCOPED_TRACE(row.name);
+        RawPeer peer(connect());
+        peer.send(helloOf(row.lowest, row.highest));
+        peer.send(frame({.type = frame_type::request, .id = 1}, message(5)));
+        EXPECT_EQ(peer.readFrame().first.type, frame_type::hello);
+        const auto [header, body] = peer.readFrame();
+        EXPECT_EQ(header.type, row.why ? frame_type{0} : frame_type::reply);
+        if (row.why)
+            EXPECT_NE(served().inbox.errorText().find(row.why), std::string::npos);
+        else
+            EXPECT_EQ(numberIn(body), 5);
+    }
 }
 
 TEST_F(VoxHostilePeer, LosesItsConnectionWithAReasonAndNobodyElseDoes) {
