@@ -142,9 +142,10 @@ class Service {
         vox_listener_get_statistics(listener_, &counts);
         return counts;
     }
-    [[nodiscard]] const Numbers32& groupsSeen() {
-        drain(listener_.queue);
-        return groups_;
+    [[nodiscard]] Numbers32 groupsSeen() const {
+        Numbers32 seen;
+        listener_.queue.sync([this, &seen] { seen = groups_; });
+        return seen;
     }
     [[nodiscard]] End& listener() { return listener_; }
 
