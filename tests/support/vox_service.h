@@ -9,10 +9,12 @@
 // A service and its clients in this process.
 namespace plr::test {
 
-// Answers requests with their number and records the events of each client.
+// Answers requests with their number, unless `answers` is false, and records the
+// other events of each client.
 class EchoService {
   public:
-    explicit EchoService(vox_connection_t listener) : listener_(listener) {
+    explicit EchoService(vox_connection_t listener, bool answers = true)
+        : answers_(answers), listener_(listener) {
         listener_.resume([this](vox_object_t event) { return take(event); });
     }
 
@@ -33,10 +35,14 @@ class EchoService {
             return false;
         const std::lock_guard guard(lock_);
         clients_.push_back(std::make_unique<End>(vox_retain(event)));
-        clients_.back()->resumeEcho();
+        if (answers_)
+            clients_.back()->resumeEcho();
+        else
+            clients_.back()->resume();
         return true;
     }
 
+    const bool answers_;
     std::mutex lock_;
     std::vector<std::unique_ptr<End>> clients_;
     End listener_;  // the first to end
