@@ -38,28 +38,23 @@ enum Asked : std::int64_t {
     kSuspendMe = -5,    // until the release
     kRelease = -6,
     kAnswerLater = -7,
+    kAnswerNow = 1,
 };
 
-// How many messages and requests the services of a test have handled.
-class HandledCount {
-  public:
-    HandledCount() {
+// What the services of a test have handled so far, in a file that they share.
+struct Handled {
+    std::atomic<std::uint64_t> messages;
+    std::atomic<std::uint64_t> requests;
+
+    static Handled& shared() {
         const char* directory = std::getenv("VOX_RUNTIME_DIR");  // NOLINT(concurrency-mt-unsafe)
         const std::string file = std::string(directory) + "/handled";
         const int fd = ::open(file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
-        EXPECT_EQ(::ftruncate(fd, 4096), 0);
-        page_ = ::mmap(nullptr, 4096, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
+        EXPECT_EQ(::ftruncate(fd, sizeof(Handled)), 0);
+        void* page = ::mmap(nullptr, sizeof(Handled), PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
         ::close(fd);
+        return *static_cast<Handled*>(page);  // stays mapped
     }
-    ~HandledCount() { ::munmap(page_, 4096); }
-    HandledCount(const HandledCount&) = delete;
-    HandledCount& operator=(const HandledCount&) = delete;
-    std::atomic<std::uint64_t>* operator->() const {
-        return static_cast<std::atomic<std::uint64_t>*>(page_);
-    }
-
-  private:
-    void* page_;
 };
 
 // Everything runs on one queue.
@@ -91,7 +86,7 @@ class Service {
         vox_connection_resume(client);
     }
     void handle(vox_connection_t from, vox_object_t message) {
-        handled_->fetch_add(1);
+        ++(numberIn(message) == 0 ? handled_.messages : handled_.requests);
         switch (numberIn(message)) {
             case kBeginTransaction:
                 return vox_transaction_begin();
@@ -131,7 +126,7 @@ class Service {
     }
 
     const dispatch::queue queue_ = dispatch::queue::create("service");
-    const HandledCount handled_;
+    Handled& handled_ = Handled::shared();
     Ref kept_;
     Ref suspended_;
 };
@@ -149,7 +144,7 @@ void usePassedSocket() {
 struct Holder {
     const char* name;
     Asked asked;
-    bool request;  // else a message
+    bool request = false;  // else a message
 };
 
 class IdleExitHolder : public ::testing::TestWithParam<Holder> {};
@@ -157,7 +152,7 @@ class IdleExitHolder : public ::testing::TestWithParam<Holder> {};
 // Two services that nothing keeps come and go first: time enough to leave.
 TEST_P(IdleExitHolder, KeepsTheProcessUntilItIsReleased) {
     const RuntimeDirectory held;
-    const HandledCount handled;
+    const Handled& handled = Handled::shared();
     ServiceProcess service({"held"});
     Inbox replies;
     {
@@ -169,7 +164,7 @@ TEST_P(IdleExitHolder, KeepsTheProcessUntilItIsReleased) {
             client.send(message(GetParam().asked));
         if (GetParam().asked == kSuspendMe)
             client.send(message(1));
-        ASSERT_TRUE(eventually([&] { return handled->load() == 1; }));
+        ASSERT_TRUE(eventually([&] { return handled.requests == 1; }));
         other.send(message(kEndTransaction));
         for (int i = 0; i < 2; ++i) {
             const RuntimeDirectory free;
@@ -189,17 +184,138 @@ TEST_P(IdleExitHolder, KeepsTheProcessUntilItIsReleased) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Each, IdleExitHolder,
-                         ::testing::Values(Holder{"Transaction", kBeginTransaction, false},
+                         ::testing::Values(Holder{"Transaction", kBeginTransaction},
                                            Holder{"UnansweredRequest", kKeepRequest, true},
-                                           Holder{"RequestOfItsOwn", kAskBack, false},
+                                           Holder{"RequestOfItsOwn", kAskBack},
                                            Holder{"SuspendedConnectionWithSomethingToRead",
                                                   kSuspendMe, false}),
                          [](const auto& row) { return row.param.name; });
 
+// ---- Between requests ------------------------------------------------------------------
+
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+constexpr unsigned kExits = 60;
+#else
+constexpr unsigned kExits = 200;
+#endif
+
+// A service manager: holds the service's socket, and starts a service whenever a
+// client waits in it.
+class Manager {
+  public:
+    explicit Manager(const std::string& directory) {
+        sockaddr_un address = {};
+        address.sun_family = AF_UNIX;
+        (directory + "/" + kName).copy(address.sun_path, sizeof address.sun_path - 1);
+        EXPECT_EQ(::bind(socket_, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+        EXPECT_EQ(::listen(socket_, 100), 0);
+        thread_ = std::thread([this] { run(); });
+    }
+    ~Manager() {
+        ::eventfd_write(end_, 1);
+        thread_.join();
+        ::close(socket_);
+        ::close(end_);
+    }
+    Manager(const Manager&) = delete;
+    Manager& operator=(const Manager&) = delete;
+    // Services that have come and gone.
+    [[nodiscard]] unsigned exits() const { return exits_; }
+
+  private:
+    void run() {
+        for (;;) {
+            pollfd waiting[] = {{socket_, POLLIN, 0}, {end_, POLLIN, 0}};
+            ::poll(waiting, 2, -1);
+            if (waiting[1].revents != 0)
+                return;
+            EXPECT_EQ(ServiceProcess({"passed"}, socket_).wait(), 0);
+            ++exits_;
+        }
+    }
+
+    const int socket_ = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+    const int end_ = ::eventfd(0, EFD_CLOEXEC);
+    std::atomic<unsigned> exits_{0};
+    std::thread thread_;
+};
+
+// What one client saw.
+struct Tally {
+    std::uint64_t asked = 0;
+    std::uint64_t answered = 0;
+    std::uint64_t failed = 0;
+    std::uint64_t handed = 0;  // messages and requests that the kernel took
+};
+
+// A message and some requests at once. Returns whether all were answered.
+bool ask(End& service, std::minstd_rand& random, Tally& tally) {
+    const std::size_t count = 1 + random() % 5;
+    Inbox replies;
+    service.send(message(0));
+    for (std::size_t i = 0; i < count; ++i) {
+        service.request(message(random() % 2 == 0 ? kAnswerNow : kAnswerLater), replies);
+        ::usleep(static_cast<useconds_t>(random() % 500));
+    }
+    EXPECT_TRUE(replies.wait(count));
+    tally.asked += count;
+    const std::size_t answered = replies.numbers().size();
+    tally.answered += answered;
+    tally.failed += replies.all().size() - answered;
+    return answered == count;
+}
+
+// Asks at random times until enough services have gone, over one connection after
+// another.
+void useService(const Manager& manager, unsigned seed, Tally& tally) {
+    std::minstd_rand random(seed);
+    while (manager.exits() < kExits) {
+        Client service(vox_connection_create(kName));
+        bool alive = true;
+        while (alive && manager.exits() < kExits) {
+            ::usleep(static_cast<useconds_t>(random() % (3000 * kIdleMs)));
+            alive = ask(service, random, tally);
+        }
+        if (!alive) {
+            EXPECT_EQ(service.inbox.errorCode(), VOX_ERROR_CONNECTION_INTERRUPTED);
+        }
+        tally.handed += service.counts().messages_sent;
+    }
+}
+
+// Clients use a service that leaves whenever it may. Whatever the kernel took for
+// it was handled by it, every request that it handled was answered, and the others
+// are known to have failed.
+TEST(IdleExit, NeverLosesARequest) {
+    const RuntimeDirectory directory;
+    const Handled& handled = Handled::shared();
+    Tally tallies[3];
+    {
+        const Manager manager(directory.path());
+        std::vector<std::thread> clients;
+        for (unsigned i = 0; i < std::size(tallies); ++i)
+            clients.emplace_back(
+                [&manager, i, &tally = tallies[i]] { useService(manager, i + 1, tally); });
+        for (std::thread& each : clients)
+            each.join();
+    }
+    Tally all;
+    for (const Tally& each : tallies) {
+        all.asked += each.asked;
+        all.answered += each.answered;
+        all.failed += each.failed;
+        all.handed += each.handed;
+    }
+    EXPECT_EQ(all.answered + all.failed, all.asked);
+    EXPECT_EQ(handled.messages + handled.requests, all.handed);
+    EXPECT_EQ(handled.requests, all.answered);
+    EXPECT_GT(all.answered, kExits);
+}
+
 }  // namespace
 
 int main(int count, char** arguments) {
-    if (count == 2) {
+    if (count == 2 && *arguments[1] != '-') {
         const std::string role = arguments[1];
         if (role == "held")
             vox_transaction_begin();

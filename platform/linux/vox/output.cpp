@@ -110,6 +110,19 @@ void output::count_frames(chunk& progressed) noexcept {
     }
 }
 
+std::vector<std::uint64_t> output::waiting_requests() const {
+    std::vector<std::uint64_t> ids;
+    for (const chunk& waiting : chunks_) {
+        for (std::size_t at = waiting.frame_begin; at < waiting.bytes.size();) {
+            const frame_header header = read_own_header(waiting.bytes.data() + at);
+            if (header.type == frame_type::request)
+                ids.push_back(header.id);
+            at += kHeaderBytes + header.length;
+        }
+    }
+    return ids;
+}
+
 void output::clear() noexcept {
     for (chunk& waiting : chunks_)
         close_descriptors(waiting);

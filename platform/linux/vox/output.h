@@ -51,6 +51,8 @@ class output {
     void gather(output_batch& batch) noexcept;
     // `count` bytes of the last batch were written.
     void written(std::size_t count) noexcept;
+    // The ids of the requests that wait.
+    [[nodiscard]] std::vector<std::uint64_t> waiting_requests() const;
     // Gives up everything that waits.
     void clear() noexcept;
 

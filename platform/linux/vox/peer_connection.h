@@ -28,7 +28,7 @@
 // Files:   peer_connection.cpp connects and ends, peer_input.cpp reads and
 //          delivers, peer_send.cpp takes what is to be sent, peer_write.cpp writes it,
 //          peer_requests.cpp has what is outstanding, peer_limits.cpp what all that costs,
-//          peer_tap.cpp has those that only look on.
+//          peer_tap.cpp has those that only look on, peer_idle.cpp the end of an idle process.
 // Threads: everything received is read, decoded and delivered on the target
 //          queue. Senders encode on their own thread without the lock; then one
 //          of them writes at a time, without the lock, and takes along what the
@@ -183,6 +183,8 @@ class peer_connection final : public connection, counted_client, idle_participan
     [[nodiscard]] waiting_reply take_waiting(std::uint64_t id) PLR_REQUIRES(lock_);
     [[nodiscard]] std::vector<waiting_reply> take_all_waiting() PLR_REQUIRES(lock_);
     void tell_given_up(std::span<const waiting_reply> given_up) PLR_REQUIRES(lock_);
+    void fail_unsent_requests() PLR_REQUIRES(lock_);
+    [[nodiscard]] bool awaits_replies();
     void arm_deadline() PLR_REQUIRES(lock_);
     void deadline_due();
     static void fail_request(waiting_reply reply, std::int64_t code, const std::string& why);

@@ -110,7 +110,7 @@ bool peer_connection::receive(std::span<std::uint8_t> memory) {
     receive_once(fd, space, got);
     if (got.error != 0) {
         readable_ = false;
-        if (got.error != EAGAIN || broken)
+        if (got.error != EAGAIN || (broken && !awaits_replies()))
             read_failed(got.error);
         return false;
     }
@@ -137,7 +137,7 @@ bool peer_connection::receive(std::span<std::uint8_t> memory) {
     return true;
 }
 
-// EAGAIN: writing failed before, and now everything is read.
+// EAGAIN: writing failed before, and now everything is read that is of use.
 void peer_connection::read_failed(int error) {
     if (error == EAGAIN || error == ECONNRESET)
         fail(VOX_ERROR_CONNECTION_INTERRUPTED,

@@ -111,7 +111,7 @@ void peer_connection::tell_given_up(std::span<const waiting_reply> given_up) {
         vox_wire::encoded made;
         build_control(frame_type::cancel, 0, each.id, vox_null_create(), made);
         if (admit(frame_type::cancel, made) != 0)
-            return;
+            return schedule();  // nothing may be left to read for
         show(made);
         out_.append(made);
     }
@@ -119,6 +119,20 @@ void peer_connection::tell_given_up(std::span<const waiting_reply> given_up) {
         write_waiting();
     else
         settle();
+}
+
+// Those that the peer will never read.
+void peer_connection::fail_unsent_requests() {
+    for (const std::uint64_t id : out_.waiting_requests()) {
+        if (waiting_reply reply = take_waiting(id); reply.id != 0)
+            fail_request(std::move(reply), VOX_ERROR_CONNECTION_INTERRUPTED,
+                         "the peer reads no more");
+    }
+}
+
+bool peer_connection::awaits_replies() {
+    const lock_guard guard(lock_);
+    return greeted_.load(std::memory_order_relaxed) && replies_.size() > 0;
 }
 
 // ---- Their time limits ---------------------------------------------------------------

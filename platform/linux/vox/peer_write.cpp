@@ -196,8 +196,10 @@ void peer_connection::write_stopped(int error) {
             break;
         case EPIPE:
         case ECONNRESET:
-            // What the peer sent before it went is read first.
+            // What the peer sent before it went is read first. One that only reads no
+            // more still answers what it has read.
             broken_ = true;
+            fail_unsent_requests();
             out_.clear();
             schedule();
             break;
