@@ -6,6 +6,7 @@
 
 #include "examples/log_levels.h"
 #include "examples/logging.h"
+#include "examples/remote_log.h"
 #include "examples/show.h"
 
 namespace radio {
@@ -58,6 +59,7 @@ void RadioService::init_sync() {
     server_->registerResource("/events", std::make_shared<PropertyRestResource>(false));
     server_->registerResource("/settings", std::make_shared<Settings>(weak_from_this()));
     server_->registerResource("/log", std::make_shared<LogLevels>(levelsLogger));
+    server_->registerResource("/log_server", std::make_shared<RemoteLog>(logger().getLogServer()));
 }
 
 bool RadioService::serve(const vox::connection& listener, std::function<void()> onFailure) {

@@ -20,6 +20,7 @@ namespace radio {
 //   /settings/...           what clients ask for; status_seconds: a period for
 //                           status lines in the log
 //   /log/DOMAIN             levels of log domains (log_levels.h)
+//   /log_server             an endpoint for clients to log to (remote_log.h)
 //
 // Owner:   the std::shared_ptr of create().
 // Queue:   its own has everything: clients' messages, the tree, the timer.

@@ -2,9 +2,9 @@
 //
 //   radio_watch PATH...     for instance /radio/signal /events/ring
 //
-// When the service goes away it tries again, at growing intervals; what it
-// observes comes back with the connection. Values go to standard output, what
-// happens to the connection is logged to standard error.
+// When the service goes away it tries again, at growing intervals. Values go to
+// standard output. It logs into the service's log, in the domain radio.watch.PID;
+// what it logs while there is no service waits for the next one.
 
 #include <unistd.h>
 
@@ -19,6 +19,7 @@
 #include "examples/logging.h"
 #include "examples/show.h"
 #include "plr/concurrency.h"
+#include "plr/log/vox_logger.h"
 #include "plr/rest.h"
 
 namespace {
@@ -29,67 +30,61 @@ using plr::LogLevel;
 constexpr const char* kService = "net.example.radio";
 constexpr std::chrono::milliseconds kFirstDelay = 50ms, kLongestDelay = 5s;
 
-// Owns its queue and its logger; see plr/log/shared_loggable.h.
-class Watcher : public plr::SharedLoggable<Watcher> {
+// Owns its queue; see plr/concurrency/shared_synchronizable.h.
+class Watcher : public plr::SharedSynchronizable<Watcher> {
   public:
-    static std::shared_ptr<Watcher> create(const std::shared_ptr<plr::LogServer>& logServer,
-                                           std::vector<std::string> paths) {
-        auto watcher = make_shared_ptr(new Watcher(logServer));
+    static std::shared_ptr<Watcher> create(std::vector<std::string> paths) {
+        auto watcher = make_shared_ptr(new Watcher);
         watcher->execute_wrapped([self = watcher.get(), paths = std::move(paths)] {
             self->ownQueue_.assertCurrent();
-            self->observe_sync(paths);
-            self->connect_sync();
+            self->start_sync(paths);
         });
         return watcher;
     }
+    void flushLog() const { static_cast<void>(logger_->flush().wait(dispatch::time::after(1s))); }
 
   private:
-    explicit Watcher(const std::shared_ptr<plr::LogServer>& logServer)
-        : SharedLoggable("radio_watch", "radio.watch", logServer),
-          timers_(plr::DispatchTimerService::create(logServer)),
-          rest_(ownQueue_.queue(), "radio_watch." + std::to_string(::getpid())) {}
+    Watcher() : SharedSynchronizable("radio_watch") {}
 
-    void observe_sync(const std::vector<std::string>& paths) PLR_ON(ownQueue_)
+    void start_sync(const std::vector<std::string>& paths) PLR_ON(ownQueue_)
     {
+        logger_->setInheritedLogLevel(LogLevel::Info);  // until the service tells
         for (const std::string& path : paths)
             rest_.observeProperty(
                 path, plr::whileAlive(weak_from_this(), [path](Watcher& self, const auto& value) {
-                    self.ownQueue_.assertCurrent();
-                    self.connected_sync();
                     radio::say(path + " = " + radio::oneLine(value));
+                    radio::log(*self.logger_, LogLevel::Debug, path, " = ", radio::oneLine(value));
                 }));
         rest_.setServerErrorHandler(plr::whileAlive(weak_from_this(), [](Watcher& self, auto&&) {
             self.ownQueue_.assertCurrent();
             self.lost_sync();
         }));
+        connect_sync();
     }
 
     void connect_sync() PLR_ON(ownQueue_)
     {
         rest_.connect(vox::connection::create(kService));
-        // Null without a service; else the first sign of it, when only events are
-        // observed.
-        rest_.getPropertyOnce(
-            "/", plr::whileAlive(weak_from_this(), [](Watcher& self, const vox::object& names) {
-                self.ownQueue_.assertCurrent();
-                if (names)
-                    self.connected_sync();
-            }));
+        rest_.getPropertyOnce("/log_server",
+                              plr::whileAlive(weak_from_this(), [](Watcher& self, const auto& log) {
+                                  self.ownQueue_.assertCurrent();
+                                  if (log)  // null without a service
+                                      self.connected_sync(vox::endpoint(log));
+                              }));
     }
 
-    void connected_sync() PLR_ON(ownQueue_)
+    void connected_sync(const vox::endpoint& logServer) PLR_ON(ownQueue_)
     {
+        connected_ = true;
         delay_ = kFirstDelay;
-        if (std::exchange(connected_, true))
-            return;
-        radio::log(logger(), LogLevel::Notice, "connected to ", kService);
-        logger().getLogServer()->debugFlush();  // values come behind it
+        radio::log(*logger_, LogLevel::Notice, "connected to ", kService);
+        logger_->reconnect(logServer);
     }
 
     void lost_sync() PLR_ON(ownQueue_)
     {
         if (std::exchange(connected_, false))
-            radio::log(logger(), LogLevel::Warn, kService, " is gone");
+            radio::log(*logger_, LogLevel::Warn, kService, " is gone");
         timers_->runAfter(delay_, ownQueue_.queue(),
                           plr::whileAlive(weak_from_this(), [](Watcher& self) {
                               self.ownQueue_.assertCurrent();
@@ -98,8 +93,12 @@ class Watcher : public plr::SharedLoggable<Watcher> {
         delay_ = std::min(2 * delay_, kLongestDelay);
     }
 
-    const std::shared_ptr<plr::TimerService> timers_;
-    plr::RestModule rest_ PLR_CONFINED_TO(ownQueue_);
+    const std::string pid_ = std::to_string(::getpid());
+    const std::shared_ptr<plr::VoxLogger> logger_ = plr::VoxLogger::create(
+        ownQueue_.queue(), "radio_watch", "radio.watch." + pid_, vox::connection());
+    const std::shared_ptr<plr::TimerService> timers_ = plr::DispatchTimerService::create(nullptr);
+    plr::RestModule rest_ PLR_CONFINED_TO(ownQueue_)
+    = plr::RestModule(ownQueue_.queue(), "radio_watch." + pid_);
     bool connected_ PLR_CONFINED_TO(ownQueue_)
     = false;
     std::chrono::milliseconds delay_ PLR_CONFINED_TO(ownQueue_)
@@ -114,8 +113,8 @@ int main(int argc, char** argv) {
         return 2;
     }
     const radio::EndSignals end;
-    const auto logServer = radio::startLog("radio_watch", {"console"});
-    const plr::ScopedLogFlusher flusher(logServer);
-    const auto watcher = Watcher::create(logServer, {argv + 1, argv + argc});
-    return end.wait();
+    const auto watcher = Watcher::create({argv + 1, argv + argc});
+    const int status = end.wait();
+    watcher->flushLog();
+    return status;
 }

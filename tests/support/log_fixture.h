@@ -4,7 +4,9 @@
 
 #include <deque>
 #include <memory>
+#include <mutex>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "plr/ipc/values.h"
@@ -13,6 +15,24 @@
 #include "plr/log/memory_buffered_log_writer.h"
 
 namespace plr::test {
+
+// What was written, for another thread.
+class KeptMessages : public MemoryBufferedLogWriter {
+  public:
+    KeptMessages() : MemoryBufferedLogWriter(UNLIMITED, UNLIMITED) {}
+    using LogWriter::write;
+    void write(std::shared_ptr<LogMessage> message) override {
+        const std::lock_guard guard(lock_);
+        MemoryBufferedLogWriter::write(std::move(message));
+    }
+    std::deque<std::shared_ptr<LogMessage>> drain() override {
+        const std::lock_guard guard(lock_);
+        return MemoryBufferedLogWriter::drain();
+    }
+
+  private:
+    std::mutex lock_;
+};
 
 // A started server whose messages end in memory.
 class LogFixture : public testing::Test {
@@ -50,9 +70,7 @@ class LogFixture : public testing::Test {
     const std::shared_ptr<LogServer> server_ = LogServer::create("test");
 
   private:
-    const std::shared_ptr<MemoryBufferedLogWriter> written_ =
-        std::make_shared<MemoryBufferedLogWriter>(MemoryBufferedLogWriter::UNLIMITED,
-                                                  MemoryBufferedLogWriter::UNLIMITED);
+    const std::shared_ptr<KeptMessages> written_ = std::make_shared<KeptMessages>();
 };
 
 }  // namespace plr::test

@@ -64,8 +64,11 @@ class PLR_EXPORT VoxLogger : private LoggerBase<DummyLogServer>, public VoxClien
     using LoggerCommonBase::getLogDomain;
     using LoggerCommonBase::getLogLevel;
 
-    // Whether messages of that level go out; ask before composing one.
+    // Whether messages of that level go out; ask before composing one. Until the
+    // server has handed a level down that is the one set by the second; Unset, as
+    // it starts, lets everything through.
     using LoggerCommonBase::enabled;
+    using LoggerCommonBase::setInheritedLogLevel;
     // Logs what the buffer holds, whatever the level. The buffer is empty then.
     void forceLog(LogLevel level, LogMessageBuffer&& buffer) const;
     // The local level, in force at once; Unset leaves it to the domain. The server
