@@ -34,10 +34,11 @@ enum Asked : std::int64_t {
     kBeginTransaction = -1,
     kEndTransaction = -2,
     kKeepRequest = -3,  // unanswered until the release
-    kAskBack = -4,      // to be answered by the client
+    kAskBack = -4,      // to be answered by the client, after the release
     kSuspendMe = -5,    // until the release
     kRelease = -6,
     kAnswerLater = -7,
+    kAskBackHere = -8,  // to be answered by the client now, and handled after the release
     kAnswerNow = 1,
 };
 
@@ -61,6 +62,7 @@ struct Handled {
 class Service {
   public:
     void serve() {
+        held_.suspend();
         const Ref listener(vox_connection_create_listener(kName, nullptr));
         const dispatch::block<void(vox_object_t)> taker(
             [this](vox_object_t client) { take(client); });
@@ -95,11 +97,10 @@ class Service {
             case kKeepRequest:
                 kept_ = Ref::retain(message);
                 return;
-            case kAskBack: {
-                const dispatch::block<void(vox_object_t)> ignore([](vox_object_t) {});
-                return vox_connection_send_message_with_reply(from, plr::test::message(0), &queue_,
-                                                              &ignore);
-            }
+            case kAskBack:
+                return askBack(from, queue_);
+            case kAskBackHere:
+                return askBack(from, held_);
             case kSuspendMe:
                 suspended_ = Ref::retain(from);
                 return vox_connection_suspend(from);
@@ -113,7 +114,12 @@ class Service {
                 answer(message);
         }
     }
+    static void askBack(vox_connection_t client, const dispatch::queue& queue) {
+        const dispatch::block<void(vox_object_t)> ignore([](vox_object_t) {});
+        vox_connection_send_message_with_reply(client, plr::test::message(0), &queue, &ignore);
+    }
     void release() {
+        held_.resume();
         answer(std::exchange(kept_, {}));
         if (vox_object_t(suspended_))
             vox_connection_resume(std::exchange(suspended_, {}));
@@ -126,6 +132,7 @@ class Service {
     }
 
     const dispatch::queue queue_ = dispatch::queue::create("service");
+    const dispatch::queue held_ = dispatch::queue::create("held");  // until the release
     Handled& handled_ = Handled::shared();
     Ref kept_;
     Ref suspended_;
@@ -147,7 +154,13 @@ struct Holder {
     bool request = false;  // else a message
 };
 
-class IdleExitHolder : public ::testing::TestWithParam<Holder> {};
+class IdleExitHolder : public ::testing::TestWithParam<Holder> {
+  protected:
+    static void answerBack(End& client) {
+        ASSERT_TRUE(client.inbox.wait(1));
+        EXPECT_EQ(client.answer(client.inbox[0]), 0);
+    }
+};
 
 // Two services that nothing keeps come and go first: time enough to leave.
 TEST_P(IdleExitHolder, KeepsTheProcessUntilItIsReleased) {
@@ -165,6 +178,8 @@ TEST_P(IdleExitHolder, KeepsTheProcessUntilItIsReleased) {
         if (GetParam().asked == kSuspendMe)
             client.send(message(1));
         ASSERT_TRUE(eventually([&] { return handled.requests == 1; }));
+        if (GetParam().asked == kAskBackHere)
+            answerBack(client);
         other.send(message(kEndTransaction));
         for (int i = 0; i < 2; ++i) {
             const RuntimeDirectory free;
@@ -173,10 +188,8 @@ TEST_P(IdleExitHolder, KeepsTheProcessUntilItIsReleased) {
         RuntimeDirectory::use(held.path());
         ASSERT_TRUE(other.works()) << "it has left";
         other.send(message(GetParam().asked == kBeginTransaction ? kEndTransaction : kRelease));
-        if (GetParam().asked == kAskBack) {
-            ASSERT_TRUE(client.inbox.wait(1));
-            EXPECT_EQ(client.answer(client.inbox[0]), 0);
-        }
+        if (GetParam().asked == kAskBack)
+            answerBack(client);
         EXPECT_EQ(client.inbox.errorCode(), VOX_ERROR_CONNECTION_INTERRUPTED);
     }
     EXPECT_EQ(service.wait(), 0);
@@ -187,6 +200,7 @@ INSTANTIATE_TEST_SUITE_P(Each, IdleExitHolder,
                          ::testing::Values(Holder{"Transaction", kBeginTransaction},
                                            Holder{"UnansweredRequest", kKeepRequest, true},
                                            Holder{"RequestOfItsOwn", kAskBack},
+                                           Holder{"ReplyThatIsNotHandledYet", kAskBackHere},
                                            Holder{"SuspendedConnectionWithSomethingToRead",
                                                   kSuspendMe, false}),
                          [](const auto& row) { return row.param.name; });

@@ -99,6 +99,11 @@ std::int64_t now() noexcept {
     return dispatch::time::now().nanoseconds();
 }
 
+// What belongs to no single connection.
+bool has_activities() noexcept {
+    return vox_transaction_count() > 0 || queued_call::count.load(std::memory_order_acquire) > 0;
+}
+
 void idle_exit::opt_in(nanoseconds idle, const dispatch::queue& queue,
                        const dispatch::block<void()>& leave) {
     const lock_guard guard(lock_);
@@ -108,6 +113,7 @@ void idle_exit::opt_in(nanoseconds idle, const dispatch::queue& queue,
     queue_ = queue;
     leave_ = leave;
     quiet_since_ = now();
+    queued_call::is_counting.store(true, std::memory_order_relaxed);
     if (!timer_) {
         timer_ = dispatch::source::timer(dispatch::queue::create("vox idle exit"));
         timer_.set_event_handler(dispatch::block<void()>([this] { tick(); }));
@@ -123,6 +129,7 @@ void idle_exit::opt_out() {
     idle_ = nanoseconds(0);
     leave_ = nullptr;
     queue_ = {};
+    queued_call::is_counting.store(false, std::memory_order_relaxed);
 }
 
 void idle_exit::wake_after(nanoseconds delay) {
@@ -152,7 +159,7 @@ void idle_exit::watch() {
 // Whether nothing waits, and nothing has happened since it was asked last.
 bool idle_exit::is_quiet() {
     trace found{participants_.changes(), 0, transactions_begun()};
-    bool busy = vox_transaction_count() > 0;
+    bool busy = has_activities();
     for (idle_participant* each = participants_.first(); each; each = participants_.after(*each)) {
         const idle_participant::sight seen = each->look();
         found.messages += seen.passed;
@@ -163,7 +170,7 @@ bool idle_exit::is_quiet() {
 }
 
 bool idle_exit::is_stage_over() {
-    bool over = vox_transaction_count() == 0;
+    bool over = !has_activities();
     for (idle_participant* each = participants_.first(); each; each = participants_.after(*each))
         over = each->leave(stage_) && over;
     return over;

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <atomic>
 #include <cstdint>
+#include <utility>
 
 // How an idle process leaves (vox/service.h).
 //
@@ -51,6 +53,29 @@ class idle_participant {
     friend class participant_list;
     idle_participant* before_ = nullptr;
     idle_participant* after_ = nullptr;
+};
+
+// A call that waits on a queue of the user's holds one: the process stays until it was
+// made. Costs one load while the process is not opted in.
+class queued_call {
+  public:
+    queued_call() noexcept : counted_(is_counting.load(std::memory_order_relaxed)) {
+        if (counted_)
+            count.fetch_add(1, std::memory_order_relaxed);
+    }
+    queued_call(queued_call&& other) noexcept : counted_(std::exchange(other.counted_, false)) {}
+    queued_call(const queued_call&) = delete;
+    queued_call& operator=(const queued_call&) = delete;
+    ~queued_call() {
+        if (counted_)
+            count.fetch_sub(1, std::memory_order_release);
+    }
+
+    static inline std::atomic<bool> is_counting{false};  // while opted in
+    static inline std::atomic<std::uint64_t> count{0};
+
+  private:
+    bool counted_;
 };
 
 }  // namespace vox_link

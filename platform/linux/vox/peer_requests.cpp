@@ -183,11 +183,11 @@ void peer_connection::fail_request(waiting_reply reply, int error) {
 }
 
 void peer_connection::fail_request(waiting_reply reply, std::int64_t code, const std::string& why) {
-    reply.queue.async(
-        [handler = std::move(reply.handler), result = vox_error_create(code, why.c_str())] {
-            handler(result);
-            vox_release(result);
-        });
+    reply.queue.async([handler = std::move(reply.handler),
+                       result = vox_error_create(code, why.c_str()), stay = queued_call()] {
+        handler(result);
+        vox_release(result);
+    });
 }
 
 // `result` is lent.
@@ -197,7 +197,7 @@ void peer_connection::run_reply(waiting_reply& reply, vox_object_t result) {
         return;
     }
     vox_retain(result);
-    reply.queue.async([handler = std::move(reply.handler), result] {
+    reply.queue.async([handler = std::move(reply.handler), result, stay = queued_call()] {
         handler(result);
         vox_release(result);
     });
