@@ -244,6 +244,8 @@ bool peer_connection::enter_request(const frame& arrived) {
         }
         ++requests_refused_;
     }
+    if (tapped_.is_watched())
+        tapped_.show(tap_way::in, arrived.header, arrived.body);
     let_go(arrived.descriptors);
     const std::string why = "too many requests are open: " + hit.text();
     send_control(frame_type::refused, 0, id,

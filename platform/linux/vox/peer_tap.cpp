@@ -29,13 +29,14 @@ void peer_connection::handle_tap(const frame& arrived) {
         return refuse_tap("this service takes no taps");
     if (uid != 0 && uid != ::geteuid())
         return refuse_tap("taps are for root and the service's own user");
-    stage_ = stage::tap;
+    tapped_.closed(nullptr);
     {
         const lock_guard guard(lock_);
         is_tap_ = true;
     }
-    tapped_.closed(nullptr);
-    hub->add(this);
+    if (!hub->add(this))
+        return refuse_tap("this service has too many taps already");
+    stage_ = stage::tap;
 }
 
 void peer_connection::refuse_tap(const char* why) {

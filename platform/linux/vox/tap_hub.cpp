@@ -16,6 +16,8 @@ namespace {
 // Of the list.
 constexpr std::size_t kMostEntries = 16384;
 constexpr std::size_t kMostBytes = 4u << 20;
+// Of one listener.
+constexpr std::size_t kMostTaps = 16;
 // Longer bodies are not shown.
 constexpr std::size_t kMostBody = 64u << 10;
 
@@ -33,6 +35,8 @@ tap_kind kind_of(frame_type type) noexcept {
             return tap_kind::cancel;
         case frame_type::dropped:
             return tap_kind::dropped;
+        case frame_type::refused:
+            return tap_kind::refused;
         default:
             return tap_kind::message;
     }
@@ -109,9 +113,11 @@ void tap_hub::list::clear() noexcept {
     bodies.clear();
 }
 
-void tap_hub::add(peer_connection* tap_connection) {
+bool tap_hub::add(peer_connection* tap_connection) {
     {
         const lock_guard guard(lock_);
+        if (taps_.size() == kMostTaps)
+            return false;
         if (!queue_)
             queue_ = dispatch::queue::create("vox.taps",
                                              dispatch::queue::global(dispatch::priority::low));
@@ -119,6 +125,7 @@ void tap_hub::add(peer_connection* tap_connection) {
         count_.store(static_cast<std::uint32_t>(taps_.size()), std::memory_order_relaxed);
     }
     async(dispatch::block<void()>([self = shared_from_this()] { self->drain(); }));
+    return true;
 }
 
 void tap_hub::remove(peer_connection* tap_connection) {

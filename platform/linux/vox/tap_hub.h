@@ -68,10 +68,11 @@ class tap_hub : public std::enable_shared_from_this<tap_hub> {
     void set_allowed(bool allowed) noexcept { allowed_.store(allowed); }
     [[nodiscard]] bool is_allowed() const noexcept { return allowed_.load(); }
 
-    // `tap` gets what is published from now on, until it is removed.
-    void add(peer_connection* tap);
+    // `tap` gets what is published from now on, until it is removed. False when
+    // there are too many.
+    [[nodiscard]] bool add(peer_connection* tap);
     void remove(peer_connection* tap);
-    // On the taps' queue. Only while `tap` is one.
+    // On the taps' queue. Not before the first tap.
     void async(dispatch::block<void()> work);
 
     // `about` is known as open from then on.
