@@ -62,7 +62,8 @@ extern "C" {
 // (LISTEN_PID, LISTEN_FDS, LISTEN_FDNAMES, as sd_listen_fds(3) has it; "<name>.socket"
 // is found as well), it is used: clients that came before the service are waiting in it,
 // and those that come after its end will wait for the next one. It must be a listening
-// AF_UNIX stream socket, else the listener fails (INVALID).
+// AF_UNIX stream socket and the only one of the name, else the listener fails
+// (INVALID). To such clients the service manager is the peer (vox_connection_get_pid()).
 //
 // Otherwise the socket is made in the runtime directory. The directory is made when
 // missing (mode 0700; /run/vox 0755) and refused when it is a symbolic

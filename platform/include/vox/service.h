@@ -48,7 +48,7 @@ PLR_EXPORT void vox_set_idle_exit(uint32_t idle_ms, const dispatch::queue* queue
 // Tells the service manager `state`, lines like "READY=1" or "STATUS=registering",
 // as sd_notify(3) has it: one datagram to $NOTIFY_SOCKET, a path or "@" and an
 // abstract name. Returns 0; ENOENT without a service manager; EINVAL for a null or empty
-// state; or the error number of sending. Never waits. Any thread.
+// state; EAFNOSUPPORT for other places; or the error number of sending. Never waits. Any thread.
 PLR_EXPORT int vox_notify(const char* state);
 // READY=1: the service has its listeners and serves.
 PLR_EXPORT int vox_notify_ready(void);

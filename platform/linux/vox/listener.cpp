@@ -63,7 +63,7 @@ listener::listener(std::string name, bool anonymous, const vox_limits_t& limits)
 }
 
 std::string listener::title() {
-    return "listener '" + name() + "'";
+    return name().empty() ? "anonymous listener" : "listener '" + name() + "'";
 }
 
 void listener::set_policy(const vox_policy_t* policy) {
@@ -200,23 +200,26 @@ void listener::gate_called(gate* called) {
 }
 
 void listener::turn() {
-    if (reserve_ < 0)
-        reserve_ = open_reserve();
     take_clients();
 }
 
 void listener::take_clients() {
+    // Before any client: it may have been lost to another thread while it was used.
+    if (reserve_ < 0 && !anonymous_)
+        reserve_ = open_reserve();
     unsigned budget = kClientsPerTurn;
     while (!ready_.empty() && !paused_ && may_take()) {
         if (budget-- == 0)
             return schedule();
         gate* first = ready_.front();
         switch (take_one(*first)) {
-            case taken::client:
+            case taken::client:  // the next from another gate, if there is one
+                ready_.pop_front();
+                ready_.push_back(first);
                 break;
             case taken::nothing:
-                first->ready = false;
                 ready_.pop_front();
+                first->ready = false;
                 break;
             case taken::pause:
                 pause();
@@ -295,7 +298,7 @@ listener::taken listener::take_from_endpoint(int pair) {
         case EAGAIN:
             return taken::nothing;
         case EPROTO:
-            complain("an endpoint carried something that is no connection");
+            complain(title() + ": an endpoint carried something that is no connection");
             return taken::client;
         case EMFILE:
             note_shortage("is out of descriptors and refuses clients");
