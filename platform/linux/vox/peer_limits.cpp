@@ -46,11 +46,12 @@ limit_hit peer_connection::over(const vox_wire::encoded& made, unsigned times) {
 // Makes what the user is charged for on account of this connection what `all`
 // comes to. Hot path: nothing is charged for a peer that reads.
 limit_hit peer_connection::charge(const burden& all, unsigned times) {
-    if (!user_ || is_tap_)  // what waits for a tap is bounded by itself
+    if (!user_)
         return {};
     const bool lasts = blocked_ || !greeted_.load(std::memory_order_relaxed) ||
                        fd_.load(std::memory_order_relaxed) < 0 || all.bytes > kUnchargedBytes;
-    const burden due = lasts ? all : burden{};
+    // What waits for a tap is bounded by itself.
+    const burden due = lasts && !is_tap_ ? all : burden{};
     if (due == charged_) [[likely]]
         return {};
     if (!user_->adjust(cost::queued_bytes, charged_.bytes, due.bytes, times))
