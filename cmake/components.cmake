@@ -139,7 +139,9 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/tap_hub.cpp
     platform/linux/vox/tap_hub.h
     platform/linux/vox/transactions.cpp
-    platform/linux/vox/transactions.h)
+    platform/linux/vox/transactions.h
+    platform/linux/vox/user_turns.cpp
+    platform/linux/vox/user_turns.h)
 
 pelorin_component(qf_core LEVEL 1 LIBRARY platform
   HEADERS

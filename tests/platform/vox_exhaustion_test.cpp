@@ -113,6 +113,7 @@ TEST_F(VoxExhaustion, ManyClientsLeaveNothingBehind) {
         const Bytes& farewell = farewells[n % 4];
         client.send(std::span(farewell).first(farewell.size() - (n % 8 > 3 ? n % 4 : 0)));
     }
+    ASSERT_TRUE(eventually(isAlone));
     holdAndPing();
     ASSERT_TRUE(eventually(isAlone));
     EXPECT_EQ(prober.ask("descriptors"), descriptors);

@@ -21,7 +21,7 @@
 namespace vox_link {
 namespace {
 
-constexpr unsigned kClientsPerTurn = 64;
+constexpr unsigned kClientsPerTurn = 16;
 constexpr std::chrono::milliseconds kPause(100);
 // Out of descriptors: clients that try again at once must not keep us busy.
 constexpr unsigned kRefusedBeforePause = 64;

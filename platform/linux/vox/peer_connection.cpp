@@ -127,6 +127,8 @@ void peer_connection::open(int fd) {
     }
     credentials_ = credentials_of(fd);
     fd_ = fd;
+    if (user_)
+        turns_ = user_->turns_on(queue());
     hold();
     if (const int error = watch_.start(fd, EPOLLIN | EPOLLRDHUP, queue().get()); error != 0) {
         unhold();

@@ -38,6 +38,7 @@
 namespace vox_link {
 
 class send_turn;
+class user_turns;
 
 // Where a peer connection gets its socket from.
 struct peer_origin {
@@ -78,6 +79,8 @@ class peer_connection final : public connection, counted_client, idle_participan
 
     // Writes what a turn of the calling thread had put together.
     void flush_turn();
+    // Reads, and writes what waited for room. On the target queue.
+    void take_turn();
 
     // A tap's own end: sending fails.
     [[nodiscard]] bool is_tap() const noexcept { return origin_.tap; }
@@ -97,6 +100,7 @@ class peer_connection final : public connection, counted_client, idle_participan
     void descriptor_gone() noexcept override;
 
   private:
+    struct turn_budget;
     // Of what the peer sends: its hello, then messages, or none from a tap or its service.
     enum class stage : std::uint8_t { hello, messages, tap };
     struct waiting_barrier {
@@ -132,7 +136,7 @@ class peer_connection final : public connection, counted_client, idle_participan
     void handle_events();
     void read_turn() PLR_ON(queue_role_);
     [[nodiscard]] bool may_deliver() const noexcept { return !is_ending() && !is_suspended(); }
-    [[nodiscard]] bool deliver_frames(send_turn& sends, unsigned& budget) PLR_ON(queue_role_);
+    [[nodiscard]] bool deliver_frames(send_turn& sends, turn_budget& budget) PLR_ON(queue_role_);
     [[nodiscard]] bool receive(std::span<std::uint8_t> memory) PLR_ON(queue_role_);
     void handle(const frame& arrived) PLR_ON(queue_role_);
     void handle_hello(const frame& arrived) PLR_ON(queue_role_);
@@ -238,6 +242,11 @@ class peer_connection final : public connection, counted_client, idle_participan
     tapped_client tapped_;
     const std::shared_ptr<user_account> user_;  // who pays; null unless accepted
     ucred credentials_ PLR_GUARDED_BY(lock_) = {-1, static_cast<uid_t>(-1), static_cast<gid_t>(-1)};
+
+    // The line of its user; null unless accepted. Fixed when the socket is watched.
+    std::shared_ptr<user_turns> turns_;
+    bool in_line_ PLR_GUARDED_BY(queue_role_) = false;
+    bool writable_ PLR_GUARDED_BY(queue_role_) = false;  // since the last turn
 
     // Receiving.
     frame_reader reader_ PLR_GUARDED_BY(queue_role_);

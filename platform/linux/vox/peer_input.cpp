@@ -14,15 +14,31 @@
 #include "platform/linux/vox/request.h"
 #include "platform/linux/vox/send_turn.h"
 #include "platform/linux/vox/socket_io.h"
+#include "platform/linux/vox/user_turns.h"
 
 namespace vox_link {
 namespace {
 
-// A turn ends after so much, so that other work of the queue gets its turn.
-constexpr unsigned kFramesPerTurn = 256;
-constexpr unsigned kReadsPerTurn = 4;
+constexpr unsigned kFramesPerLook = 16;         // at the clock
+constexpr std::int64_t kLongestTurn = 500'000;  // ns
 
 }  // namespace
+
+// A turn ends after so much, so that other work of the queue gets its turn.
+struct peer_connection::turn_budget {
+    unsigned frames = 256;
+    unsigned reads = 4;
+    std::int64_t first_look = 0;  // ns; 0: none yet
+
+    void spend_frame() noexcept {
+        if (--frames % kFramesPerLook != 0)
+            return;
+        const std::int64_t now = dispatch::time::now().nanoseconds();
+        first_look = first_look == 0 ? now : first_look;
+        if (now - first_look > kLongestTurn)
+            frames = 0;
+    }
+};
 
 void peer_connection::handle_events() {
     queue_role_.entered();
@@ -35,7 +51,26 @@ void peer_connection::handle_events() {
         readable_ = true;
     if ((events & (EPOLLRDHUP | EPOLLHUP | EPOLLERR)) != 0)
         hung_up_ = true;
-    if ((events & (EPOLLOUT | EPOLLHUP | EPOLLERR)) != 0) {
+    if ((events & (EPOLLOUT | EPOLLHUP | EPOLLERR)) != 0)
+        writable_ = true;
+    turn();
+}
+
+void peer_connection::turn() {
+    if (in_line_)
+        return;
+    if (turns_ && !turns_->may_go(*this))
+        in_line_ = true;
+    else
+        take_turn();
+}
+
+void peer_connection::take_turn() {
+    queue_role_.entered();
+    in_line_ = false;
+    if (is_ending())
+        return;
+    if (std::exchange(writable_, false)) {
         if (stage_ == stage::tap && tapped_.hub()) [[unlikely]]
             unblock_tap();
         else
@@ -43,10 +78,6 @@ void peer_connection::handle_events() {
     }
     if (may_deliver())
         read_turn();
-}
-
-void peer_connection::turn() {
-    read_turn();
 }
 
 // Hot path: bench/vox_cases.h.
@@ -57,26 +88,25 @@ void peer_connection::read_turn() {
         return;
     send_turn sends(queue().get());
     const read_memory memory;
-    unsigned frames = kFramesPerTurn;
-    unsigned reads = kReadsPerTurn;
-    while (deliver_frames(sends, frames) && reads > 0 && receive(memory.bytes()))
-        --reads;
+    turn_budget budget;
+    while (deliver_frames(sends, budget) && budget.reads > 0 && receive(memory.bytes()))
+        --budget.reads;
     if (stage_ == stage::messages)
         tapped_.opened();
     reader_.keep();
     undelivered_.store(reader_.in_frame(), std::memory_order_relaxed);
     if (!count_partial() || !may_deliver())
         return;
-    if (frames == 0 || reads == 0)
+    if (budget.frames == 0 || budget.reads == 0)
         schedule();
     else
         limit_incomplete_frame();
 }
 
 // Returns true when all complete frames were delivered and more bytes are wanted.
-bool peer_connection::deliver_frames(send_turn& sends, unsigned& budget) {
+bool peer_connection::deliver_frames(send_turn& sends, turn_budget& budget) {
     while (may_deliver()) {
-        if (budget == 0)
+        if (budget.frames == 0)
             return false;
         frame arrived;
         switch (reader_.next(arrived)) {
@@ -88,7 +118,7 @@ bool peer_connection::deliver_frames(send_turn& sends, unsigned& budget) {
             case frame_reader::outcome::frame:
                 break;
         }
-        --budget;
+        budget.spend_frame();
         incomplete_since_ = 0;
         sends.set_more(reader_.has_next());
         handle(arrived);

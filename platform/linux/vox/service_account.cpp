@@ -1,5 +1,7 @@
 #include "platform/linux/vox/service_account.h"
 
+#include "platform/linux/vox/user_turns.h"
+
 namespace vox_link {
 
 // ---- One user ------------------------------------------------------------------------
@@ -9,6 +11,16 @@ user_account::user_account(std::shared_ptr<service_account> of, uid_t user) noex
 
 user_account::~user_account() {
     service_->forget(user_);
+}
+
+std::shared_ptr<user_turns> user_account::turns_on(const dispatch::queue& queue) {
+    const lock_guard guard(service_->lock_);
+    std::shared_ptr<user_turns> turns = turns_.lock();
+    if (!turns || !turns->is_on(queue)) {
+        turns = std::make_shared<user_turns>(queue);
+        turns_ = turns;
+    }
+    return turns;
 }
 
 limit_hit user_account::limit(cost of) const noexcept {

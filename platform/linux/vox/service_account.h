@@ -11,6 +11,7 @@
 #include <unordered_set>
 #include <utility>
 
+#include "dispatch/queue.h"
 #include "platform/linux/vox/lock.h"
 #include "vox/limits.h"
 #include "vox/listener.h"
@@ -46,6 +47,7 @@ struct limit_hit {
 };
 
 class service_account;
+class user_turns;
 
 // One user of one listener. Lives as long as a client's place or anything that
 // is charged to it: whoever charges holds a pointer.
@@ -67,13 +69,17 @@ class user_account {
     }
     [[nodiscard]] limit_hit limit(cost of) const noexcept;
     [[nodiscard]] service_account& service() const noexcept { return *service_; }
+    // Where the user's clients take turns. One a queue, as long as clients do not
+    // alternate between queues.
+    [[nodiscard]] std::shared_ptr<user_turns> turns_on(const dispatch::queue& queue);
 
   private:
     friend class service_account;
     const std::shared_ptr<service_account> service_;
     const uid_t user_;
     std::array<std::atomic<std::uint64_t>, kCosts> used_{};
-    std::uint32_t connections_ = 0;  // under the service's lock
+    std::uint32_t connections_ = 0;    // under the service's lock
+    std::weak_ptr<user_turns> turns_;  // under the service's lock; those made last
 };
 
 // A client that is asked for its counts when somebody looks.
