@@ -56,6 +56,7 @@ TIMER_SERVICE = "our timer service"
 SPDLOG = "spdlog"
 BOOST_LOG = "Boost.Log"
 LOG4CPLUS = "log4cplus"
+REMOTE = "ours, into another process"
 EMPTY_LOOP = "the loop alone"
 
 
@@ -121,7 +122,8 @@ def fanout():
 
 
 def log():
-    programs = {OURS: "log_pelorin", SPDLOG: "log_spdlog", BOOST_LOG: "log_boost", LOG4CPLUS: "log_log4cplus"}
+    programs = {OURS: "log_pelorin", SPDLOG: "log_spdlog", BOOST_LOG: "log_boost", LOG4CPLUS: "log_log4cplus",
+                REMOTE: "log_remote"}
 
     def cells(key, *arguments):
         return {peer: Cell(program, arguments, key) for peer, program in programs.items()}

@@ -20,7 +20,7 @@ bool RemoteLogBuffer::add(vox::dict&& message) {
     added_.push_back({std::move(message), bytes, 0});
     ++held_;
     bytes_ += bytes;
-    return !std::exchange(isAwake_, true);
+    return !std::exchange(isAwake_, true) || added_.size() == kPromptMessages;
 }
 
 // One message always fits, whatever its size.
@@ -51,18 +51,20 @@ std::uint64_t RemoteLogBuffer::dropped() const {
     return dropped_;
 }
 
-void RemoteLogBuffer::collect() {
+bool RemoteLogBuffer::collect(bool willLookAgain) {
     {
         const detail::BriefLock guard(lock_);
         std::swap(added_, collected_);
-        isAwake_ = false;
+        isAwake_ = willLookAgain || !collected_.empty();
     }
+    const bool anything = !collected_.empty();
     for (Entry& entry : collected_) {
         if (!entry.message)
             entry.message = remote_log::noteOf(entry.dropped, "too many were waiting");
         messages_.push_back(std::move(entry));
     }
     collected_.clear();
+    return anything;
 }
 
 void RemoteLogBuffer::advance() {

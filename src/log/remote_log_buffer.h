@@ -18,14 +18,16 @@ namespace plr {
 
 class RemoteLogBuffer {
   public:
-    // Whether the queue has to be woken to collect().
+    // Whether the queue has to be woken to collect(), now.
     [[nodiscard]] bool add(vox::dict&& message);
     void limit(std::size_t messages, std::size_t bytes);
     [[nodiscard]] std::size_t held() const;
     [[nodiscard]] std::uint64_t dropped() const;
 
-    // Takes in what was added.
-    void collect();
+    // Takes in what was added; false when there was nothing. The queue has to look
+    // again soon in the one case, and when it `willLookAgain` anyhow, so that
+    // messages that follow each other wake nobody one by one.
+    bool collect(bool willLookAgain);
 
     [[nodiscard]] bool hasUnsent() const noexcept { return sent_ < messages_.size(); }
     // The first message that is not on its way.
@@ -52,6 +54,7 @@ class RemoteLogBuffer {
   private:
     static constexpr std::size_t kMostSent = 4096;
     static constexpr std::size_t kMostSentBytes = std::size_t{1} << 20;
+    static constexpr std::size_t kPromptMessages = 256;
 
     struct Entry {
         vox::dict message;          // null: a note, yet to be made
@@ -70,7 +73,7 @@ class RemoteLogBuffer {
     std::size_t bytes_ PLR_GUARDED_BY(lock_) = 0;  // of all these
     std::uint64_t dropped_ PLR_GUARDED_BY(lock_) = 0;
     std::uint64_t gap_ PLR_GUARDED_BY(lock_) = 0;  // dropped, and no note tells it yet
-    bool isAwake_ PLR_GUARDED_BY(lock_) = false;   // collect() will be called
+    bool isAwake_ PLR_GUARDED_BY(lock_) = false;   // collect() will be called soon
 
     // The queue's.
     std::vector<Entry> collected_;  // empty, with room

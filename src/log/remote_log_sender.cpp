@@ -1,6 +1,7 @@
 #include "src/log/remote_log_sender.h"
 
 #include <cerrno>
+#include <chrono>
 #include <utility>
 
 #include "plr/concurrency/while_alive.h"
@@ -8,6 +9,12 @@
 #include "src/log/remote_log_format.h"
 
 namespace plr {
+namespace {
+
+// Messages that follow within this time are sent together.
+constexpr std::chrono::microseconds kLinger(100);
+
+}  // namespace
 
 // Runs `work` with this sender, and whether the server replied.
 template <class Work>
@@ -47,8 +54,20 @@ void RemoteLogSender::levelCame() {
     ask();
 }
 
+void RemoteLogSender::collect() {
+    if (!buffer_.collect(willLookAgain_) || std::exchange(willLookAgain_, true))
+        return;
+    queue_.queue().after(
+        dispatch::time::after(kLinger),
+        dispatch::block<void()>(whileAlive(weak_from_this(), [](RemoteLogSender& self) {
+            self.assertCurrent();
+            self.willLookAgain_ = false;
+            self.send();
+        })));
+}
+
 void RemoteLogSender::send() {
-    buffer_.collect();
+    collect();
     while (server_ && buffer_.hasUnsent() && !buffer_.enoughSent())
         if (!sendNext())
             return;
@@ -56,7 +75,7 @@ void RemoteLogSender::send() {
 }
 
 void RemoteLogSender::sendTheRest() {
-    buffer_.collect();
+    collect();
     while (server_ && buffer_.hasUnsent())
         if (!sendNext())
             return;

@@ -52,6 +52,7 @@ class RemoteLogSender : public std::enable_shared_from_this<RemoteLogSender> {
         dispatch::group_session session;
     };
 
+    void collect() PLR_ON(queue_);
     [[nodiscard]] bool sendNext() PLR_ON(queue_);
     void ask() PLR_ON(queue_);
     void askServer() PLR_ON(queue_);
@@ -69,6 +70,8 @@ class RemoteLogSender : public std::enable_shared_from_this<RemoteLogSender> {
     = Confirms::Unknown;
     bool isAsking_ PLR_CONFINED_TO(queue_)
     = false;
+    bool willLookAgain_ PLR_CONFINED_TO(queue_)
+    = false;  // a timer is set
     std::deque<Flush> flushes_ PLR_CONFINED_TO(queue_);
 };
 
