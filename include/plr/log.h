@@ -1,7 +1,8 @@
 #pragma once
 
 // Logging: domains and levels, loggers, the server and its writers. Format
-// strings of {fmt}, which their users install, are in plr/log/fmt.h.
+// strings of {fmt}, which their users install, are in plr/log/fmt.h; logging from
+// one process into another, in plr/log/vox_logger.h and plr/log/vox_log_server.h.
 #include "plr/log/console_log_writer.h"
 #include "plr/log/crash_drain.h"
 #include "plr/log/file_log_writer.h"

@@ -4,4 +4,6 @@
 #include "plr/concurrency.h"
 #include "plr/ipc.h"
 #include "plr/log.h"
+#include "plr/log/vox_log_server.h"
+#include "plr/log/vox_logger.h"
 #include "plr/rest.h"
