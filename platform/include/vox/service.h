@@ -25,15 +25,18 @@ PLR_EXPORT uint64_t vox_transaction_count(void);
 // Opts in to ending when idle: once no transaction is open, no request of a client
 // is unanswered, no request of this process waits for its reply, and no connection
 // has anything to read, to deliver or to write, and all that for `idle_ms`
-// milliseconds, `leave` runs on `queue`, once; it ends the process.
+// milliseconds (up to half as long again), `leave` runs on `queue`, once; it ends the
+// process. Taps (vox/tap.h) keep nobody.
 //
-// Nothing is lost on the way. First the connections stop receiving: what a peer
-// sends from then on fails at the peer, who learns it (INTERRUPTED; the next
-// connection starts the service again where the service manager holds the socket).
-// What came before that is delivered; requests among it are answered, transactions that
-// it begins are waited for. Then `leave` runs. Clients that were not accepted yet wait for the
-// next process in a socket of the service manager; one of this process's own sees
-// INTERRUPTED. STOPPING=1 is told before `leave`.
+// Nothing is lost on the way. First the listeners take no more clients: those wait for the
+// next process in a socket of the service manager; a socket of this process's own is
+// withdrawn, and who had connected to it is served still. Then the connections stop
+// receiving, those of clients first: what a peer sends from then on fails at the peer,
+// who learns it (INTERRUPTED; the next connection starts the service again where the
+// service manager holds the socket). What came before that is delivered; requests among
+// it are answered, and their askers wait for that; transactions that it begins are waited
+// for. Connections that this process made work until then. STOPPING=1 is told, and `leave`
+// runs. What the process begins by itself at that very moment is cut off.
 //
 // Connected clients alone do not keep a process: hold a transaction for those that
 // must not be disconnected. A suspended connection with something to read does.
