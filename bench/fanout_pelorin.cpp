@@ -30,7 +30,7 @@ void serve(bench::Event& listening) {
     const auto server = plr::rest::RestServerExample::create(queue, kService);
     server->registerResource("/connections", std::make_shared<plr::rest::ConnectionRestResource>());
     server->registerResource("/radio", std::make_shared<plr::rest::PropertyRestResource>(true));
-    server->connect(vox::connection::create_listener(kService));
+    server->connect(vox::listener::create(kService));
     listening.signal();
     sleepForEver();
 }

@@ -195,6 +195,7 @@ pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
     include/plr/ipc/array.h
     include/plr/ipc/auto_reply.h
     include/plr/ipc/connection.h
+    include/plr/ipc/listener.h
     include/plr/ipc/dict.h
     include/plr/ipc/object.h
     include/plr/ipc/read.h
@@ -202,6 +203,7 @@ pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
   SOURCES
     src/ipc/auto_reply.cpp
     src/ipc/connection.cpp
+    src/ipc/listener.cpp
     src/ipc/object.cpp
     src/ipc/object_to_string.cpp
     src/ipc/read.cpp)

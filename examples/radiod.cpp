@@ -58,17 +58,14 @@ bool parse(int argc, char** argv, Options& options) {
     return argc % 2 == 1 && !options.modem.empty();
 }
 
-vox::connection createListener(const std::string& groupName) {
-    auto listener = vox::connection::create_listener(kService);
+vox::listener createListener(const std::string& groupName) {
+    const auto listener = vox::listener::create(kService);
     if (groupName.empty())
         return listener;
     const group* const found = ::getgrnam(groupName.c_str());  // NOLINT(concurrency-mt-unsafe)
     if (!found)
         throw std::invalid_argument("there is no group " + groupName);
-    vox_policy_t policy = {};
-    policy.groups = &found->gr_gid;
-    policy.group_count = 1;
-    vox_listener_set_policy(listener.get(), &policy);
+    listener.set_policy({.users = {}, .groups = {found->gr_gid}, .everybody = false});
     return listener;
 }
 

@@ -10,7 +10,7 @@ int main() {
     server->registerResource("/connections", std::make_shared<plr::rest::ConnectionRestResource>());
     server->registerResource("/radio", std::make_shared<plr::rest::PropertyRestResource>(true));
     // Named listeners serve other processes; this one is for whom we tell.
-    const auto listener = vox::connection::create_anonymous_listener();
+    const auto listener = vox::listener::create_anonymous();
     server->connect(listener);
 
     const auto queue = dispatch::queue::create("client");

@@ -6,6 +6,7 @@
 #include "plr/ipc/auto_reply.h"
 #include "plr/ipc/connection.h"
 #include "plr/ipc/dict.h"
+#include "plr/ipc/listener.h"
 #include "plr/ipc/object.h"
 #include "plr/ipc/read.h"
 #include "plr/ipc/result.h"

@@ -154,7 +154,7 @@ class Endpoints : public testing::Test {
         drain(ending);
         server_.reset();
     }
-    static vox::connection anonymous() { return vox::connection::create_anonymous_listener(); }
+    static vox::connection anonymous() { return vox::listener::create_anonymous(); }
     [[nodiscard]] vox::connection connect() const {
         return vox::endpoint::create(listener_).connect();
     }

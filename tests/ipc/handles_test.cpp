@@ -1,11 +1,18 @@
 #include <gtest/gtest.h>
+#include <unistd.h>
 
+#include <chrono>
+#include <cstdint>
 #include <string>
 #include <utility>
 
 #include "plr/ipc.h"
+#include "support/waiting.h"
 
 namespace {
+
+using namespace std::chrono_literals;
+using plr::test::Event;
 
 TEST(Object, IsNeverEmpty) {
     vox::object moved = vox::int64(1);
@@ -84,6 +91,50 @@ TEST(Connection, TheNullObjectSendsNothing) {
     EXPECT_EQ(queue.sync([&] { return replies; }), 1);
     EXPECT_FALSE(vox::endpoint().connect());
     EXPECT_EQ(none.statistics().messages_sent, 0U);
+    EXPECT_EQ(none.peer().pid, -1);
+    EXPECT_FALSE(
+        none.send_request({}, 1ms, queue, dispatch::block<void(vox::object)>([](auto&&) {})));
+    EXPECT_FALSE(vox::request().cancel());
+    vox::listener().set_policy({});
+    EXPECT_EQ(vox::listener().listener_statistics().clients, 0U);
+}
+
+TEST(Connection, GivesRequestsUpInTimeAndOnDemand) {
+    const auto [asker, answerer] = vox::connection::create_pair();
+    Event asked;
+    Event given;
+    answerer.set_event_handler([&asked, &given](const vox::object& event) {
+        if (const vox::dict request(event); request) {
+            EXPECT_FALSE(vox::is_cancelled(request));
+            // Kept by its own handler, which goes when it is given up.
+            EXPECT_TRUE(vox::set_cancel_handler(request, dispatch::block<void()>([request, &given] {
+                                                    EXPECT_TRUE(vox::is_cancelled(request));
+                                                    given.signal();
+                                                })));
+            asked.signal();
+        }
+    });
+    asker.resume();
+    answerer.resume();
+    EXPECT_EQ(asker.peer().pid, ::getpid());
+    EXPECT_EQ(answerer.peer().uid, ::getuid());
+    const auto queue = dispatch::queue::create("replies");
+    Event over;
+    std::int64_t code = 0;  // touched on the queue only
+    const dispatch::block<void(vox::object)> handler([&](const vox::object& reply) {
+        code = vox_error_get_code(reply.get());
+        over.signal();
+    });
+    EXPECT_TRUE(asker.send_request(vox::dict::create(), 1ms, queue, handler));
+    EXPECT_TRUE(over.wait() && asked.wait() && given.wait());
+    EXPECT_EQ(queue.sync([&] { return code; }), VOX_ERROR_REQUEST_TIMED_OUT);
+    const vox::request patient = asker.send_request(vox::dict::create(), 24h, queue, handler);
+    EXPECT_TRUE(asked.wait());
+    EXPECT_TRUE(patient.cancel());
+    EXPECT_TRUE(over.wait() && given.wait());
+    EXPECT_EQ(queue.sync([&] { return code; }), VOX_ERROR_REQUEST_CANCELLED);
+    EXPECT_FALSE(patient.cancel());
+    asker.cancel();
 }
 
 }  // namespace

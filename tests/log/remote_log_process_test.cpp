@@ -103,7 +103,7 @@ class LineWriter : public plr::LogWriter {
     config["kDomainLogLevels"] = levels;
     log->updateConfig(config);
     const auto remote = plr::VoxLogServer::create(log, "remote", "remote");
-    remote->startListeningOn(vox::connection::create_listener(kName));
+    remote->startListeningOn(vox::listener::create(kName));
     for (;;)
         ::pause();
 }

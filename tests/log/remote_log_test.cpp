@@ -92,7 +92,7 @@ class RemoteLog : public LogFixture {
         return all;
     }
 
-    const vox::connection listener_ = vox::connection::create_anonymous_listener();
+    const vox::connection listener_ = vox::listener::create_anonymous();
     std::shared_ptr<PickyServer> remote_ = PickyServer::create(server_);
 };
 
@@ -258,7 +258,7 @@ TEST_F(RemoteLog, SaysWhatBecomesOfItsListener) {
                 ElementsAre("I remote Server error: the connection was cancelled"));
     remote_->startListeningOn(vox::connection());
     EXPECT_FALSE(remote_->getEndpoint());
-    remote_->startListeningOn(vox::connection::create_anonymous_listener());
+    remote_->startListeningOn(vox::listener::create_anonymous());
     RawClient client(*remote_);
     client.send(checkIn("c", "calls"));
     client.settle();

@@ -47,7 +47,7 @@ class Log : public plr::rest::RestResource {
         plr::rest::RestServerExample::create(dispatch::queue::create("service"), kName);
     for (const char* path : {"/connections", "/kept", "/sinks", "/log"})
         server->registerResource(path, log);
-    server->connect(vox::connection::create_listener(kName));
+    server->connect(vox::listener::create(kName));
     serviceIsReady();
 }
 

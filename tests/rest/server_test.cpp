@@ -1,6 +1,7 @@
 #include "plr/rest/rest_server_example.h"
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <functional>
 #include <memory>
@@ -40,6 +41,7 @@ class Scripted : public RestResource {
 // Answers what it sees of the author.
 std::shared_ptr<RestResourceBase> author() {
     return std::make_shared<Scripted>([](RestResourceContext& context) {
+        EXPECT_EQ(context.getAuthorCredentials().pid, ::getpid());
         return context.sendReplyWithValue(
             vox::string("%s, says %s", context.getAuthorResource() ? "known" : "unknown",
                         context.getRestAuthor().to_string().c_str()));
@@ -96,7 +98,7 @@ TEST(RestServers, KnowAuthorsThroughTheFirstConnectionsResource) {
         const auto server = RestServerExample::create(dispatch::queue::create("server"), "");
         EXPECT_TRUE(server->registerResource(row.path, row.resource));
         EXPECT_TRUE(server->registerResource("/author", author()));
-        const auto listener = vox::connection::create_anonymous_listener();
+        const auto listener = vox::listener::create_anonymous();
         server->connect(listener);
         const RawRestClient client(vox::endpoint::create(listener).connect(), "me");
         client.registerName();
@@ -306,7 +308,7 @@ TEST_F(RestServer, ListensAnewAndTellsOfItsPresentListenersEnd) {
         why = error;
         failed.signal();
     });
-    const auto listener = vox::connection::create_anonymous_listener();
+    const auto listener = vox::listener::create_anonymous();
     rig.server().connect(listener);
     const RawRestClient other(vox::endpoint::create(listener).connect(), "other");
     other.registerName();

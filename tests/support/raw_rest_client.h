@@ -121,7 +121,7 @@ class RawRestClient {
 class RestServerRig {
   public:
     explicit RestServerRig(const vox_limits_t& limits = vox_limits_default())
-        : listener_(vox::connection::create_anonymous_listener(&limits)) {
+        : listener_(vox::listener::create_anonymous(&limits)) {
         add("/connections", std::make_shared<rest::ConnectionRestResource>());
         add("/~drops", drops_);  // the last to be told
     }

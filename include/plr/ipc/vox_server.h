@@ -6,7 +6,7 @@
 #include "dispatch/block.h"
 #include "plr/base/export.h"
 #include "plr/concurrency/shared_synchronizable.h"
-#include "plr/ipc/connection.h"
+#include "plr/ipc/listener.h"
 #include "plr/ipc/vox_server_helper.h"
 
 // A VoxServer owns a listener, accepts or refuses each new client, and delivers

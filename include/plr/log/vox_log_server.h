@@ -13,7 +13,7 @@
 // VoxLogger that connects and checks in gets a proxy there.
 //
 //   const auto remote = plr::VoxLogServer::create(logServer, "remote log", "radio.log");
-//   remote->startListeningOn(vox::connection::create_anonymous_listener());
+//   remote->startListeningOn(vox::listener::create_anonymous());
 //   // remote->getEndpoint() goes to the clients.
 //
 // Owner:   the std::shared_ptr of create(), or of a derived class's. When it goes,

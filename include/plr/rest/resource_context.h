@@ -24,6 +24,10 @@ class PLR_EXPORT RestResourceContext {
     // The connection that the message came on; the null object for a message
     // that came on none.
     [[nodiscard]] virtual vox::connection getRawAuthorConnection() const = 0;
+    // Who that is, as the kernel says; never what "a" says. All -1 without one.
+    [[nodiscard]] vox::credentials getAuthorCredentials() const {
+        return getRawAuthorConnection().peer();
+    }
 
     // The message's "a", "o" and "v", null when absent.
     [[nodiscard]] virtual vox::object getRestAuthor() const = 0;

@@ -13,7 +13,7 @@
 //   auto server = RestServerExample::create(queue, "net.example.radio");
 //   server->registerResource("/connections", std::make_shared<ConnectionRestResource>());
 //   server->registerResource("/radio", std::make_shared<PropertyRestResource>(true));
-//   server->connect(vox::connection::create_listener("net.example.radio"));
+//   server->connect(vox::listener::create("net.example.radio"));
 //
 // Owner:   a std::shared_ptr from create(). Letting go of it stops listening;
 //          clients that are connected are ignored from then on.

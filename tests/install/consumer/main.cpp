@@ -14,7 +14,7 @@ bool serviceWorks() {
         plr::rest::RestServerExample::create(dispatch::queue::create("service"), "");
     server->registerResource("/connections", std::make_shared<plr::rest::ConnectionRestResource>());
     server->registerResource("/radio", std::make_shared<plr::rest::PropertyRestResource>(true));
-    const auto listener = vox::connection::create_anonymous_listener();
+    const auto listener = vox::listener::create_anonymous();
     server->connect(listener);
 
     const auto queue = dispatch::queue::create("client");
