@@ -119,6 +119,8 @@ void peer_connection::connect_failed(int error, const std::string& why) {
 }
 
 void peer_connection::open(int fd) {
+    // The service's lock, which this takes, is not taken under a connection's.
+    std::shared_ptr<user_turns> turns = user_ ? user_->turns_on(queue()) : nullptr;
     const lock_guard guard(lock_);
     origin_.fd = -1;
     if (abandoned_) {
@@ -127,8 +129,7 @@ void peer_connection::open(int fd) {
     }
     credentials_ = credentials_of(fd);
     fd_ = fd;
-    if (user_)
-        turns_ = user_->turns_on(queue());
+    turns_ = std::move(turns);
     hold();
     if (const int error = watch_.start(fd, EPOLLIN | EPOLLRDHUP, queue().get()); error != 0) {
         unhold();
