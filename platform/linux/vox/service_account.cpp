@@ -111,12 +111,12 @@ void service_account::forget(uid_t user) noexcept {
 }
 
 void service_account::enter(const counted_client& client) {
-    const lock_guard guard(lock_);
+    const lock_guard guard(clients_lock_);
     clients_.insert(&client);
 }
 
 void service_account::leave(const counted_client& client) {
-    const lock_guard guard(lock_);
+    const lock_guard guard(clients_lock_);
     clients_.erase(&client);
     client.add_counts(past_);
 }
@@ -127,10 +127,14 @@ vox_listener_statistics_t service_account::statistics() const {
     const auto counted = [this](event of) {
         return events_[static_cast<std::size_t>(of)].load(std::memory_order_relaxed);
     };
+    vox_listener_statistics_t sums;
+    {
+        const lock_guard guard(clients_lock_);
+        sums = past_;
+        for (const counted_client* client : clients_)
+            client->add_counts(sums);
+    }
     const lock_guard guard(lock_);
-    vox_listener_statistics_t sums = past_;
-    for (const counted_client* client : clients_)
-        client->add_counts(sums);
     sums.clients = connections_;
     sums.clients_accepted = counted(event::accepted);
     sums.refused_by_policy = counted(event::refused_by_policy);

@@ -20,8 +20,9 @@
 // too far.
 //
 // Owner:   the listener, its clients and every user's account share it.
-// Threads: any. Clients charge what they cost with relaxed atomics; the lock is for
-//          clients that come and go, and for those who look.
+// Threads: any. Clients charge what they cost with relaxed atomics; the locks are for
+//          clients that come and go, and for those who look. A client's own lock comes
+//          behind the one on the clients and before the other.
 namespace vox_link {
 
 // What is limited for all clients of one user together.
@@ -149,8 +150,9 @@ class service_account : public std::enable_shared_from_this<service_account> {
     mutable mutex lock_;
     std::uint32_t connections_ PLR_GUARDED_BY(lock_) = 0;
     std::unordered_map<uid_t, std::weak_ptr<user_account>> users_ PLR_GUARDED_BY(lock_);
-    std::unordered_set<const counted_client*> clients_ PLR_GUARDED_BY(lock_);
-    vox_listener_statistics_t past_ PLR_GUARDED_BY(lock_) = {};  // of clients that left
+    mutable mutex clients_lock_;
+    std::unordered_set<const counted_client*> clients_ PLR_GUARDED_BY(clients_lock_);
+    vox_listener_statistics_t past_ PLR_GUARDED_BY(clients_lock_) = {};  // of those that left
 };
 
 }  // namespace vox_link
