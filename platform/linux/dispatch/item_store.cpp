@@ -14,7 +14,7 @@ namespace {
 // were discarded.
 struct slabs {
     static constexpr std::size_t kMagazine = 63;
-    static constexpr std::size_t kDepotMagazines = 256;  // 1 MiB of nodes
+    [[maybe_unused]] static constexpr std::size_t kDepotMagazines = 256;  // 1 MiB of nodes
 
     struct alignas(4096) slab {
         std::atomic<unsigned> discarded{0};

@@ -27,7 +27,7 @@ struct timer_memory;
 // time-out.
 struct timer_store {
     static constexpr std::size_t kMagazine = 31;
-    static constexpr std::size_t kDepotMagazines = 64;
+    [[maybe_unused]] static constexpr std::size_t kDepotMagazines = 64;
 
     [[maybe_unused]] static void fill(std::array<timer_memory*, kMagazine>& places);
     [[maybe_unused]] static void discard(timer_memory* memory) noexcept;
