@@ -140,6 +140,7 @@ std::vector<passed_name> read_passed_names(pid_t self, const char* pid, const ch
     if (!why.empty())
         return {};
     std::vector<passed_name> found;
+    found.reserve(parts.size());
     for (std::string& name : parts)
         found.push_back({std::move(name), kFirst + static_cast<int>(found.size())});
     return found;
