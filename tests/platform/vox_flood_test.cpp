@@ -110,7 +110,9 @@ class Attacker {
   public:
     Attacker(const Attack& attack, const std::string& path) : attack_(attack), path_(path) {}
 
-    void step() {
+    // Returns whether there was anything to do.
+    bool step() {
+        moved_ = false;
         if (fd_ < 0) {
             fd_ = connectTo(path_);
             waiting_ = hello();
@@ -118,6 +120,7 @@ class Attacker {
         } else if (!write() || !read() || (!attack_.what && waiting_.empty())) {
             ::close(std::exchange(fd_, -1));
         }
+        return moved_;
     }
 
   private:
@@ -134,6 +137,7 @@ class Attacker {
             fd_, {&piece, 1}, withFiles ? std::span<const int>(files) : std::span<const int>());
         waiting_.erase(waiting_.begin(),
                        waiting_.begin() + static_cast<std::ptrdiff_t>(sent.bytes));
+        moved_ = sent.bytes > 0;
         if (withFiles && sent.bytes == 0)
             waiting_.clear();
         return sent.error == 0 || sent.error == EAGAIN || sent.error == ETOOMANYREFS;
@@ -146,10 +150,11 @@ class Attacker {
         }
     }
     // Also tells when the service has closed.
-    [[nodiscard]] bool read() const {
+    [[nodiscard]] bool read() {
         static std::array<std::uint8_t, 1u << 16> memory;
         const ssize_t got = ::recv(fd_, memory.data(), memory.size(),
                                    MSG_DONTWAIT | (attack_.reads ? 0 : MSG_PEEK));
+        moved_ = moved_ || (got > 0 && attack_.reads);
         return got > 0 || (got < 0 && errno == EAGAIN);
     }
 
@@ -158,10 +163,12 @@ class Attacker {
     int fd_ = -1;
     Bytes waiting_;
     bool begun_ = false;
+    bool moved_ = false;
     std::uint64_t id_ = 0;
 };
 
-// A process of the greedy user, which makes every other of the attacks.
+// A process of the greedy user, which makes every other of the attacks. It waits
+// when it can do nothing: the processors are the kernel's to share.
 [[noreturn]] void attack(const std::string& path, std::size_t first) {
     if (::setgroups(0, nullptr) != 0 || ::setresgid(kGreedy, kGreedy, kGreedy) != 0 ||
         ::setresuid(kGreedy, kGreedy, kGreedy) != 0)
@@ -173,9 +180,13 @@ class Attacker {
             attackers.emplace_back(kAttacks[i], path);
     std::puts("ready");
     std::fflush(stdout);
-    for (;;)
+    for (;;) {
+        bool moved = false;
         for (Attacker& each : attackers)
-            each.step();
+            moved = each.step() || moved;
+        if (!moved)
+            ::usleep(1000);
+    }
 }
 
 // ---- The user who wants little ----------------------------------------------------------
@@ -253,6 +264,7 @@ int main(int count, char** arguments) {
     if (count == 4 && words[1] == "attack")
         attack(words[2], std::stoul(words[3]));
     if (count == 2 && words[1] == "service") {
+        limitDescriptors(2000);
         const PressedService served(limits(), true);
         serviceIsReady();
     }
