@@ -14,6 +14,7 @@ import statistics
 import subprocess
 import sys
 import tempfile
+from dataclasses import replace
 from pathlib import Path
 
 import suites
@@ -24,7 +25,7 @@ BEGIN, END = "<!-- bench/run: begin -->", "<!-- bench/run: end -->"
 
 def run_program(programs, cell, folder):
     """The values that the cell's program prints. Raises RuntimeError when it fails."""
-    command = [str(programs / cell.program), *cell.arguments]
+    command = [str((cell.folder or programs) / cell.program), *cell.arguments]
     # A session of its own: what the program starts ends with it.
     process = subprocess.Popen(command, stdout=subprocess.PIPE, stderr=subprocess.PIPE, text=True,
                                env={**os.environ, "TMPDIR": folder}, start_new_session=True)
@@ -108,10 +109,19 @@ def write_markdown(file, text):
     file.write_text(text, encoding="utf-8")
 
 
+def against(measurement, revision, folder):
+    """Ours, and ours of the older revision whose programs are in `folder`."""
+    ours = measurement.cells[suites.OURS]
+    cells = {suites.OURS: ours, f"Pelorin {revision}": replace(ours, folder=folder)}
+    return replace(measurement, cells=cells, bars=())
+
+
 def arguments():
     parser = argparse.ArgumentParser(prog="bench/run")
     parser.add_argument("suites", nargs="*", metavar="suite", help=", ".join(suites.SUITES))
     parser.add_argument("--programs", type=Path, required=True, help=argparse.SUPPRESS)
+    parser.add_argument("--older", type=Path, help=argparse.SUPPRESS)
+    parser.add_argument("--against", metavar="REVISION", help="our own build of it in place of all peers")
     parser.add_argument("--quick", action="store_true", help="2 rounds instead of 5")
     parser.add_argument("--rounds", type=int)
     parser.add_argument("--only", default="", help="only measurements whose title contains this")
@@ -128,12 +138,14 @@ def main():
     rounds = options.rounds or (2 if options.quick else 5)
     chosen = [m for name in options.suites or suites.SUITES for m in suites.SUITES[name]()
               if options.only in m.title]
+    if options.older:
+        chosen = [against(m, options.against, options.older) for m in chosen]
     folder = tempfile.mkdtemp(prefix="pelorin-bench-")
     rows, failures, runs = [], [], {}
 
     def run(number, cell):
         """What one run printed serves all measurements that read it."""
-        key = (number, cell.program, cell.arguments)
+        key = (number, cell.folder, cell.program, cell.arguments)
         if key not in runs:
             runs[key] = run_program(options.programs, cell, folder)
         return runs[key]

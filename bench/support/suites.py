@@ -15,6 +15,7 @@ class Cell:
     arguments: tuple
     key: str
     scale: float = 1.0
+    folder: object = None  # of the program; None for where all others are
 
 
 @dataclass(frozen=True)
