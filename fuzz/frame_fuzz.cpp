@@ -69,7 +69,7 @@ result read(std::span<const std::uint8_t> stream, std::size_t step, std::size_t 
         if (!take_all(reader, taken))
             break;
         reader.keep();
-        require(reader.held() <= std::max<std::size_t>(64u << 10, 2 * at));
+        require(reader.held() <= std::max<std::size_t>(72u << 10, 2 * at));
         require(reader.in_frame() || reader.held() == 0);
     }
     require(taken.descriptors <= descriptors);

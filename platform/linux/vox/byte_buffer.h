@@ -37,6 +37,11 @@ class byte_buffer {
             grow(extra);
         return data_ + size_;
     }
+    // Makes room for `capacity` bytes in all and no more.
+    void reserve(std::size_t capacity) noexcept {
+        if (capacity > capacity_)
+            resize(capacity);
+    }
     // At most capacity(). Shortens as well.
     void set_size(std::size_t size) noexcept { size_ = size; }
     void clear() noexcept { size_ = 0; }
@@ -63,7 +68,9 @@ class byte_buffer {
     [[gnu::noinline]] void grow(std::size_t extra) noexcept {
         const std::size_t needed = size_ + extra;
         const std::size_t doubled = capacity_ < 256 ? 512 : 2 * capacity_;
-        const std::size_t capacity = needed > doubled ? needed : doubled;
+        resize(needed > doubled ? needed : doubled);
+    }
+    void resize(std::size_t capacity) noexcept {
         void* moved = std::realloc(data_, capacity);
         PLR_ASSERT(moved, "out of memory");
         data_ = static_cast<std::uint8_t*>(moved);

@@ -10,11 +10,22 @@ namespace vox_link {
 namespace {
 
 // A frame under way may hold this much before its bytes have arrived.
-constexpr std::size_t kEagerBytes = 64u << 10;
+constexpr std::size_t kEagerBytes = 72u << 10;
 // A rest of at most this many bytes is moved to the scratch memory, so that
 // small frames are always read in big gulps.
 constexpr std::size_t kSmallRest = 4096;
 static_assert(kSmallRest < frame_reader::kLeastScratch);
+
+// Memory of the last big frame of this thread, for its next one. Given back to the
+// allocator with each frame, it would make that return pages to the system and
+// fetch them again (bench/vox_cases.h, one_way_large).
+thread_local vox_wire::byte_buffer spare;
+
+void give_spare(vox_wire::byte_buffer& used) noexcept {
+    if (used.capacity() > kSmallRest && used.capacity() <= kEagerBytes)
+        spare.swap(used);
+    used = {};
+}
 
 }  // namespace
 
@@ -38,7 +49,9 @@ std::span<std::uint8_t> frame_reader::space(std::span<std::uint8_t> scratch) {
     const std::size_t total = kHeaderBytes + header_.length;
     const bool full = kept_.capacity() == rest;
     const std::size_t wanted = std::min(total, std::max(kEagerBytes, 2 * rest));
-    filling_ = kept_.room(full ? wanted - rest : 0);
+    if (full)
+        kept_.reserve(wanted);
+    filling_ = kept_.room(0);
     at_ = kept_.data();
     end_ = at_ + rest;
     return {filling_, std::min(kept_.capacity(), total) - rest};
@@ -120,6 +133,10 @@ void frame_reader::keep() {
         release_taken();
         at_ = end_ = nullptr;
     } else {
+        if (rest > kSmallRest && kept_.capacity() == 0) {
+            kept_.swap(spare);
+            kept_.clear();
+        }
         kept_.append({at_, rest});
         at_ = kept_.data();
         end_ = at_ + rest;
@@ -142,7 +159,7 @@ void frame_reader::clear() noexcept {
 void frame_reader::release_taken() {
     if (left() > 0)
         return;
-    kept_ = {};
+    give_spare(kept_);
     at_ = end_ = nullptr;
     if (next_descriptor_ == descriptors_.size()) {
         std::vector<int>().swap(descriptors_);

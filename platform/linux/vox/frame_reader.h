@@ -18,9 +18,9 @@
 // Owner:   one connection. Descriptors that are held are closed with it.
 // Threads: one at a time.
 // Memory:  nothing while no frame is under way and none waits; a frame under way
-//          holds at most twice the bytes that arrived of it, or 64 KiB, whatever
-//          its header declares. Frames are taken straight from the scratch
-//          memory when they lie there completely.
+//          holds at most twice the bytes that arrived of it, or 72 KiB, whatever
+//          its header declares; each thread keeps memory for one such. Frames are taken straight
+//          from the scratch memory when they lie there completely.
 //
 // Descriptors belong to frames in the order of arrival. More of them than the
 // frames begun so far declare, or fewer at the end of a frame, is an error.
