@@ -67,9 +67,11 @@ class Session {
     }
 
     // Until each side has everything, or the connection has failed; then its end.
-    void run() {
+    // Returns whether it was complete.
+    bool run() {
         EXPECT_TRUE(eventually([this] { return isComplete() || hasFailed(); }));
-        if (!hasFailed()) {
+        const bool complete = !hasFailed();
+        if (complete) {
             useEndpoint();
             vox_connection_cancel(*client_);
         }
@@ -80,6 +82,7 @@ class Session {
         EXPECT_EQ(answer_.all().size(), 1u);
         EXPECT_EQ(unanswered_.all().size(), 1u);
         EXPECT_EQ(barriers_, 1);
+        return complete;
     }
     // What came is the beginning of what was sent, unchanged.
     void expectRightMessages() {
@@ -200,12 +203,29 @@ struct Row {
     *out << row.name;
 }
 
+// Whether nobody is to notice.
+bool passes(const Row& row) {
+    switch (row.fault) {
+        case faults::kOneByte:
+        case EINTR:
+        case EAGAIN:
+        case ECONNABORTED:
+        case ETOOMANYREFS:
+            return true;
+        case ENOBUFS:
+        case ENOMEM:
+            return row.call == Call::send || row.call == Call::accept;
+        default:
+            return false;
+    }
+}
+
 class VoxFaults : public ::testing::TestWithParam<Row> {
   protected:
     static void SetUpTestSuite() {
         plr::setReportHook([](const char*) noexcept {});
         Session first;  // makes what the process has once
-        first.run();
+        EXPECT_TRUE(first.run());
     }
     static void TearDownTestSuite() { plr::setReportHook(nullptr); }
 
@@ -222,7 +242,7 @@ TEST_P(VoxFaults, NeitherCrashNorLeakNorMisleadAnyEnd) {
         faults::arm(row.call, row.fault, n);
         {
             Session session;
-            session.run();
+            EXPECT_TRUE(session.run() || !passes(row));
             came = faults::disarm();
             session.expectRightMessages();
         }
