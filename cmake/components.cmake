@@ -195,8 +195,8 @@ pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
     include/plr/ipc/array.h
     include/plr/ipc/auto_reply.h
     include/plr/ipc/connection.h
-    include/plr/ipc/listener.h
     include/plr/ipc/dict.h
+    include/plr/ipc/listener.h
     include/plr/ipc/object.h
     include/plr/ipc/read.h
     include/plr/ipc/values.h
