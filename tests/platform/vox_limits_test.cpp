@@ -241,7 +241,7 @@ TEST(VoxLimits, OfAUserDropMessagesForAllItsClientsWhenThatIsThePolicy) {
 TEST(VoxLimits, CountWhatWaitsForAHelloAsWell) {
     Stage stage(vox_limits_default());
     stage.connect(false);
-    for (const std::size_t bytes : {10, 5000, 10})
+    for (const std::size_t bytes : {10u, 5000u, 10u})
         EXPECT_EQ(stage.served(0).send(message(1, bytes)), 0);
     EXPECT_EQ(stage.user().queued_messages, 3u);
     EXPECT_EQ(stage.user().queued_bytes, stage.served(0).counts().queued_bytes);
