@@ -37,7 +37,7 @@ constexpr std::chrono::milliseconds kRetry(1);
     log->updateConfig(config);
     log->debugFlush();
     const auto remote = plr::VoxLogServer::create(log, "remote log", "remote");
-    remote->startListeningOn(vox::object::adopt(vox_connection_create_listener(kName, nullptr)));
+    remote->startListeningOn(vox::listener::create(kName));
     for (;;)
         ::pause();
 }
