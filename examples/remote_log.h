@@ -18,15 +18,17 @@ class RemoteLog : public plr::rest::RestResource {
     explicit RemoteLog(const std::shared_ptr<plr::LogServer>& logServer)
         : server_(plr::VoxLogServer::create(logServer, "remote log", "radio.log")) {
         server_->startListeningOn(vox::listener::create_anonymous());
+        endpoint_ = server_->getEndpoint();
     }
 
     bool handleRestMessage_GET(plr::rest::RestResourceContext& context,
                                const plr::rest::PathView& path) override {
-        return !path && context.sendReplyWithValue(server_->getEndpoint());
+        return !path && context.sendReplyWithValue(endpoint_);
     }
 
   private:
     const std::shared_ptr<plr::VoxLogServer> server_;
+    vox::endpoint endpoint_;  // one for all: each that is made costs a descriptor
 };
 
 }  // namespace radio

@@ -39,7 +39,8 @@ class PLR_EXPORT VoxLogServer : public VoxServer, public Loggable<VoxLogServer> 
     // Takes the clients of a listener, named or anonymous, in place of those of
     // the one before; clients that are there stay. Any thread.
     void startListeningOn(vox::connection listener);
-    // What lets others connect; the null object without a listener. Any thread.
+    // What lets others connect, a new one each time (vox_endpoint_create()); the
+    // null object without a listener. Any thread.
     [[nodiscard]] vox::endpoint getEndpoint() const;
 
   protected:

@@ -76,8 +76,8 @@ PLR_EXPORT vox_connection_t vox_connection_create_listener(const char* name,
 // A listener without name, reached through endpoints only.
 PLR_EXPORT vox_connection_t vox_connection_create_anonymous_listener(const vox_limits_t* limits);
 
-// A value that travels in messages and lets its holder connect to `listener`, as
-// far as its policy goes. The null object when `listener` is none.
+// A value that travels in messages and lets its holders connect, as far as the policy goes. Costs a
+// descriptor here until the last holder drops it: share one. The null object for no listener.
 PLR_EXPORT vox_endpoint_t vox_endpoint_create(vox_connection_t listener);
 
 // Before the first resume only. Null, or never called: this user and root. An
