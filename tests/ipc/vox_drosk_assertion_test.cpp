@@ -2,34 +2,14 @@
 
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <new>
 #include <thread>
 #include <utility>
 #include <vector>
 
+#include "support/failing_allocations.h"
 #include "support/waiting.h"
 #include "vox/service.h"
-
-// This program's allocations fail on demand: the one before which so many
-// others of the thread succeed.
-namespace {
-thread_local int succeeding = -1;  // negative: none fails
-}  // namespace
-
-void* operator new(std::size_t size) {
-    if (succeeding >= 0 && succeeding-- == 0)
-        throw std::bad_alloc();
-    if (void* memory = std::malloc(size != 0 ? size : 1))
-        return memory;
-    throw std::bad_alloc();
-}
-void operator delete(void* memory) noexcept {
-    std::free(memory);
-}
-void operator delete(void* memory, std::size_t) noexcept {
-    std::free(memory);
-}
 
 namespace {
 
@@ -87,13 +67,13 @@ TEST_F(DroskAssertion, LeavesNoTransactionOpenWhenAnActivityCannotBegin) {
     int failures = 0;
     for (;; ++failures) {
         std::string name = "a name that is too long to stand inside the string";
-        succeeding = failures;
+        plr::test::succeedingAllocations = failures;
         std::shared_ptr<std::string> activity;
         try {
             activity = assertion->createActivity(std::move(name));
         } catch (const std::bad_alloc&) {
         }
-        const bool failed = std::exchange(succeeding, -1) < 0;
+        const bool failed = std::exchange(plr::test::succeedingAllocations, -1) < 0;
         EXPECT_EQ(vox_transaction_count(), activity ? 1u : 0u) << "allocation " << failures;
         EXPECT_EQ(activity == nullptr, failed);
         if (activity)
