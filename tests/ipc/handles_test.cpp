@@ -125,15 +125,16 @@ TEST(Connection, GivesRequestsUpInTimeAndOnDemand) {
         code = vox_error_get_code(reply.get());
         over.signal();
     });
-    EXPECT_TRUE(asker.send_request(vox::dict::create(), 1ms, queue, handler));
-    EXPECT_TRUE(over.wait() && asked.wait() && given.wait());
-    EXPECT_EQ(queue.sync([&] { return code; }), VOX_ERROR_REQUEST_TIMED_OUT);
     const vox::request patient = asker.send_request(vox::dict::create(), 24h, queue, handler);
     EXPECT_TRUE(asked.wait());
     EXPECT_TRUE(patient.cancel());
     EXPECT_TRUE(over.wait() && given.wait());
     EXPECT_EQ(queue.sync([&] { return code; }), VOX_ERROR_REQUEST_CANCELLED);
     EXPECT_FALSE(patient.cancel());
+    // Not the first: it might be given up before the other's hello, and never leave.
+    EXPECT_TRUE(asker.send_request(vox::dict::create(), 1ms, queue, handler));
+    EXPECT_TRUE(over.wait() && asked.wait() && given.wait());
+    EXPECT_EQ(queue.sync([&] { return code; }), VOX_ERROR_REQUEST_TIMED_OUT);
     asker.cancel();
 }
 

@@ -34,7 +34,13 @@ int onCancel(vox_object_t message, Event& happened) {
 
 class VoxRequest : public Pair {
   protected:
-    VoxRequest() { resumeBoth(); }
+    VoxRequest() {
+        resumeBoth();
+        // What is given up before the other's hello never leaves.
+        static_cast<void>(right.send(message(0)));
+        EXPECT_TRUE(left.inbox.wait(1));
+        left.inbox.clear();
+    }
     // A request of the left end as it arrived on the right.
     Ref arrived(std::uint32_t timeout) {
         id = request(left, replies, timeout);
