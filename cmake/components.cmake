@@ -399,6 +399,7 @@ pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
     include/plr/rest/property_resource.h
     include/plr/rest/watchable.h
   SOURCES
+    src/rest/notify.h
     src/rest/property_path.cpp
     src/rest/property_path.h
     src/rest/property_resource.cpp

@@ -7,6 +7,7 @@
 #include "plr/ipc/read.h"
 #include "plr/ipc/values.h"
 #include "plr/rest/reply_dict_context.h"
+#include "src/rest/notify.h"
 #include "src/rest/property_path.h"
 
 namespace plr::rest {
@@ -14,26 +15,8 @@ namespace {
 
 using Kind = PropertyPathKind;
 
-vox::object asText(const std::string& text) {
-    return vox::string(std::string_view(text));
-}
-
 std::string watchedPath(const PathView& path) {
     return path_join(path.head(), "_/watched");
-}
-
-// Tells one watcher. Deliberate: the author is the watcher's own name, not the
-// name of whoever set the value.
-void notifyWatcher(RestResourceContext& context, const RestResourceConnection& watcher,
-                   const vox::object& resource, const vox::object& value) {
-    context.sendNotify(watcher, watcher.nameValue(), resource, value);
-}
-
-void notifyWatchers(RestResourceContext& context, const WatchableRestResourceHelper& watchers,
-                    const vox::object& resource, const vox::object& value) {
-    watchers.map([&](const RestResourceConnection& watcher) {
-        notifyWatcher(context, watcher, resource, value);
-    });
 }
 
 // The part of `value` that a client asked for; null when its path cannot be
