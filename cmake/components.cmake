@@ -322,15 +322,19 @@ pelorin_component(log_fmt LEVEL 3 LIBRARY pelorin
 
 pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
   HEADERS
+    include/plr/rest/assertion_state.h
     include/plr/rest/auto_reply.h
     include/plr/rest/message.h
     include/plr/rest/operation.h
     include/plr/rest/path_map.h
+    include/plr/rest/typed_value.h
     include/plr/rest/value_coding.h
   SOURCES
+    src/rest/assertion_state.cpp
     src/rest/auto_reply.cpp
     src/rest/message.cpp
     src/rest/operation.cpp
+    src/rest/typed_value.cpp
     src/rest/value_coding.cpp)
 
 pelorin_component(log_remote LEVEL 5 LIBRARY pelorin
@@ -386,19 +390,23 @@ pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
 
 pelorin_component(rest_client LEVEL 5 LIBRARY pelorin
   HEADERS
+    include/plr/rest/reconnect_policy.h
     include/plr/rest/rest_module.h
     include/plr/rest/rest_module_state.h
     include/plr/rest/vox_connector.h
   SOURCES
+    src/rest/reconnect_policy.cpp
     src/rest/rest_module.cpp
     src/rest/rest_module_state.cpp
     src/rest/vox_connector.cpp)
 
 pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
   HEADERS
+    include/plr/rest/assertion_resource.h
     include/plr/rest/property_resource.h
     include/plr/rest/watchable.h
   SOURCES
+    src/rest/assertion_resource.cpp
     src/rest/notify.h
     src/rest/property_path.cpp
     src/rest/property_path.h

@@ -1,14 +1,14 @@
 #include "plr/rest/watchable.h"
 
 #include <algorithm>
+#include <utility>
 
 namespace plr::rest {
 
 bool WatchableRestResourceHelper::addWatcher(
     const std::shared_ptr<RestResourceConnection>& watcher) {
-    const std::owner_less<> before;
-    const auto place = std::lower_bound(watchers_.begin(), watchers_.end(), watcher, before);
-    if (place != watchers_.end() && !before(watcher, *place))
+    const auto [place, found] = find(watcher);
+    if (found)
         return false;
     watchers_.insert(place, watcher);
     return true;
@@ -16,14 +16,19 @@ bool WatchableRestResourceHelper::addWatcher(
 
 bool WatchableRestResourceHelper::removeWatcher(
     const std::shared_ptr<RestResourceConnection>& watcher) {
-    const auto found = std::find_if(watchers_.begin(), watchers_.end(), [&](const auto& entry) {
-        const std::shared_ptr<RestResourceConnection> live = entry.lock();
-        return live && live == watcher;
-    });
-    if (found == watchers_.end())
-        return false;
-    watchers_.erase(found);
-    return true;
+    const auto [place, found] = find(watcher);
+    if (found)
+        watchers_.erase(place);
+    return found;
+}
+
+std::vector<std::shared_ptr<RestResourceConnection>> WatchableRestResourceHelper::takeWatchers() {
+    std::vector<std::shared_ptr<RestResourceConnection>> live;
+    for (const auto& entry : watchers_)
+        if (std::shared_ptr<RestResourceConnection> watcher = entry.lock())
+            live.push_back(std::move(watcher));
+    watchers_.clear();
+    return live;
 }
 
 bool WatchableRestResourceHelper::hasActiveWatchers() const noexcept {
@@ -36,6 +41,15 @@ void WatchableRestResourceHelper::cleanupExpired() {
     const auto live = std::remove_if(watchers_.begin(), watchers_.end(),
                                      [](const auto& entry) { return entry.expired(); });
     watchers_.erase(live, watchers_.end());
+}
+
+// Its place in the order, and whether it is there. An expired entry keeps its
+// owner, so that nobody live is found in its place.
+std::pair<WatchableRestResourceHelper::Place, bool> WatchableRestResourceHelper::find(
+    const std::shared_ptr<RestResourceConnection>& watcher) {
+    const std::owner_less<> before;
+    const auto place = std::lower_bound(watchers_.begin(), watchers_.end(), watcher, before);
+    return {place, place != watchers_.end() && !before(watcher, *place)};
 }
 
 vox::array WatchableRestResourceHelper::getWatcherNames() const {

@@ -28,7 +28,8 @@
 // answers with the generation that it was told; an answer to an older one is
 // ignored. A generation ends when the provider revokes, and when the last who is
 // granted, or the last who waits, leaves. The first is 1, and 4294967295 is
-// followed by 1: what is no number reads as 0, and is never current.
+// followed by 1: what is no number reads as 0 (plr/ipc/read.h), and is never
+// current.
 //
 // The document of an assertion, its own GET and its entry in a dump:
 //
@@ -62,8 +63,10 @@ struct PLR_EXPORT AssertionRestResourceState {
     WatchableRestResourceHelper revoked;  // not released since
     std::weak_ptr<RestResourceConnection> provider;
 
+    // What its parties are told: AssertionAcquireState values of this generation.
     [[nodiscard]] vox::object createNotifyWithState(AssertionState state) const;
     [[nodiscard]] vox::object createNotifyForProvider() const;
+    // Its document.
     [[nodiscard]] vox::object dumpState() const;
 };
 
@@ -84,9 +87,41 @@ class PLR_EXPORT AssertionRestResource : public RestResource {
         RestResourceContext& context, const PathView& path,
         const std::shared_ptr<RestResourceConnection>& connection) override;
 
+  protected:
+    // The assertion, made now when the name is new: for who derives and has its
+    // generations go on where a former process left them. Valid for the resource's
+    // life.
+    AssertionRestResourceState& createIfNotPresent(std::string_view name);
+
   private:
-    // to be written: handleMessage_… , notifyWatcherWithState, notifyProvider,
-    // startNewGeneration, getResourceArray, createIfNotPresent
+    AssertionRestResource(bool holdOff, bool providerOnly);
+
+    // The handlers by operation and kind of path. Paths stand on the assertion's
+    // own segment.
+    void handleMessage_Root_GET(RestResourceContext& context);
+    void handleMessage_DumpState_GET(RestResourceContext& context);
+    void handleMessage_Resource_GET(RestResourceContext& context, std::string_view name);
+    void handleMessage_Resource_Granted_GET(RestResourceContext& context, std::string_view name);
+    void handleMessage_Resource_Revoked_GET(RestResourceContext& context, std::string_view name);
+    void handleMessage_Resource_Waiting_GET(RestResourceContext& context, std::string_view name);
+    void handleMessage_Resource_Provider_GET(RestResourceContext& context, std::string_view name);
+    void handleMessage_Resource_Granted_SET(RestResourceContext& context, const PathView& path);
+    void handleMessage_Resource_Revoked_SET(RestResourceContext& context, const PathView& path);
+    void handleMessage_Resource_PUSH(RestResourceContext& context, const PathView& path);
+    void handleMessage_Resource_POP(RestResourceContext& context, const PathView& path);
+    void handleMessage_Resource_Provider_PUSH(RestResourceContext& context, const PathView& path);
+    void handleMessage_Resource_Provider_POP(RestResourceContext& context, const PathView& path);
+
+    [[nodiscard]] vox::array getResourceArray() const;
+    [[nodiscard]] AssertionRestResourceState* find(std::string_view name);
+    // The assertion that a SET of a generation is about; null when the message is
+    // to be ignored.
+    [[nodiscard]] AssertionRestResourceState* findAnswered(RestResourceContext& context,
+                                                           std::string_view name);
+    // `path` is the assertion's.
+    void startNewGeneration(RestResourceContext& context, std::string_view path,
+                            AssertionRestResourceState& state) const;
+
     const bool holdOff_;
     PathMap<std::unique_ptr<AssertionRestResourceState>> assertions_;  // by name
     const bool providerOnly_;

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "plr/base/export.h"
@@ -11,6 +12,7 @@
 // that goes away expires, and its entry stays until it is cleaned up.
 //
 // Queue: the server's.
+// Cost:  a search is binary.
 namespace plr::rest {
 
 class PLR_EXPORT WatchableRestResourceHelper {
@@ -24,6 +26,8 @@ class PLR_EXPORT WatchableRestResourceHelper {
     [[nodiscard]] bool hasActiveWatchers() const noexcept;
     void cleanupExpired();
     void removeWatchers() noexcept { watchers_.clear(); }
+    // Takes everybody out: the live watchers, in the set's order.
+    [[nodiscard]] std::vector<std::shared_ptr<RestResourceConnection>> takeWatchers();
 
     // Calls `function` with every live watcher, in the set's order.
     template <class Function>
@@ -37,6 +41,9 @@ class PLR_EXPORT WatchableRestResourceHelper {
     [[nodiscard]] vox::array getWatcherNames() const;
 
   private:
+    using Place = std::vector<std::weak_ptr<RestResourceConnection>>::iterator;
+    std::pair<Place, bool> find(const std::shared_ptr<RestResourceConnection>& watcher);
+
     // Ordered by owner (std::owner_less), each once.
     std::vector<std::weak_ptr<RestResourceConnection>> watchers_;
 };
