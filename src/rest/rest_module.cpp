@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "plr/base/assert.h"
+#include "plr/rest/message.h"
 
 namespace plr {
 namespace {
@@ -14,7 +15,16 @@ template <class... Arguments>
 std::function<void(Arguments...)> asFunction(const dispatch::block<void(Arguments...)>& block) {
     if (!block)
         return {};
-    return [block](Arguments... arguments) { block(std::move(arguments)...); };
+    return [block](Arguments... arguments) { block(std::forward<Arguments>(arguments)...); };
+}
+
+// Of a whole reply, the value; null for everything else.
+RestModule::Handler onlyTheValue(RestModule::Handler callback) {
+    if (!callback)
+        return {};
+    return [callback = std::move(callback)](const vox::object& reply) {
+        callback(rest::getReplyValue(vox::dict(reply)));
+    };
 }
 
 }  // namespace
@@ -30,6 +40,10 @@ RestModuleState& RestModule::state() const {
 void RestModule::connect(vox::connection server) const {
     state().connect(std::move(server));
 }
+void RestModule::connectToService(const std::string& serviceName,
+                                  const ReconnectPolicy& policy) const {
+    state().connectToService(serviceName, policy);
+}
 void RestModule::disconnect() const {
     state().disconnect();
 }
@@ -37,6 +51,12 @@ bool RestModule::isConnected() const {
     return state_ && state_->isConnected();
 }
 
+void RestModule::setConnectionHandler(ConnectionHandler handler) const {
+    state().setConnectionHandler(std::move(handler));
+}
+void RestModule::setConnectionHandler(const ConnectionHandlerBlock& handler) const {
+    setConnectionHandler(asFunction(handler));
+}
 void RestModule::setServerErrorHandler(Handler handler) const {
     state().setServerErrorHandler(std::move(handler));
 }
@@ -95,11 +115,21 @@ void RestModule::getPropertyOnce(const std::string& path, const HandlerBlock& ca
 }
 void RestModule::sendRequest(const std::string& path, const vox::object& value,
                              Handler callback) const {
-    state().sendGet(path, value, std::move(callback));
+    state().sendGet(path, value, onlyTheValue(std::move(callback)));
 }
 void RestModule::sendRequest(const std::string& path, const vox::object& value,
                              const HandlerBlock& callback) const {
     sendRequest(path, value, asFunction(callback));
+}
+vox::request RestModule::sendRequest(const std::string& path, const vox::object& value,
+                                     std::chrono::milliseconds timeout,
+                                     ResultHandler callback) const {
+    return state().sendRequest(path, value, timeout, std::move(callback));
+}
+vox::request RestModule::sendRequest(const std::string& path, const vox::object& value,
+                                     std::chrono::milliseconds timeout,
+                                     const ResultHandlerBlock& callback) const {
+    return sendRequest(path, value, timeout, asFunction(callback));
 }
 
 void RestModule::registerAsRequestSink(const std::string& path, RequestHandler handler) const {
@@ -114,10 +144,10 @@ void RestModule::deregisterAsRequestSink(const std::string& path) const {
 }
 
 void RestModule::sendRawGet(const std::string& path, Handler callback) const {
-    getPropertyOnce(path, std::move(callback));
+    state().sendGet(path, nullptr, std::move(callback));
 }
 void RestModule::sendRawGet(const std::string& path, const HandlerBlock& callback) const {
-    getPropertyOnce(path, callback);
+    sendRawGet(path, asFunction(callback));
 }
 void RestModule::sendRawSet(const std::string& path, const vox::object& value) const {
     state().send(Operation::kSet, path, value);

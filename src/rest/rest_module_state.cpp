@@ -1,15 +1,33 @@
 #include "plr/rest/rest_module_state.h"
 
+#include <random>
 #include <stdexcept>
 #include <utility>
+#include <vector>
 
 #include "plr/concurrency/while_alive.h"
+#include "plr/ipc/values.h"
 #include "plr/rest/auto_reply.h"
 #include "plr/rest/message.h"
 
 namespace plr {
 
 using rest::Operation;
+
+namespace {
+
+// Of what answered a request: a reply, or an error object.
+Result<vox::object> resultOf(const vox::object& answer) {
+    const vox::dict reply(answer);
+    if (!reply)
+        return Result<vox::object>::failure(answer);
+    if (const vox::object error = reply[rest::key::kError])
+        return Result<vox::object>::failure(
+            vox::error(VOX_ERROR_APPLICATION, std::string(error.text()).c_str()));
+    return rest::getReplyValue(reply);
+}
+
+}  // namespace
 
 std::shared_ptr<RestModuleState> RestModuleState::create(dispatch::queue queue,
                                                          const std::string& name) {
@@ -21,10 +39,48 @@ RestModuleState::RestModuleState(dispatch::queue queue, const std::string& name)
 
 RestModuleState::~RestModuleState() = default;
 
+// ---- Connections ------------------------------------------------------------------------
+
 void RestModuleState::connect(vox::connection server) {
     if (!server)
         throw std::invalid_argument("RestModule::connect cannot be called with a null connection");
     ownQueue_.assertCurrent();
+    service_.reset();
+    const EndedConnection ended = stop_sync();
+    start_sync(std::move(server));
+    tellOfTheEnd_sync(ended);
+}
+
+void RestModuleState::connectToService(const std::string& serviceName,
+                                       const ReconnectPolicy& policy) {
+    rest::requireValid(policy);
+    ownQueue_.assertCurrent();
+    service_ = {serviceName, policy};
+    const EndedConnection ended = stop_sync();
+    attempt_sync();
+    tellOfTheEnd_sync(ended);
+}
+
+void RestModuleState::disconnect() {
+    ownQueue_.assertCurrent();
+    service_.reset();
+    tellOfTheEnd_sync(stop_sync());
+}
+
+void RestModuleState::handleServerError(const vox::object& error) {
+    ownQueue_.assertCurrent();
+    const EndedConnection ended = stop_sync();
+    if (service_) {
+        service_->failures = ended.wasReached ? 0 : service_->failures + 1;
+        attemptLater_sync();
+    }
+    tellOfTheEnd_sync(ended);
+    if (const Handler handler = serverErrorHandler_)
+        handler(error);
+}
+
+void RestModuleState::start_sync(vox::connection server) {
+    ++era_;
     connector_.connect(std::move(server), ownQueue_.queue(), weak_from_this());
     // The name first, so that the server knows whom the rest is for; then what
     // this module serves, then what it wants to see.
@@ -35,14 +91,74 @@ void RestModuleState::connect(vox::connection server) {
         send_sync(Operation::kPush, entry.first);
 }
 
-void RestModuleState::disconnect() {
-    ownQueue_.assertCurrent();
+RestModuleState::EndedConnection RestModuleState::stop_sync() {
+    ++era_;
+    const EndedConnection ended{connector_.isConnected(), std::exchange(isReached_, false)};
     connector_.disconnect();
+    return ended;
+}
+
+// Whoever is told may do with this module what he likes, so this comes last.
+void RestModuleState::tellOfTheEnd_sync(EndedConnection ended) {
+    if (!ended.existed)
+        return;
+    std::vector<std::weak_ptr<Follower>> followers;
+    for (const auto& entry : followers_)
+        followers.push_back(entry.second);
+    for (const auto& weak : followers)
+        if (const auto follower = weak.lock())
+            follower->handleConnectionEnd();
+    const auto handler = connectionHandler_;
+    if (ended.wasReached && handler)
+        handler(false);
+}
+
+// ---- Connecting by itself ---------------------------------------------------------------
+
+void RestModuleState::attempt_sync() {
+    start_sync(vox::connection::create(service_->name.c_str()));
+    // Behind all else: its reply says that what was observed has come.
+    connector_.sendWithReply(Operation::kGet, "", nullptr, ownQueue_.queue(),
+                             onReply([era = era_](RestModuleState& self, const vox::object& reply) {
+                                 self.ownQueue_.assertCurrent();
+                                 if (self.era_ == era)
+                                     self.probeAnswered_sync(reply);
+                             }));
+}
+
+void RestModuleState::attemptLater_sync() {
+    std::random_device random;
+    const double share = std::uniform_real_distribution<>()(random);
+    const auto pause = rest::pauseAfter(service_->failures, service_->policy, share);
+    ownQueue_.queue().after(
+        dispatch::time::after(pause),
+        dispatch::block<void()>(whileAlive(weak_from_this(), [era = era_](RestModuleState& self) {
+            self.ownQueue_.assertCurrent();
+            if (self.era_ == era)
+                self.attempt_sync();
+        })));
+}
+
+void RestModuleState::probeAnswered_sync(const vox::object& reply) {
+    // Refused requests are answers too. Other errors are the connection's, whose
+    // own error event follows.
+    const bool isAnswer =
+        vox::dict(reply) || vox_error_get_code(reply.get()) == VOX_ERROR_MESSAGE_REFUSED;
+    if (!isAnswer)
+        return;
+    isReached_ = true;
+    if (const auto handler = connectionHandler_)
+        handler(true);
 }
 
 bool RestModuleState::isConnected() const {
     ownQueue_.assertCurrent();
     return connector_.isConnected();
+}
+
+void RestModuleState::setConnectionHandler(std::function<void(bool)> handler) {
+    ownQueue_.assertCurrent();
+    connectionHandler_ = std::move(handler);
 }
 
 void RestModuleState::setServerErrorHandler(Handler handler) {
@@ -60,6 +176,8 @@ void RestModuleState::flush() const {
     execute_wrapped_sync([this, &group] { flush(group); });
     static_cast<void>(group.wait());
 }
+
+// ---- Registrations -----------------------------------------------------------------------
 
 void RestModuleState::observe(const std::string& path, Handler handler, bool forceResubscribe) {
     ownQueue_.assertCurrent();
@@ -96,6 +214,32 @@ void RestModuleState::deregisterAsRequestSink(const std::string& path) {
         send_sync(Operation::kPop, path);
 }
 
+bool RestModuleState::follow(const std::string& path, std::weak_ptr<Follower> follower) {
+    ownQueue_.assertCurrent();
+    if (subscriptions_.find(path))
+        return false;
+    followers_.insert(path, follower);
+    observe(path,
+            whileAlive(std::move(follower),
+                       [](Follower& self, const vox::object& value) { self.handleNotify(value); }),
+            false);
+    return true;
+}
+
+void RestModuleState::unfollow(const std::string& path) {
+    ownQueue_.assertCurrent();
+    if (followers_.erase(path))
+        unobserve(path);
+}
+
+std::shared_ptr<RestModuleState::Follower> RestModuleState::followerOf(const std::string& path) {
+    ownQueue_.assertCurrent();
+    const auto* found = followers_.find(path);
+    return found ? found->lock() : nullptr;
+}
+
+// ---- Messages ----------------------------------------------------------------------------
+
 void RestModuleState::send(Operation operation, const std::string& path,
                            const vox::object& value) const {
     ownQueue_.assertCurrent();
@@ -107,18 +251,39 @@ void RestModuleState::send_sync(Operation operation, std::string_view path,
     connector_.send(operation, path, value);
 }
 
+template <class Work>
+dispatch::block<void(vox::object)> RestModuleState::onReply(Work work) {
+    return dispatch::block<void(vox::object)>(whileAlive(weak_from_this(), std::move(work)));
+}
+
 void RestModuleState::sendGet(const std::string& path, const vox::object& value, Handler callback) {
     ownQueue_.assertCurrent();
     if (!callback)
         callback = [](const vox::object&) {};
     if (!connector_.isConnected())
         return callback(nullptr);
-    connector_.sendWithReply(Operation::kGet, path, value, ownQueue_.queue(),
-                             dispatch::block<void(vox::object)>(whileAlive(
-                                 weak_from_this(), [callback = std::move(callback)](
-                                                       RestModuleState&, const vox::object& reply) {
-                                     callback(rest::getReplyValue(vox::dict(reply)));
-                                 })));
+    connector_.sendWithReply(
+        Operation::kGet, path, value, ownQueue_.queue(),
+        onReply([callback = std::move(callback)](RestModuleState&, const vox::object& reply) {
+            callback(reply);
+        }));
+}
+
+vox::request RestModuleState::sendRequest(const std::string& path, const vox::object& value,
+                                          std::chrono::milliseconds timeout,
+                                          ResultHandler callback) {
+    ownQueue_.assertCurrent();
+    if (!callback)
+        callback = [](const Result<vox::object>&) {};
+    if (!connector_.isConnected()) {
+        callback(resultOf(vox::error(VOX_ERROR_CONNECTION_INTERRUPTED, "not connected")));
+        return {};
+    }
+    return connector_.sendRequest(
+        Operation::kGet, path, value, timeout, ownQueue_.queue(),
+        onReply([callback = std::move(callback)](RestModuleState&, const vox::object& reply) {
+            callback(resultOf(reply));
+        }));
 }
 
 void RestModuleState::handleMessage(const vox::dict& message) {
@@ -128,17 +293,14 @@ void RestModuleState::handleMessage(const vox::dict& message) {
                       connector_.handlePing(message));
 }
 
-void RestModuleState::handleServerError(const vox::object& error) {
-    ownQueue_.assertCurrent();
-    connector_.disconnect();
-    if (const Handler handler = serverErrorHandler_)
-        handler(error);
-}
-
 // Hot path: no copy of the path, one count on the handler;
 // bench/fanout_pelorin.cpp.
 bool RestModuleState::handleNotify_sync(const vox::dict& message) {
     if (rest::asOperation(message.text(rest::key::kOperation)) != Operation::kNotify)
+        return false;
+    // What a connection that was replaced still brings may be older than what the
+    // present one has brought.
+    if (connector_.isFromElsewhere(message))
         return false;
     const auto* found = subscriptions_.find(message.text(rest::key::kResource));
     if (!found)

@@ -21,6 +21,20 @@ void VoxConnector::sendWithReply(Operation operation, std::string_view path,
                                                 std::move(handler));
 }
 
+vox::request VoxConnector::sendRequest(Operation operation, std::string_view path,
+                                       const vox::object& value, std::chrono::milliseconds timeout,
+                                       const dispatch::queue& queue,
+                                       dispatch::block<void(vox::object)> handler) const {
+    return helper_.getServer().send_request(messageOf(operation, path, value), timeout, queue,
+                                            std::move(handler));
+}
+
+// Hot path, for each notification: two loads; bench/fanout_pelorin.cpp.
+bool VoxConnector::isFromElsewhere(const vox::dict& message) const noexcept {
+    const vox_connection_t origin = vox_dictionary_get_remote_connection(message.get());
+    return origin && origin != helper_.getServer().get();
+}
+
 bool VoxConnector::handlePing(const vox::dict& message) const {
     if (asOperation(message.text(key::kOperation)) != Operation::kPing)
         return false;

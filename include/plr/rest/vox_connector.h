@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -40,7 +41,13 @@ class PLR_EXPORT VoxConnector {
     void sendWithReply(Operation operation, std::string_view path, const vox::object& value,
                        const dispatch::queue& queue,
                        dispatch::block<void(vox::object)> handler) const;
+    // The same with a time limit (plr/ipc/connection.h).
+    vox::request sendRequest(Operation operation, std::string_view path, const vox::object& value,
+                             std::chrono::milliseconds timeout, const dispatch::queue& queue,
+                             dispatch::block<void(vox::object)> handler) const;
 
+    // Whether `message` came on a connection that is not the present one.
+    [[nodiscard]] bool isFromElsewhere(const vox::dict& message) const noexcept;
     // Answers a ping of the server. False when `message` is none.
     bool handlePing(const vox::dict& message) const;
 
