@@ -2,13 +2,12 @@
 //
 //   radio_watch PATH...     for instance /radio/signal /events/ring
 //
-// When the service goes away it tries again, at growing intervals. Values go to
-// standard output. It logs into the service's log, in the domain radio.watch.PID;
-// what it logs while there is no service waits for the next one.
+// When the service goes away it waits for the next one. Values go to standard
+// output. It logs into the service's log, in the domain radio.watch.PID; what it
+// logs while there is no service waits for the next one.
 
 #include <unistd.h>
 
-#include <algorithm>
 #include <chrono>
 #include <memory>
 #include <string>
@@ -24,11 +23,9 @@
 
 namespace {
 
-using namespace std::chrono_literals;
 using plr::LogLevel;
 
 constexpr const char* kService = "net.example.radio";
-constexpr std::chrono::milliseconds kFirstDelay = 50ms, kLongestDelay = 5s;
 
 // Owns its queue; see plr/concurrency/shared_synchronizable.h.
 class Watcher : public plr::SharedSynchronizable<Watcher> {
@@ -41,7 +38,9 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
         });
         return watcher;
     }
-    void flushLog() const { static_cast<void>(logger_->flush().wait(dispatch::time::after(1s))); }
+    void flushLog() const {
+        static_cast<void>(logger_->flush().wait(dispatch::time::after(std::chrono::seconds(1))));
+    }
 
   private:
     Watcher() : SharedSynchronizable("radio_watch") {}
@@ -55,54 +54,32 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
                     radio::say(path + " = " + radio::oneLine(value));
                     radio::log(*self.logger_, LogLevel::Debug, path, " = ", radio::oneLine(value));
                 }));
-        rest_.setServerErrorHandler(plr::whileAlive(weak_from_this(), [](Watcher& self, auto&&) {
-            self.ownQueue_.assertCurrent();
-            self.lost_sync();
-        }));
-        connect_sync();
+        rest_.setConnectionHandler(
+            plr::whileAlive(weak_from_this(), [](Watcher& self, bool isReached) {
+                self.ownQueue_.assertCurrent();
+                self.handleConnection_sync(isReached);
+            }));
+        rest_.connectToService(kService);
     }
 
-    void connect_sync() PLR_ON(ownQueue_)
+    void handleConnection_sync(bool isReached) PLR_ON(ownQueue_)
     {
-        rest_.connect(vox::connection::create(kService));
+        if (!isReached)
+            return radio::log(*logger_, LogLevel::Warn, kService, " is gone");
+        radio::log(*logger_, LogLevel::Notice, "connected to ", kService);
+        // Each service has a log of its own.
         rest_.getPropertyOnce("/log_server",
                               plr::whileAlive(weak_from_this(), [](Watcher& self, const auto& log) {
-                                  self.ownQueue_.assertCurrent();
-                                  if (log)  // null without a service
-                                      self.connected_sync(vox::endpoint(log));
+                                  if (log)
+                                      self.logger_->reconnect(vox::endpoint(log));
                               }));
-    }
-
-    void connected_sync(const vox::endpoint& logServer) PLR_ON(ownQueue_)
-    {
-        connected_ = true;
-        delay_ = kFirstDelay;
-        radio::log(*logger_, LogLevel::Notice, "connected to ", kService);
-        logger_->reconnect(logServer);
-    }
-
-    void lost_sync() PLR_ON(ownQueue_)
-    {
-        if (std::exchange(connected_, false))
-            radio::log(*logger_, LogLevel::Warn, kService, " is gone");
-        timers_->runAfter(delay_, ownQueue_.queue(),
-                          plr::whileAlive(weak_from_this(), [](Watcher& self) {
-                              self.ownQueue_.assertCurrent();
-                              self.connect_sync();
-                          }));
-        delay_ = std::min(2 * delay_, kLongestDelay);
     }
 
     const std::string pid_ = std::to_string(::getpid());
     const std::shared_ptr<plr::VoxLogger> logger_ = plr::VoxLogger::create(
         ownQueue_.queue(), "radio_watch", "radio.watch." + pid_, vox::connection());
-    const std::shared_ptr<plr::TimerService> timers_ = plr::DispatchTimerService::create(nullptr);
     plr::RestModule rest_ PLR_CONFINED_TO(ownQueue_)
     = plr::RestModule(ownQueue_.queue(), "radio_watch." + pid_);
-    bool connected_ PLR_CONFINED_TO(ownQueue_)
-    = false;
-    std::chrono::milliseconds delay_ PLR_CONFINED_TO(ownQueue_)
-    = kFirstDelay;  // of the next try
 };
 
 }  // namespace
