@@ -1,12 +1,17 @@
-// radio_get: prints one value.
+// radio_get: prints one value, or the answer to a request.
 //
 //   radio_get PATH          a property, /radio/registration@area for a part of
 //                           its value, or a place in the tree: then the names
-//                           there; PATH/* for everything there, * for everything
+//                           there; PATH/* for everything there, * for everything;
+//                           /descriptions for what there is
+//   radio_get PATH VALUE    asks with the value: true, false, null, an integer, else
+//                           a string; /requests/reset_modem null
 
+#include <chrono>
 #include <optional>
 
 #include "examples/show.h"
+#include "plr/ipc.h"
 #include "plr/rest.h"
 
 namespace {
@@ -18,7 +23,7 @@ struct Answers {
     bool served = false;               // the service is there
 };
 
-Answers ask(const std::string& path) {
+Answers get(const std::string& path) {
     const auto queue = dispatch::queue::create("radio_get");
     const plr::RestModule rest(queue, "radio_get");
     const dispatch::group open;
@@ -35,21 +40,63 @@ Answers ask(const std::string& path) {
     return answers;
 }
 
+plr::Result<vox::object> request(const std::string& path, const vox::object& value) {
+    const auto queue = dispatch::queue::create("radio_get");
+    const plr::RestModule rest(queue, "radio_get");
+    const dispatch::group open;
+    plr::Result<vox::object> answer;
+    queue.sync([&] {
+        rest.connect(vox::connection::create(kService));
+        rest.sendRequest(path, value, std::chrono::seconds(10),
+                         [&, session = dispatch::group_session(open)](
+                             const plr::Result<vox::object>& result) { answer = result; });
+    });
+    static_cast<void>(open.wait());
+    return answer;
+}
+
+// A path, its type and what it is for on a line each.
+void sayDescriptions(const vox::dict& descriptions) {
+    for (std::size_t i = 0; i < descriptions.count(); i++) {
+        const char* path = nullptr;
+        const vox::dict description(
+            vox::object::retain(vox_dictionary_get_entry(descriptions.get(), i, &path)));
+        std::string line = path;
+        line.resize(std::max<std::size_t>(line.size() + 1, 28), ' ');
+        line += description.text("type");
+        line.resize(std::max<std::size_t>(line.size() + 1, 40), ' ');
+        radio::say(line.append(description.text("doc")));
+    }
+}
+
+int fail(const std::string& why) {
+    std::cerr << "radio_get: " << why << '\n';
+    return 1;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
-    if (argc != 2) {
-        std::cerr << "usage: radio_get PATH\n";
+    if (argc != 2 && argc != 3) {
+        std::cerr << "usage: radio_get PATH [VALUE]\n";
         return 2;
     }
-    const Answers answers = ask(argv[1]);
-    if (!answers.served) {
-        std::cerr << "radio_get: " << kService << " is not there\n";
-        return 1;
+    const std::string path = argv[1];
+    if (argc == 3) {
+        const auto answer = request(path, radio::valueOf(argv[2]));
+        if (!answer)
+            return fail(path + ": " + answer.error().to_string());
+        radio::say(answer.value().to_string());
+        return 0;
     }
-    if (!answers.value) {
-        std::cerr << "radio_get: there is nothing at " << argv[1] << '\n';
-        return 1;
-    }
-    radio::say(answers.value->to_string());
+    const Answers answers = get(path);
+    if (!answers.served)
+        return fail(std::string(kService) + " is not there");
+    if (!answers.value)
+        return fail("there is nothing at " + path);
+    if (const vox::dict found(*answers.value); path.starts_with("/descriptions") && found)
+        sayDescriptions(found);
+    else
+        radio::say(answers.value->to_string());
+    return 0;
 }

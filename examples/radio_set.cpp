@@ -2,8 +2,7 @@
 //
 //   radio_set PATH VALUE    VALUE: true, false, null, an integer, else a string
 
-#include <charconv>
-#include <string_view>
+#include <string>
 
 #include "examples/show.h"
 #include "plr/rest.h"
@@ -11,18 +10,6 @@
 namespace {
 
 constexpr const char* kService = "net.example.radio";
-
-vox::object parse(std::string_view text) {
-    if (text == "true" || text == "false")
-        return vox::boolean(text == "true");
-    if (text == "null")
-        return nullptr;
-    std::int64_t number = 0;
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-    if (error == std::errc() && end == text.data() + text.size())
-        return vox::int64(number);
-    return vox::string(text);
-}
 
 // Whether the service has handled it.
 bool set(const std::string& path, const vox::object& value) {
@@ -49,7 +36,7 @@ int main(int argc, char** argv) {
         std::cerr << "usage: radio_set PATH VALUE\n";
         return 2;
     }
-    if (!set(argv[1], parse(argv[2]))) {
+    if (!set(argv[1], radio::valueOf(argv[2]))) {
         std::cerr << "radio_set: " << kService << " is not there\n";
         return 1;
     }

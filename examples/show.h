@@ -1,12 +1,17 @@
 #pragma once
 
 #include <algorithm>
+#include <charconv>
+#include <cstdint>
 #include <iostream>
 #include <string>
+#include <string_view>
 
 #include "plr/ipc/object.h"
+#include "plr/ipc/values.h"
 
-// What the example programs print, one line at a time and at once.
+// What the example programs print, one line at a time and at once, and the values
+// that they are given as words.
 namespace radio {
 
 inline void say(const std::string& line) {
@@ -19,6 +24,20 @@ inline std::string oneLine(const vox::object& value) {
     std::erase(text, '\t');
     std::ranges::replace(text, '\n', ' ');
     return text;
+}
+
+// true, false, null, an integer, else a string.
+inline vox::object valueOf(std::string_view word) {
+    if (word == "true" || word == "false")
+        return vox::boolean(word == "true");
+    if (word == "null")
+        return nullptr;
+    std::int64_t number = 0;
+    const char* const end = word.data() + word.size();
+    const auto read = std::from_chars(word.data(), end, number);
+    if (read.ec == std::errc() && read.ptr == end)
+        return vox::int64(number);
+    return vox::string(word);
 }
 
 }  // namespace radio
