@@ -2,12 +2,12 @@
 
 #include <limits>
 #include <string>
-#include <vector>
 
 #include "plr/ipc/dict.h"
 #include "plr/ipc/read.h"
 #include "plr/ipc/values.h"
 #include "plr/rest/reply_dict_context.h"
+#include "src/rest/notify.h"
 
 namespace plr::rest {
 namespace {
@@ -53,32 +53,6 @@ bool removeLast(WatchableRestResourceHelper& clients,
 
 std::uint32_t generationAfter(std::uint32_t generation) noexcept {
     return generation == std::numeric_limits<std::uint32_t>::max() ? 1 : generation + 1;
-}
-
-// `path` is the assertion's, `state` an AssertionAcquireState value. The author of
-// a notification is who gets it, as everywhere.
-void notifyWatcherWithState(RestResourceContext& context, const RestResourceConnection& client,
-                            const vox::object& path, const vox::object& state) {
-    context.sendNotify(client, client.nameValue(), path, state);
-}
-
-// Adds the clients and tells those who were not there yet.
-void moveTo(WatchableRestResourceHelper& set,
-            const std::vector<std::shared_ptr<RestResourceConnection>>& clients,
-            RestResourceContext& context, std::string_view path, const vox::object& state) {
-    const vox::object resource = vox::string(path);
-    for (const auto& client : clients)
-        if (set.addWatcher(client))
-            notifyWatcherWithState(context, *client, resource, state);
-}
-
-void notifyProvider(RestResourceContext& context, std::string_view path,
-                    const AssertionRestResourceState& state) {
-    const std::shared_ptr<RestResourceConnection> provider = state.provider.lock();
-    if (provider)
-        context.sendNotify(*provider, provider->nameValue(),
-                           vox::string(std::string_view(path_join(path, "provider"))),
-                           state.createNotifyForProvider());
 }
 
 }  // namespace
@@ -241,8 +215,10 @@ void AssertionRestResource::handleMessage_Resource_Granted_SET(RestResourceConte
     if (!state)
         return;
     const std::string resource = assertionPath(path);
-    moveTo(state->granted, state->waiting.takeWatchers(), context, resource,
-           state->createNotifyWithState(AssertionState::kGranted));
+    const vox::object granted = state->createNotifyWithState(AssertionState::kGranted);
+    for (const auto& client : state->waiting.takeWatchers())
+        if (state->granted.addWatcher(client))
+            notifyWatcherWithState(context, *client, resource, granted);
     notifyProvider(context, resource, *state);
 }
 
@@ -266,9 +242,9 @@ void AssertionRestResource::handleMessage_Resource_PUSH(RestResourceContext& con
         state.waiting.addWatcher(author);
         if (isFirst)
             notifyProvider(context, assertionPath(path), state);
-    } else {
-        moveTo(state.granted, {author}, context, assertionPath(path),
-               state.createNotifyWithState(AssertionState::kGranted));
+    } else if (state.granted.addWatcher(author)) {
+        notifyWatcherWithState(context, *author, assertionPath(path),
+                               state.createNotifyWithState(AssertionState::kGranted));
     }
     state.revoked.removeWatcher(author);
 }
@@ -318,14 +294,34 @@ AssertionRestResourceState* AssertionRestResource::findAnswered(RestResourceCont
     return isAllowed ? state : nullptr;
 }
 
-void AssertionRestResource::startNewGeneration(RestResourceContext& context, std::string_view path,
+void AssertionRestResource::startNewGeneration(RestResourceContext& context,
+                                               const std::string& path,
                                                AssertionRestResourceState& state) const {
-    // Deliberate: what is taken away is told with the generation that ends.
-    if (!holdOff_ && state.granted.hasWatchers())
-        moveTo(state.revoked, state.granted.takeWatchers(), context, path,
-               state.createNotifyWithState(AssertionState::kIdle));
+    if (!holdOff_ && state.granted.hasWatchers()) {
+        // Deliberate: what is taken away is told with the generation that ends.
+        const vox::object idle = state.createNotifyWithState(AssertionState::kIdle);
+        for (const auto& client : state.granted.takeWatchers())
+            if (state.revoked.addWatcher(client))
+                notifyWatcherWithState(context, *client, path, idle);
+    }
     state.generation = generationAfter(state.generation);
     notifyProvider(context, path, state);
+}
+
+// ---- Notifications: `path` is the assertion's ----------------------------------
+
+void AssertionRestResource::notifyWatcherWithState(RestResourceContext& context,
+                                                   const RestResourceConnection& client,
+                                                   const std::string& path,
+                                                   const vox::object& state) {
+    notifyWatcher(context, client, asText(path), state);
+}
+
+void AssertionRestResource::notifyProvider(RestResourceContext& context, const std::string& path,
+                                           const AssertionRestResourceState& state) {
+    if (const std::shared_ptr<RestResourceConnection> provider = state.provider.lock())
+        notifyWatcher(context, *provider, asText(path_join(path, "provider")),
+                      state.createNotifyForProvider());
 }
 
 // ---- Assertions ----------------------------------------------------------------
@@ -333,7 +329,7 @@ void AssertionRestResource::startNewGeneration(RestResourceContext& context, std
 vox::array AssertionRestResource::getResourceArray() const {
     const vox::array names = vox::array::create();
     for (const auto& assertion : assertions_)
-        names.append(vox::string(std::string_view(assertion.first)));
+        names.append(asText(assertion.first));
     return names;
 }
 

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <string>
 #include <string_view>
 
 #include "plr/base/export.h"
@@ -119,8 +120,13 @@ class PLR_EXPORT AssertionRestResource : public RestResource {
     [[nodiscard]] AssertionRestResourceState* findAnswered(RestResourceContext& context,
                                                            std::string_view name);
     // `path` is the assertion's.
-    void startNewGeneration(RestResourceContext& context, std::string_view path,
+    void startNewGeneration(RestResourceContext& context, const std::string& path,
                             AssertionRestResourceState& state) const;
+    static void notifyWatcherWithState(RestResourceContext& context,
+                                       const RestResourceConnection& client,
+                                       const std::string& path, const vox::object& state);
+    static void notifyProvider(RestResourceContext& context, const std::string& path,
+                               const AssertionRestResourceState& state);
 
     const bool holdOff_;
     PathMap<std::unique_ptr<AssertionRestResourceState>> assertions_;  // by name
