@@ -2,8 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "support/raw_rest_client.h"
 
@@ -67,71 +69,123 @@ class Property : public testing::Test {
     std::unique_ptr<RawRestClient> client_;
 };
 
-// One kind of path: what it answers, which operations are handled there, and what
-// a PUSH sends to its author at once.
+// One kind of path: what it answers to "me", who watches x, the names and what is
+// watched; then, watched by nobody, which operations are handled there, and what
+// SET and PUSH change. A POP undoes the PUSH, and where they change nothing they do
+// nothing.
 struct Cell {
     const char* kind;
     const char* path;  // below the resource
     const char* got;
     const char* handled;  // of GET, SET, PUSH and POP, never NOTIFY
-    Texts pushNews;
+    Texts set = {};
+    Texts pushed = {};
+    Texts pushNews = {};  // what a PUSH sends to its author at once
 };
 
 std::vector<Cell> cells() {
-    const Texts x = {std::string("notify me /kept/x ") + kValueOfX};
+    const char* const me = R"([0: "me"])";
+    const char* const x = R"([0: "x"])";
+    const Texts set = {R"(* {"x": "new"})"};
+    const Texts pushed = {R"(_/watched [0: "x"])", R"(x/_/watchers [0: "me"])"};
+    const Texts news = {std::string("notify me /kept/x ") + kValueOfX};
     const char* const all = "get set push pop ";
     const char* const some = "get set ";
     return {
-        {"Root", "", R"([0: "x"])", all, {R"(notify me /kept [0: "x"])"}},
-        {"Meta", "/_", R"([0: "watchers",1: "watched"])", all, {}},
-        {"MetaWatchers", "/_/watchers", "[]", all, {}},
-        {"MetaWatched", "/_/watched", "[]", all, {"notify me /kept/_/watched []"}},
-        {"MetaWatchedMetaWatchers", "/_/watched/_/watchers", "[]", all, {}},
-        {"DumpState", "/*", R"({"x": {"k": [0: 5]}})", "get ", {}},
-        {"Resource", "/x", kValueOfX, all, x},
-        {"Resource below", "/x/other", kValueOfX, all, x},
-        {"Resource below _", "/x/_/other", kValueOfX, all, x},
-        {"Resource below watchers", "/x/_/watchers/y", kValueOfX, all, x},
-        {"part", "/x@k.0", "5", "get push pop ", x},
-        {"no part", "/x@", kValueOfX, all, x},
-        {"ResourceMeta", "/x/_", R"([0: "watchers"])", all, {}},
-        {"ResourceWatchers", "/x/_/watchers", "[]", all, {}},
-        {"ResourceWatchers of a new name", "/y/_/watchers", "[]", all, {}},
-        {"Unknown word", "/_/other", "null", some, {}},
-        {"Unknown below watchers", "/_/watchers/x", "null", some, {}},
-        {"Unknown below watched", "/_/watched/x", "null", some, {}},
-        {"Unknown watched meta", "/_/watched/_", "null", some, {}},
-        {"Unknown deep", "/_/watched/_/watchers/x", "null", some, {}},
-        {"Unknown below the dump", "/*/x", "null", some, {}},
+        {"Root", "", x, all, {}, {R"(_/watchers [0: "me"])"}, {R"(notify me /kept [0: "x"])"}},
+        {"Meta", "/_", R"([0: "watchers",1: "watched"])", all},
+        {"MetaWatchers", "/_/watchers", me, all},
+        {"MetaWatched",
+         "/_/watched",
+         x,
+         all,
+         {},
+         {R"(_/watched/_/watchers [0: "me"])"},
+         {"notify me /kept/_/watched []"}},
+        {"MetaWatchedMetaWatchers", "/_/watched/_/watchers", me, all},
+        {"DumpState", "/*", R"({"x": {"k": [0: 5]}})", "get "},
+        {"Resource", "/x", kValueOfX, all, set, pushed, news},
+        {"Resource below", "/x/other", kValueOfX, all, set, pushed, news},
+        {"Resource below _", "/x/_/other", kValueOfX, all, set, pushed, news},
+        {"Resource below watchers", "/x/_/watchers/y", kValueOfX, all, set, pushed, news},
+        {"part", "/x@k.0", "5", "get push pop ", {}, pushed, news},
+        {"no part", "/x@", kValueOfX, all, set, pushed, news},
+        {"ResourceMeta", "/x/_", R"([0: "watchers"])", all},
+        {"ResourceWatchers", "/x/_/watchers", me, all},
+        {"ResourceWatchers of a new name", "/y/_/watchers", "[]", all},
+        {"Unknown word", "/_/other", "null", some},
+        {"Unknown below watchers", "/_/watchers/x", "null", some},
+        {"Unknown below watched", "/_/watched/x", "null", some},
+        {"Unknown watched meta", "/_/watched/_", "null", some},
+        {"Unknown deep", "/_/watched/_/watchers/x", "null", some},
+        {"Unknown below the dump", "/*/x", "null", some},
     };
 }
 
-TEST_F(Property, HandlesEveryOperationOnEveryKindOfPath) {
+class PropertyTable : public Property {
+  protected:
+    // All that the resource shows of itself.
+    Texts state() {
+        Texts lines;
+        for (const char* path :
+             {"*", "_/watchers", "_/watched", "_/watched/_/watchers", "x/_/watchers"})
+            lines.push_back(std::string(path) + ' ' + get(std::string("/kept/") + path));
+        return lines;
+    }
+    // What a message changed of it.
+    Texts changedBy(Operation operation, const std::string& path) {
+        const Texts before = state();
+        client_->send(operation, path, vox::string("new"));
+        news_ = news();
+        note(operation);
+        Texts after = state();
+        std::erase_if(after, [&](const std::string& line) {
+            return std::find(before.begin(), before.end(), line) != before.end();
+        });
+        return after;
+    }
+    // Whether the resource handled the last message.
+    void note(Operation operation) {
+        if (rig_.queue().sync([this] { return kept_->handled; }))
+            handled_.append(plr::rest::asObject(operation).text()) += ' ';
+    }
+    // Of "me", who watches all that can be watched.
+    std::string answerTo(const std::string& path) {
+        constexpr const char* kWatchable[] = {"/kept", "/kept/_/watched", "/kept/x"};
+        for (const char* watchable : kWatchable)
+            push(watchable);
+        std::string answer = get(path);
+        note(Operation::kGet);
+        for (const char* watchable : kWatchable)
+            pop(watchable);
+        news();
+        return answer;
+    }
+    void check(const Cell& cell) {
+        const std::string path = std::string("/kept") + cell.path;
+        const Texts before = state();
+        handled_.clear();
+        EXPECT_EQ(answerTo(path), cell.got);
+        EXPECT_EQ(changedBy(Operation::kSet, path), cell.set);
+        EXPECT_EQ(news_, Texts());
+        set("/kept/x", valueOfX());
+        EXPECT_EQ(changedBy(Operation::kPush, path), cell.pushed);
+        EXPECT_EQ(news_, cell.pushNews);
+        changedBy(Operation::kPop, path);
+        EXPECT_EQ(news_, Texts());
+        EXPECT_EQ(changedBy(Operation::kNotify, path), Texts());
+        EXPECT_EQ(handled_, cell.handled);
+        EXPECT_EQ(state(), before);
+    }
+
+    std::string handled_;  // the operations that were
+    Texts news_;           // after the last of them
+};
+
+TEST_F(PropertyTable, HandlesEveryOperationOnEveryKindOfPath) {
     for (const Cell& cell : cells()) {
         SCOPED_TRACE(cell.kind);
-        const std::string path = std::string("/kept") + cell.path;
-        std::string handled;
-        const auto note = [&](const char* operation) {
-            handled += rig_.queue().sync([&] { return kept_->handled; }) ? operation : "";
-        };
-        EXPECT_EQ(get(path), cell.got);
-        note("get ");
-        set(path, vox::string("new"));
-        EXPECT_EQ(news(), Texts());
-        note("set ");
-        const bool setsX = cell.got == std::string(kValueOfX);
-        EXPECT_EQ(get("/kept/x"), setsX ? R"("new")" : kValueOfX) << "only properties are set";
-        set("/kept/x", valueOfX());
-        push(path);
-        EXPECT_EQ(news(), cell.pushNews);
-        note("push ");
-        pop(path);
-        EXPECT_EQ(news(), Texts());
-        note("pop ");
-        client_->send(Operation::kNotify, path, vox::int64(1));
-        EXPECT_EQ(news(), Texts());
-        note("notify ");
-        EXPECT_EQ(handled, cell.handled);
+        check(cell);
     }
     EXPECT_EQ(get("/kept"), R"([0: "x"])") << "none of these makes a property";
 }
@@ -171,48 +225,6 @@ TEST_F(Property, EverySetNotifiesChangedOrNotUnderItsPathWithTheWatchersName) {
     push("/events/x");
     set("/events/x", vox::int64(2));
     EXPECT_EQ(news(), (Texts{"notify me /events/x 2"}));
-}
-
-TEST_F(Property, ANewNameIsAnnouncedToWhoWatchesTheNames) {
-    push("/kept");
-    push("/kept/new");
-    EXPECT_EQ(news(), (Texts{R"(notify me /kept [0: "x"])", R"(notify me /kept [0: "new",1: "x"])",
-                             "notify me /kept/new null"}));
-    set("/kept/a", vox::int64(1));
-    set("/kept/a", vox::int64(1));
-    EXPECT_EQ(news(), (Texts{R"(notify me /kept [0: "a",1: "new",2: "x"])"}));
-    EXPECT_EQ(get("/kept/_/watchers"), R"([0: "me"])");
-    pop("/kept");
-    set("/kept/b", vox::int64(1));
-    EXPECT_EQ(news(), Texts());
-    EXPECT_EQ(get("/kept/_/watchers"), "[]");
-}
-
-TEST_F(Property, WhatIsWatchedIsAnnouncedToWhoWatchesThat) {
-    const auto other = rig_.registeredClient("other");
-    push("/kept/_/watched");
-    EXPECT_EQ(news(), (Texts{"notify me /kept/_/watched []"}));
-    EXPECT_EQ(get("/kept/_/watched/_/watchers"), R"([0: "me"])");
-    const struct {
-        Operation operation;
-        const char* path;
-        Texts news;
-    } rows[] = {
-        {Operation::kPush, "/kept/x", {R"(notify me /kept/_/watched [0: "x"])"}},
-        {Operation::kPush, "/kept/x", {}},
-        {Operation::kPush, "/kept/y", {R"(notify me /kept/_/watched [0: "x",1: "y"])"}},
-        {Operation::kPop, "/kept/z", {}},
-        {Operation::kPop, "/kept/x", {R"(notify me /kept/_/watched [0: "y"])"}},
-        {Operation::kPop, "/kept/x", {}},
-    };
-    for (const auto& row : rows)
-        EXPECT_EQ(newsOf(other, row.operation, row.path), row.news) << row.path;
-    EXPECT_EQ(get("/kept/_/watched"), R"([0: "y"])");
-    EXPECT_EQ(get("/kept/y/_/watchers"), R"([0: "other"])");
-    EXPECT_EQ(get("/kept"), R"([0: "x",1: "y"])") << "properties stay";
-    pop("/kept/_/watched");
-    EXPECT_EQ(news(), Texts());
-    EXPECT_EQ(newsOf(other, Operation::kPop, "/kept/y"), Texts());
 }
 
 TEST_F(Property, AnUnknownClientWatchesNothingButMakesProperties) {
