@@ -390,11 +390,15 @@ pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
 
 pelorin_component(rest_client LEVEL 5 LIBRARY pelorin
   HEADERS
+    include/plr/rest/assertion_handle.h
+    include/plr/rest/assertion_provider.h
     include/plr/rest/reconnect_policy.h
     include/plr/rest/rest_module.h
     include/plr/rest/rest_module_state.h
     include/plr/rest/vox_connector.h
   SOURCES
+    src/rest/assertion_handle.cpp
+    src/rest/assertion_provider.cpp
     src/rest/reconnect_policy.cpp
     src/rest/rest_module.cpp
     src/rest/rest_module_state.cpp

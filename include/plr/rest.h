@@ -4,6 +4,8 @@
 // made with: values, connections, queue-owning objects.
 #include "plr/concurrency.h"
 #include "plr/ipc.h"
+#include "plr/rest/assertion_handle.h"
+#include "plr/rest/assertion_provider.h"
 #include "plr/rest/assertion_resource.h"
 #include "plr/rest/assertion_state.h"
 #include "plr/rest/auto_reply.h"

@@ -3,7 +3,6 @@
 #include <random>
 #include <stdexcept>
 #include <utility>
-#include <vector>
 
 #include "plr/concurrency/while_alive.h"
 #include "plr/ipc/values.h"
@@ -102,11 +101,13 @@ RestModuleState::EndedConnection RestModuleState::stop_sync() {
 void RestModuleState::tellOfTheEnd_sync(EndedConnection ended) {
     if (!ended.existed)
         return;
-    std::vector<std::weak_ptr<Follower>> followers;
+    rest::PathMap<std::weak_ptr<Follower>> present;
     for (const auto& entry : followers_)
-        followers.push_back(entry.second);
-    for (const auto& weak : followers)
-        if (const auto follower = weak.lock())
+        if (!entry.second.expired())
+            present.insert(entry.first, entry.second);
+    followers_ = present;
+    for (const auto& entry : present)
+        if (const auto follower = entry.second.lock())
             follower->handleConnectionEnd();
     const auto handler = connectionHandler_;
     if (ended.wasReached && handler)
@@ -216,20 +217,33 @@ void RestModuleState::deregisterAsRequestSink(const std::string& path) {
 
 bool RestModuleState::follow(const std::string& path, std::weak_ptr<Follower> follower) {
     ownQueue_.assertCurrent();
-    if (subscriptions_.find(path))
+    if (subscriptions_.find(path) || followerOf(path))
         return false;
-    followers_.insert(path, follower);
-    observe(path,
-            whileAlive(std::move(follower),
-                       [](Follower& self, const vox::object& value) { self.handleNotify(value); }),
-            false);
+    const auto [place, isFirst] = followers_.insert(path, follower);
+    *place = follower;
+    const auto subscribe = [this, path, follower](const vox::object&) {
+        const auto present = follower.lock();
+        if (!present || present != followerOf(path))
+            return;  // has left meanwhile
+        observe(path,
+                whileAlive(follower, [](Follower& self,
+                                        const vox::object& value) { self.handleNotify(value); }),
+                false);
+    };
+    // What the server sent to the last follower is on its way until an answer
+    // comes behind it; until then there is nobody to get it.
+    if (isFirst)
+        subscribe(nullptr);
+    else
+        sendGet("", nullptr, subscribe);
     return true;
 }
 
 void RestModuleState::unfollow(const std::string& path) {
     ownQueue_.assertCurrent();
-    if (followers_.erase(path))
-        unobserve(path);
+    unobserve(path);
+    if (auto* const follower = followers_.find(path))
+        follower->reset();
 }
 
 std::shared_ptr<RestModuleState::Follower> RestModuleState::followerOf(const std::string& path) {

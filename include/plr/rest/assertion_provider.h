@@ -1,7 +1,7 @@
 #pragma once
 
-#include <cstdint>
 #include <functional>
+#include <memory>
 #include <string>
 
 #include "plr/base/export.h"
@@ -20,9 +20,10 @@
 //
 // `handler` is called on the module's queue with each notification: kPending while
 // somebody waits, else kGranted while somebody is granted, else kIdle; kIdle, with
-// generation 0, when the connection to the server has ended.
+// generation 0, when the connection to the server that notified has ended.
 //
-// Owner:   whoever made it; not movable, so that its handler may use it.
+// Owner:   whoever made it; not movable, so that its handler may use it, or drop it.
+//          It keeps the module's state, and its connection.
 // Queue:   the module's, for everything, destruction included.
 namespace plr::rest {
 
@@ -30,18 +31,23 @@ class PLR_EXPORT AssertionProvider {
   public:
     using Handler = std::function<void(const AssertionAcquireState&)>;
 
-    AssertionProvider(RestModule module, const std::string& path, Handler handler);
+    // Throws std::invalid_argument when the module observes path/provider already.
+    AssertionProvider(const RestModule& module, const std::string& path, Handler handler);
     ~AssertionProvider();
     AssertionProvider(const AssertionProvider&) = delete;
     AssertionProvider& operator=(const AssertionProvider&) = delete;
 
-    // What was notified last.
+    // What was notified last on this connection; kIdle, generation 0, before.
     [[nodiscard]] const AssertionAcquireState& state() const noexcept;
-    // Grants or revokes the generation that was notified last; nothing happens
-    // before the first.
+    // Grants or revokes the generation that was notified last. Nothing happens
+    // before the first, and while disconnected.
     void grant() const;
     void revoke() const;
-    // to be written
+
+  private:
+    class Registration;
+
+    std::shared_ptr<Registration> registration_;
 };
 
 }  // namespace plr::rest

@@ -58,7 +58,8 @@ class PLR_EXPORT RestModuleState : public SharedSynchronizable<RestModuleState> 
     void unobserve(const std::string& path);
     void registerAsRequestSink(const std::string& path, RequestHandler handler);
     void deregisterAsRequestSink(const std::string& path);
-    // Observes `path` for `follower`. False when the path is observed already.
+    // Observes `path` for `follower`, who is told nothing that was meant for one
+    // before him. False when the path is observed already.
     [[nodiscard]] bool follow(const std::string& path, std::weak_ptr<Follower> follower);
     void unfollow(const std::string& path);
     // Null when nobody follows `path`.
@@ -114,6 +115,7 @@ class PLR_EXPORT RestModuleState : public SharedSynchronizable<RestModuleState> 
     rest::VoxConnector connector_ PLR_CONFINED_TO(ownQueue_);
     Registrations<Handler> subscriptions_ PLR_CONFINED_TO(ownQueue_);
     Registrations<RequestHandler> requestHandlers_ PLR_CONFINED_TO(ownQueue_);
+    // With those who have left since the connection was made, who are gone.
     rest::PathMap<std::weak_ptr<Follower>> followers_ PLR_CONFINED_TO(ownQueue_);
     Handler serverErrorHandler_ PLR_CONFINED_TO(ownQueue_);
     std::function<void(bool)> connectionHandler_ PLR_CONFINED_TO(ownQueue_);
