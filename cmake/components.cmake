@@ -378,6 +378,7 @@ pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
     include/plr/rest/rest_server_example.h
     include/plr/rest/server_base.h
     include/plr/rest/tree_resource.h
+    include/plr/rest/watcher_cleanup.h
   SOURCES
     src/rest/connection_resource.cpp
     src/rest/path_view.cpp

@@ -1,9 +1,10 @@
 #include "plr/rest/connection_resource.h"
 
 #include <algorithm>
-#include <boost/container/flat_map.hpp>
 #include <string>
 #include <string_view>
+#include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "plr/ipc/array.h"
@@ -13,7 +14,7 @@ namespace plr::rest {
 
 // By the connection's address, which its object keeps from being used again.
 struct ConnectionRestResource::Connections
-    : boost::container::flat_map<vox_connection_t, std::shared_ptr<RestResourceConnection>> {};
+    : std::unordered_map<vox_connection_t, std::shared_ptr<RestResourceConnection>> {};
 
 ConnectionRestResource::ConnectionRestResource() : connections_(std::make_unique<Connections>()) {}
 ConnectionRestResource::~ConnectionRestResource() = default;
@@ -56,17 +57,34 @@ bool ConnectionRestResource::handleRestMessage_POP(RestResourceContext& context,
                                                    const PathView& path) {
     if (path)
         return false;
-    connections_->erase(context.getRawAuthorConnection().get());
+    const auto connection = lookupConnection(context.getRawAuthorConnection());
+    if (!connection)
+        return true;
+    // Held for the call, which may replace it.
+    if (const auto handler = forgetHandler_)
+        handler(connection);
+    forget(connection);
     return true;
 }
 
 void ConnectionRestResource::handleDroppedConnection(
     RestResourceContext&, const PathView&,
     const std::shared_ptr<RestResourceConnection>& connection) {
-    const auto found =
-        std::find_if(connections_->begin(), connections_->end(),
-                     [&connection](const auto& entry) { return entry.second == connection; });
-    if (found != connections_->end())
+    forget(connection);
+}
+
+void ConnectionRestResource::setForgetHandler(
+    std::function<void(const std::shared_ptr<RestResourceConnection>&)> handler) {
+    forgetHandler_ = std::move(handler);
+}
+
+// By its key, not by a search: a thousand clients may drop at once.
+void ConnectionRestResource::forget(const std::shared_ptr<RestResourceConnection>& connection) {
+    const auto* known = dynamic_cast<const VoxRestResourceConnection*>(connection.get());
+    if (!known)
+        return;
+    const auto found = connections_->find(known->connection().get());
+    if (found != connections_->end() && found->second == connection)
         connections_->erase(found);
 }
 

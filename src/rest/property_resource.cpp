@@ -248,6 +248,26 @@ void PropertyRestResource::handleMessage_Resource_POP(RestResourceContext& conte
         sendWatchedResourcesNotification(context, path);
 }
 
+// One pass over all watchers. Properties without any cost one compare each.
+void PropertyRestResource::cleanupWatchers(RestResourceContext& context, const PathView& path) {
+    rootWatchers_.cleanupExpired();
+    watchedWatchers_.cleanupExpired();
+    bool lostLastWatcher = false;
+    for (const auto& property : properties_) {
+        WatchableRestResourceHelper& watchers = property.second->watchers;
+        if (!watchers.hasWatchers())
+            continue;
+        watchers.cleanupExpired();
+        lostLastWatcher |= !watchers.hasWatchers();
+    }
+    if (!lostLastWatcher)
+        return;
+    PathView behind = path;
+    while (behind)
+        behind.advance(1);
+    sendWatchedResourcesNotification(context, behind);
+}
+
 // ---- Lists ---------------------------------------------------------------------
 
 vox::array PropertyRestResource::getResourceArray() const {

@@ -79,4 +79,14 @@ bool TreeRestResource::handleMessage_DumpState(RestResourceContext& context, Pat
     return true;
 }
 
+void TreeRestResource::cleanupWatchers(RestResourceContext& context, const PathView& path) {
+    const auto children = children_;
+    for (const auto& [name, child] : children) {
+        if (auto* const resource = dynamic_cast<WatcherCleanup*>(child.get())) {
+            const std::string childPath = path_join(path.full(), name);
+            resource->cleanupWatchers(context, PathView(childPath));
+        }
+    }
+}
+
 }  // namespace plr::rest

@@ -40,7 +40,12 @@ void WatchableRestResourceHelper::cleanupExpired() {
     // The order by owner does not change when an entry expires.
     const auto live = std::remove_if(watchers_.begin(), watchers_.end(),
                                      [](const auto& entry) { return entry.expired(); });
+    if (live == watchers_.end())
+        return;
     watchers_.erase(live, watchers_.end());
+    // A crowd that left does not leave its memory.
+    if (watchers_.size() <= watchers_.capacity() / 4)
+        watchers_.shrink_to_fit();
 }
 
 // Its place in the order, and whether it is there. An expired entry keeps its

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "support/raw_rest_client.h"
@@ -239,25 +240,59 @@ TEST_F(Property, AnUnknownClientWatchesNothingButMakesProperties) {
     EXPECT_EQ(get("/kept/new/_/watchers"), "[]");
 }
 
-TEST_F(Property, WatchersThatWentAwayExpireAndStillCountOnce) {
-    push("/kept/_/watched");
-    auto other = rig_.registeredClient("other");
-    EXPECT_EQ(news(), (Texts{"notify me /kept/_/watched []"}));
-    EXPECT_EQ(newsOf(other, Operation::kPush, "/kept/x"),
-              (Texts{R"(notify me /kept/_/watched [0: "x"])"}));
+TEST(PropertyRestResource, WatchersThatWentAwayExpireAndStillCountUntilTheyAreCleanedUp) {
+    PropertyRestResource properties(true);
+    const auto me = std::make_shared<FakeRestConnection>("me");
+    auto other = std::make_shared<FakeRestConnection>("other");
+    const auto send = [&](Operation operation, const char* path,
+                          std::shared_ptr<FakeRestConnection> author) {
+        FakeRestContext context(operation, {}, std::move(author));
+        plr::rest::PathView behind(path);
+        behind.advance(1);
+        EXPECT_TRUE(properties.handleMessage(context, behind)) << path;
+        return context.replies().empty() ? "" : oneLine(context.replies()[0]);
+    };
+    const auto toldOfWatched = [&] {
+        Texts told;
+        for (const vox::dict& message : std::exchange(me->sent, {}))
+            if (message.text("r") == "/kept/_/watched")
+                told.push_back(oneLine(message["v"]));
+        return told;
+    };
+    send(Operation::kPush, "/kept/_/watched", me);
+    send(Operation::kPush, "/kept/x", other);
+    EXPECT_EQ(toldOfWatched(), (Texts{"[]", R"([0: "x"])"}));
     other.reset();
-    ASSERT_TRUE(rig_.waitForDrop());
-    EXPECT_EQ(get("/kept/x/_/watchers"), "[]");
-    EXPECT_EQ(get("/kept/_/watched"), "[]");
-    set("/kept/x", vox::int64(1));
-    EXPECT_EQ(news(), Texts());
+    EXPECT_EQ(send(Operation::kGet, "/kept/x/_/watchers", me), "[]");
+    EXPECT_EQ(send(Operation::kGet, "/kept/_/watched", me), "[]");
     // The expired entry still counts as a watcher: nobody is told of the new one.
-    push("/kept/x");
-    EXPECT_EQ(news(), (Texts{"notify me /kept/x 1"}));
-    EXPECT_EQ(get("/kept/_/watched"), R"([0: "x"])");
+    send(Operation::kPush, "/kept/x", me);
+    EXPECT_EQ(toldOfWatched(), Texts());
     // That PUSH has cleaned up, so that now the last one leaves.
-    pop("/kept/x");
-    EXPECT_EQ(news(), (Texts{"notify me /kept/_/watched []"}));
+    send(Operation::kPop, "/kept/x", me);
+    EXPECT_EQ(toldOfWatched(), (Texts{"[]"}));
+}
+
+// However it goes. Nothing is left of it then: the next watcher is the first.
+TEST_F(Property, WhenAClientWentWhoWatchesWhatIsWatchedIsToldOnce) {
+    rig_.add("/tree", std::make_shared<plr::rest::TreeRestResource>());
+    rig_.add("/tree/kept", std::make_shared<PropertyRestResource>(true));
+    push("/tree/kept/_/watched");
+    news();
+    for (const bool isByPop : {false, true}) {
+        auto other = rig_.registeredClient("other");
+        other->send(Operation::kPush, "/tree/kept/x");
+        other->send(Operation::kPush, "/tree/kept/y");
+        static_cast<void>(other->takeMessages());
+        EXPECT_EQ(news().size(), 2U);
+        if (isByPop)
+            other->send(Operation::kPop, "/connections");
+        else
+            other.reset();
+        Texts told;
+        EXPECT_TRUE(eventually([&] { return !(told = news()).empty(); }));
+        EXPECT_EQ(told, (Texts{"notify me /tree/kept/_/watched []"}));
+    }
 }
 
 TEST(Watchable, KnowsItsWatchersOnce) {

@@ -122,6 +122,7 @@ TEST_F(RestServer, ListsConnectionsThatRegisteredOnceAndForgetsThem) {
     EXPECT_EQ(me.textAt("/connections"), R"([0: "b",1: "b",2: "me"])");
     me.send(Operation::kPop, "/connections");
     me.send(Operation::kPop, "/connections");
+    EXPECT_TRUE(rig.waitForDrop()) << "for the others it is gone";
     EXPECT_EQ(me.textAt("/connections/*"), R"([0: "b",1: "b"])");
     EXPECT_EQ(me.textAt("/author"), R"("unknown, says "me"")");
     other.reset();

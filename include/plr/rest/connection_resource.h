@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <memory>
 
 #include "plr/base/export.h"
@@ -14,7 +15,8 @@
 //         string). A name of more than kMaximumNameLength bytes is refused
 //         (unhandled). Registering again changes nothing: a client keeps the
 //         name, and the subscriptions, of its first PUSH.
-//   POP   forgets the client: its subscriptions end.
+//   POP   forgets the client as if it had dropped: its subscriptions end, and
+//         every resource is told.
 //   GET   the names, an array in ascending order; of "*" too.
 //
 // A client that drops is forgotten. Several clients may have one name.
@@ -33,6 +35,11 @@ class PLR_EXPORT ConnectionRestResource : public RestResource {
     [[nodiscard]] std::shared_ptr<RestResourceConnection> lookupConnection(
         const vox::connection& connection) const;
 
+    // What to call for each client that a POP is about to forget: its server tells
+    // every resource, this one too. Replaces the one before.
+    void setForgetHandler(
+        std::function<void(const std::shared_ptr<RestResourceConnection>&)> handler);
+
     bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_PUSH(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_POP(RestResourceContext& context, const PathView& path) override;
@@ -42,7 +49,10 @@ class PLR_EXPORT ConnectionRestResource : public RestResource {
 
   private:
     struct Connections;
+    void forget(const std::shared_ptr<RestResourceConnection>& connection);
+
     const std::unique_ptr<Connections> connections_;
+    std::function<void(const std::shared_ptr<RestResourceConnection>&)> forgetHandler_;
 };
 
 }  // namespace plr::rest

@@ -9,6 +9,7 @@
 #include "plr/rest/path_map.h"
 #include "plr/rest/resource.h"
 #include "plr/rest/watchable.h"
+#include "plr/rest/watcher_cleanup.h"
 
 // A PropertyRestResource holds named properties at one place of a server's
 // tree. Clients SET a property, GET it whole or in part, and watch it by PUSH
@@ -25,12 +26,15 @@
 // makes none. Without kept values it only passes SETs on: GETs answer null, and
 // a new watcher is told nothing.
 //
-// Owner:   the tree. Watchers are held weakly.
+// Owner:   the tree. Watchers are held weakly: one whose client went is told
+//          nothing and listed nowhere any more. Its entry goes with the next PUSH on
+//          the property or soon after the drop (watcher_cleanup.h); when
+//          that was the last one, who watches _/watched is told then.
 // Queue:   the server's.
 // Order:   each watcher is notified of SETs in their order.
 namespace plr::rest {
 
-class PLR_EXPORT PropertyRestResource : public RestResource {
+class PLR_EXPORT PropertyRestResource : public RestResource, public WatcherCleanup {
   public:
     explicit PropertyRestResource(bool keepValues);
     ~PropertyRestResource() override;
@@ -40,6 +44,7 @@ class PLR_EXPORT PropertyRestResource : public RestResource {
     bool handleRestMessage_PUSH(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_POP(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_NOTIFY(RestResourceContext& context, const PathView& path) override;
+    void cleanupWatchers(RestResourceContext& context, const PathView& path) override;
 
   private:
     struct Entry;  // a property

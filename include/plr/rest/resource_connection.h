@@ -48,6 +48,8 @@ class PLR_EXPORT VoxRestResourceConnection : public RestResourceConnection {
     VoxRestResourceConnection(vox::connection connection, std::string&& name);
     ~VoxRestResourceConnection() override;
 
+    [[nodiscard]] const vox::connection& connection() const noexcept { return connection_; }
+
     void send(vox::dict message) const override;
     void sendWithReply(vox::dict message, dispatch::queue queue,
                        ReplyHandler handler) const override;

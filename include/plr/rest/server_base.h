@@ -9,6 +9,7 @@
 
 #include "plr/base/report.h"
 #include "plr/concurrency/shared_synchronizable.h"
+#include "plr/concurrency/while_alive.h"
 #include "plr/ipc/connection.h"
 #include "plr/rest/auto_reply.h"
 #include "plr/rest/connection_resource.h"
@@ -17,6 +18,7 @@
 #include "plr/rest/path_view.h"
 #include "plr/rest/resource.h"
 #include "plr/rest/tree_resource.h"
+#include "plr/rest/watcher_cleanup.h"
 
 // What every REST server does whatever its messages come on: it owns the tree
 // of resources, routes messages through it and carries the resources' answers.
@@ -66,14 +68,11 @@ class RestServerBase : public SharedSynchronizable<Server> {
         }
     }
 
-    // A client is gone: tells every resource.
+    // A client is gone: tells every resource, and soon tidies up (watcher_cleanup.h).
     void handleDroppedConnection(const vox::connection& connection) {
         this->ownQueue_.assertCurrent();
-        const std::shared_ptr<RestResourceConnection> dropped = getAuthorResource(connection);
-        if (!dropped)
-            return;
-        RestResourceContextDelegater<Server> context(nullptr, self());
-        root_->handleDroppedConnection(context, PathView("/"), dropped);
+        if (const auto dropped = getAuthorResource(connection))
+            tellDropped_sync(dropped);
     }
 
     // What contexts delegate.
@@ -131,14 +130,59 @@ class RestServerBase : public SharedSynchronizable<Server> {
         // Deliberate: exactly this spelling, and tested before the installation,
         // which may find the place taken.
         if (!connections_ && path == "/connections")
-            connections_ = std::dynamic_pointer_cast<ConnectionRestResource>(resource);
+            keepConnections_sync(std::dynamic_pointer_cast<ConnectionRestResource>(resource));
         path.remove_prefix(std::min(path.find_first_not_of('/'), path.size()));
         return root_->installSubResource(PathView(path), std::move(resource));
+    }
+
+    void keepConnections_sync(std::shared_ptr<ConnectionRestResource> connections)
+        PLR_ON(this->ownQueue_)
+    {
+        connections_ = std::move(connections);
+        if (!connections_)
+            return;
+        // A client that takes itself off the list is gone for every resource.
+        connections_->setForgetHandler(
+            whileAlive(this->weak_from_this(),
+                       [](Server& server, const std::shared_ptr<RestResourceConnection>& client) {
+                           server.ownQueue_.assertCurrent();
+                           server.tellDropped_sync(client);
+                       }));
+    }
+
+    void tellDropped_sync(const std::shared_ptr<RestResourceConnection>& client)
+        PLR_ON(this->ownQueue_)
+    {
+        scheduleCleanup_sync();
+        RestResourceContextDelegater<Server> context(nullptr, self());
+        root_->handleDroppedConnection(context, PathView("/"), client);
+    }
+
+    // One sweep for all who drop meanwhile.
+    void scheduleCleanup_sync() PLR_ON(this->ownQueue_)
+    {
+        if (std::exchange(isCleanupDue_, true))
+            return;
+        this->ownQueue_.queue().after(
+            dispatch::time::after(kCleanupDelay),
+            dispatch::block<void()>(whileAlive(this->weak_from_this(), [](Server& server) {
+                server.ownQueue_.assertCurrent();
+                server.cleanup_sync();
+            })));
+    }
+
+    void cleanup_sync() PLR_ON(this->ownQueue_)
+    {
+        isCleanupDue_ = false;
+        RestResourceContextDelegater<Server> context(nullptr, self());
+        root_->cleanupWatchers(context, PathView("/"));
     }
 
     const std::shared_ptr<TreeRestResource> root_ PLR_CONFINED_TO(this->ownQueue_)
     = std::make_shared<TreeRestResource>();
     std::shared_ptr<ConnectionRestResource> connections_ PLR_CONFINED_TO(this->ownQueue_);
+    bool isCleanupDue_ PLR_CONFINED_TO(this->ownQueue_)
+    = false;
 };
 
 }  // namespace plr::rest

@@ -5,6 +5,7 @@
 #include "plr/base/export.h"
 #include "plr/rest/path_map.h"
 #include "plr/rest/resource.h"
+#include "plr/rest/watcher_cleanup.h"
 
 // A TreeRestResource is an inner node of a server's tree: it hands messages to
 // the child that the next segment of the path names.
@@ -16,7 +17,7 @@
 // Names match exactly, byte for byte.
 namespace plr::rest {
 
-class PLR_EXPORT TreeRestResource : public RestResource {
+class PLR_EXPORT TreeRestResource : public RestResource, public WatcherCleanup {
   public:
     TreeRestResource();
     ~TreeRestResource() override;
@@ -34,6 +35,9 @@ class PLR_EXPORT TreeRestResource : public RestResource {
 
     // `path` stands on the "*".
     virtual bool handleMessage_DumpState(RestResourceContext& context, PathView path);
+
+    // Passes it on to every resource below that has it.
+    void cleanupWatchers(RestResourceContext& context, const PathView& path) override;
 
   private:
     PathMap<std::shared_ptr<RestResourceBase>> children_;  // by name

@@ -9,7 +9,8 @@
 #include "plr/rest/resource_connection.h"
 
 // A WatchableRestResourceHelper is a set of watchers, held weakly: a client
-// that goes away expires, and its entry stays until it is cleaned up.
+// that goes away expires, and its entry stays until it is cleaned up. Watchers are
+// known by their owner: the std::shared_ptr that a client has at "/connections".
 //
 // Queue: the server's.
 // Cost:  a search is binary.
