@@ -117,11 +117,12 @@ class RawRestClient {
     bool hasEnded_ = false;
 };
 
-// A server with an anonymous listener, and clients for it.
+// A server with an anonymous listener, or the one given, and clients for it.
 class RestServerRig {
   public:
     explicit RestServerRig(const vox_limits_t& limits = vox_limits_default())
-        : listener_(vox::listener::create_anonymous(&limits)) {
+        : RestServerRig(vox::listener::create_anonymous(&limits)) {}
+    explicit RestServerRig(vox::connection listener) : listener_(std::move(listener)) {
         add("/connections", std::make_shared<rest::ConnectionRestResource>());
         add("/~drops", drops_);  // the last to be told
     }
