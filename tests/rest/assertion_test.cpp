@@ -5,6 +5,7 @@
 #include <map>
 #include <memory>
 #include <regex>
+#include <sstream>
 #include <string>
 
 #include "support/raw_rest_client.h"
@@ -13,11 +14,6 @@ namespace {
 
 using namespace plr::test;
 using namespace plr::rest;
-
-constexpr Operation kGet = Operation::kGet;
-constexpr Operation kSet = Operation::kSet;
-constexpr Operation kPush = Operation::kPush;
-constexpr Operation kPop = Operation::kPop;
 
 // Assertions that remember whether they handled the last message.
 class RecordingAssertions : public AssertionRestResource {
@@ -35,25 +31,18 @@ class PrimedAssertions : public AssertionRestResource {
     PrimedAssertions() { createIfNotPresent("x").generation = 4294967295; }
 };
 
-// What one client does, and what is heard of it then, each as
-// "client path generation state", by the client's name.
+// What one client does, "me grants x 1" or "me asserts x", and what is heard of
+// it: "other x 1 Granted, power x/provider 1 Granted", by the client's name.
 struct Step {
-    const char* client;
-    Operation operation;
-    std::string path;
-    vox::object value;
-    Texts heard;
+    const char* what;
+    const char* heard;
 };
 
-vox::object number(std::int64_t value) {
-    return vox::int64(value);
-}
-
-// A server with assertions at /a, and with their kinds elsewhere; three clients
+// A server with assertions at /a, and with other kinds elsewhere; three clients
 // that it knows, and one, "stranger", that it does not.
-class Assertion : public testing::Test {
-  protected:
-    Assertion() {
+class Parties {
+  public:
+    Parties() {
         rig_.add("/a", assertions_);
         rig_.add("/held", std::make_shared<AssertionRestResource>(hold_off));
         rig_.add("/own", std::make_shared<AssertionRestResource>(provider_only));
@@ -64,63 +53,306 @@ class Assertion : public testing::Test {
         clients_["stranger"] = rig_.client("stranger");
     }
 
+    // Where the steps are from now on.
+    void at(const char* mount) { mount_ = mount; }
     std::string get(const std::string& path) { return clients_["me"]->textAt(path); }
-    // What all clients heard since the last call, of messages that were handled.
-    Texts heard() {
-        static const std::regex state(
-            R"re(^notify (.*) \{"generation": (\d+),"state": "(.*)"\}$)re");
-        Texts all;
+    // Behind what `client` sent before.
+    std::string heard(const std::string& client = "me") {
+        static_cast<void>(clients_[client]->get(""));
+        const std::regex notification("notify (.*) " + mount_ +
+                                      R"re(/(.*) \{"generation": (.*),"state": "\d:k(.*)"\})re");
+        std::string all;
         for (const auto& entry : clients_)
             for (const std::string& message : entry.second->takeMessages())
-                all.push_back(std::regex_replace(message, state, "$1 $2 $3"));
+                all += (all.empty() ? "" : ", ") +
+                       std::regex_replace(message, notification, "$1 $2 $3 $4");
         return all;
     }
-    Texts does(const Step& step) {
-        clients_[step.client]->send(step.operation, step.path, step.value);
-        static_cast<void>(clients_[step.client]->get(""));  // behind the step
-        return heard();
+    std::string does(const std::string& what) {
+        static const std::map<std::string, std::pair<Operation, const char*>> verbs = {
+            {"asserts", {Operation::kPush, ""}},
+            {"releases", {Operation::kPop, ""}},
+            {"provides", {Operation::kPush, "/provider"}},
+            {"leaves", {Operation::kPop, "/provider"}},
+            {"grants", {Operation::kSet, "/granted"}},
+            {"revokes", {Operation::kSet, "/revoked"}},
+        };
+        std::string client;
+        std::string verb;
+        std::string name;
+        std::int64_t generation = 0;
+        std::istringstream(what) >> client >> verb >> name >> generation;
+        const auto& [operation, word] = verbs.at(verb);
+        clients_.at(client)->send(operation, mount_ + '/' + name + word, vox::int64(generation));
+        return heard(client);
     }
     void play(const std::vector<Step>& steps) {
         for (const Step& step : steps)
-            EXPECT_EQ(does(step), step.heard) << step.client << ' ' << asString(step.operation)
-                                              << ' ' << step.path << ' ' << step.value.to_string();
+            EXPECT_EQ(does(step.what), step.heard) << step.what;
     }
     void drop(const char* client) {
         clients_.erase(client);
         ASSERT_TRUE(rig_.waitForDrop());
     }
 
+    RawRestClient& client(const std::string& name) { return *clients_.at(name); }
+    // Whether the last message to /a was handled.
+    [[nodiscard]] bool wasHandled() const {
+        return rig_.queue().sync([this] { return assertions_->handled; });
+    }
+
+  private:
+    std::string mount_ = "/a";
     const std::shared_ptr<RecordingAssertions> assertions_ =
         std::make_shared<RecordingAssertions>();
     RestServerRig rig_;
     std::map<std::string, std::unique_ptr<RawRestClient>> clients_;
 };
 
+class Assertion : public testing::Test, protected Parties {};
+
+// ---- Every operation on every kind of path ---------------------------------------
+
+// The document of "x" that "me" provides and was revoked from, and that "other"
+// waits for, and the same after an effect.
+constexpr const char* kBefore =
+    R"({"generation": 2,"state": "1:kPending","granted": [],"waiting": [0: "other"],)"
+    R"("revoked": [0: "me"],"provider": "me"})";
+constexpr const char* kIsGranted =
+    R"({"generation": 2,"state": "2:kGranted","granted": [0: "other"],"waiting": [],)"
+    R"("revoked": [0: "me"],"provider": "me"})";
+constexpr const char* kIsRevoked =
+    R"({"generation": 3,"state": "1:kPending","granted": [],"waiting": [0: "other"],)"
+    R"("revoked": [0: "me"],"provider": "me"})";
+constexpr const char* kBothWait =
+    R"({"generation": 2,"state": "1:kPending","granted": [],"waiting": (both),)"
+    R"("revoked": [],"provider": "me"})";
+constexpr const char* kIsReleased =
+    R"({"generation": 2,"state": "1:kPending","granted": [],"waiting": [0: "other"],)"
+    R"("revoked": [],"provider": "me"})";
+constexpr const char* kIsLeft =
+    R"({"generation": 2,"state": "1:kPending","granted": [],"waiting": [0: "other"],)"
+    R"("revoked": [0: "me"],"provider": null})";
+
+// What is heard when "me" does something, and the document then.
+struct Effect {
+    const char* heard = "";
+    const char* document = kBefore;
+    bool isHandled = true;
+};
+constexpr Effect kUnhandled = {"", kBefore, false};
+constexpr Effect kGrants = {"me x/provider 2 Granted, other x 2 Granted", kIsGranted};
+constexpr Effect kRevokes = {"me x/provider 3 Pending", kIsRevoked};
+constexpr Effect kAsserts = {"", kBothWait};
+constexpr Effect kReleases = {"", kIsReleased};
+constexpr Effect kProvides = {"me x/provider 2 Pending"};
+constexpr Effect kLeaves = {"", kIsLeft};
+
+std::string dumpOf(const std::string& document) {
+    return R"({"x": )" + document + '}';
+}
+
+// One operation, which wants a reply; none but a GET has one.
+void expectEffect(Operation operation, const char* path, const std::string& reply,
+                  const Effect& effect) {
+    SCOPED_TRACE(asString(operation) + std::string(" of ") + path);
+    Parties parties;
+    for (const char* what : {"me provides x", "me asserts x", "other asserts x", "me grants x 1",
+                             "me revokes x 1", "other asserts x"})
+        parties.does(what);
+    RawRestClient& me = parties.client("me");
+    me.ask(me.message(operation, std::string("/a") + path, vox::int64(2)));
+    EXPECT_EQ(parties.heard(), effect.heard);
+    std::string replies;
+    for (const vox::object& answer : me.replies())
+        replies += oneLine(getReplyValue(vox::dict(answer)));
+    EXPECT_EQ(replies, reply);
+    EXPECT_EQ(parties.wasHandled(), effect.isHandled);
+    const std::regex both(R"re(\[0: "(me|other)",1: "(me|other)"\])re");
+    EXPECT_EQ(std::regex_replace(parties.get("/a/*"), both, "(both)"), dumpOf(effect.document));
+}
+
+TEST(AssertionPath, HasTheEffectOfItsKindAndNoOther) {
+    const struct {
+        const char* path;  // below the resource
+        std::string got;
+        Effect set, push, pop;
+    } rows[] = {
+        {"", R"([0: "x"])", kUnhandled, kUnhandled, kUnhandled},
+        {"/*", dumpOf(kBefore), kUnhandled, kUnhandled, kUnhandled},
+        {"/*/granted", dumpOf(kBefore), kUnhandled, kUnhandled, kUnhandled},
+        {"/x", kBefore, kUnhandled, kAsserts, kReleases},
+        {"/x/other", kBefore, kUnhandled, kAsserts, kReleases},
+        {"/x/Granted/granted", kBefore, kUnhandled, kAsserts, kReleases},
+        {"/x/granted", "[]", kGrants, kUnhandled, kUnhandled},
+        {"/x/granted/below", "[]", kGrants, kUnhandled, kUnhandled},
+        {"/x/revoked", R"([0: "me"])", kRevokes, kUnhandled, kUnhandled},
+        {"/x/waiting", R"([0: "other"])", kUnhandled, kUnhandled, kUnhandled},
+        {"/x/provider", R"("me")", kUnhandled, kProvides, kLeaves},
+        {"/x/provider/below", R"("me")", kUnhandled, kProvides, kLeaves},
+    };
+    for (const auto& row : rows) {
+        expectEffect(Operation::kGet, row.path, row.got, Effect{});
+        expectEffect(Operation::kSet, row.path, "", row.set);
+        expectEffect(Operation::kPush, row.path, "", row.push);
+        expectEffect(Operation::kPop, row.path, "", row.pop);
+        expectEffect(Operation::kNotify, row.path, "", kUnhandled);
+    }
+    // A GET makes no assertion.
+    expectEffect(Operation::kGet, "/y", "null", Effect{});
+    expectEffect(Operation::kGet, "/y/waiting", "[]", Effect{});
+    expectEffect(Operation::kGet, "/y/provider", "null", Effect{});
+}
+
+// ---- What happens ----------------------------------------------------------------
+
 TEST_F(Assertion, IsGrantedToWhoWaitsAndEndsWithTheLast) {
     play({
-        {"power", kPush, "/a/x/provider", {}, {"power /a/x/provider 1 0:kIdle"}},
-        {"me", kPush, "/a/x", {}, {"power /a/x/provider 1 1:kPending"}},
-        {"other", kPush, "/a/x", {}, {}},
-        {"power", kSet, "/a/x/granted", number(2), {}},
-        {"power", kSet, "/a/x/granted", vox::string("1"), {}},
-        {"power", kSet, "/a/y/granted", number(1), {}},
-        {"power",
-         kSet,
-         "/a/x/granted",
-         number(1),
-         {"me /a/x 1 2:kGranted", "other /a/x 1 2:kGranted", "power /a/x/provider 1 2:kGranted"}},
-        {"me", kPush, "/a/x", {}, {}},
-        {"me", kPop, "/a/x", {}, {}},
-        {"me", kPush, "/a/x", {}, {"me /a/x 1 2:kGranted"}},
-        {"me", kPop, "/a/x", {}, {}},
-        {"other", kPop, "/a/x", {}, {"power /a/x/provider 2 0:kIdle"}},
-        {"other", kPop, "/a/x", {}, {}},
-        {"me", kPush, "/a/x", {}, {"power /a/x/provider 2 1:kPending"}},
-        {"power", kSet, "/a/x/granted", number(1), {}},
-        {"me", kPop, "/a/x", {}, {"power /a/x/provider 3 0:kIdle"}},
-        {"me", kPop, "/a/y", {}, {}},
+        {"power provides x", "power x/provider 1 Idle"},
+        {"me asserts x", "power x/provider 1 Pending"},
+        {"other asserts x", ""},
+        {"power grants x 2", ""},
+        {"power grants x 0", ""},
+        {"power grants y 1", ""},
+        {"stranger grants x 1", "me x 1 Granted, other x 1 Granted, power x/provider 1 Granted"},
+        {"me asserts x", ""},
+        {"me releases x", ""},
+        {"me asserts x", "me x 1 Granted"},
+        {"me releases x", ""},
+        {"other releases x", "power x/provider 2 Idle"},
+        {"other releases x", ""},
+        {"me asserts x", "power x/provider 2 Pending"},
+        {"power grants x 1", ""},
+        {"me releases x", "power x/provider 3 Idle"},
+        {"me releases y", ""},
     });
+    EXPECT_EQ(get("/a"), R"([0: "x"])") << "a release and an answer make none";
+    at("a");
+    play({{"me asserts x", "power x/provider 3 Pending"}});
+}
+
+TEST_F(Assertion, IsTakenAwayWithTheOldGenerationAndGrantedAgain) {
+    play({
+        {"me asserts x", ""},
+        {"other asserts x", ""},
+        {"power provides x", "power x/provider 1 Pending"},
+        {"power grants x 1", "me x 1 Granted, other x 1 Granted, power x/provider 1 Granted"},
+        {"power revokes x 2", ""},
+        {"power revokes x 1", "me x 1 Idle, other x 1 Idle, power x/provider 2 Idle"},
+        {"me asserts x", "power x/provider 2 Pending"},
+        {"power revokes x 2", "power x/provider 3 Pending"},
+    });
+    EXPECT_EQ(get("/a/x/revoked"), R"([0: "other"])");
+    play({{"other releases x", ""}});
+    EXPECT_EQ(get("/a/x/revoked"), "[]");
+}
+
+// The provider is told of who waits with the next generation only, and a new
+// generation takes nothing away.
+TEST_F(Assertion, HoldsOffWhoAssertsWhileOthersAreGranted) {
+    at("/held");
+    play({
+        {"power provides x", "power x/provider 1 Idle"},
+        {"me asserts x", "power x/provider 1 Pending"},
+        {"power grants x 1", "me x 1 Granted, power x/provider 1 Granted"},
+        {"other asserts x", ""},
+        {"power revokes x 1", "power x/provider 2 Pending"},
+        {"other releases x", "power x/provider 3 Granted"},
+        {"other asserts x", ""},
+        {"power grants x 3", "other x 3 Granted, power x/provider 3 Granted"},
+        {"other releases x", ""},
+        // Granted and waiting at once: two releases.
+        {"me asserts x", ""},
+        {"me releases x", "power x/provider 4 Pending"},
+        {"me releases x", "power x/provider 5 Idle"},
+    });
+}
+
+TEST_F(Assertion, IsAnsweredByItsProviderAloneWhereThatIsWanted) {
+    at("/own");
+    play({
+        {"me asserts x", ""},
+        {"me grants x 1", ""},
+        {"stranger grants x 1", ""},
+        {"power provides x", "power x/provider 1 Pending"},
+        {"me grants x 1", ""},
+        {"power grants x 1", "me x 1 Granted, power x/provider 1 Granted"},
+        {"me revokes x 1", ""},
+        {"power revokes x 1", "me x 1 Idle, power x/provider 2 Idle"},
+    });
+}
+
+TEST_F(Assertion, GenerationsStartAgainAtOne) {
+    at("/primed");
+    play({
+        {"me asserts x", ""},
+        {"power provides x", "power x/provider 4294967295 Pending"},
+        {"power grants x 4294967295",
+         "me x 4294967295 Granted, power x/provider 4294967295 Granted"},
+        {"power revokes x 4294967295", "me x 4294967295 Idle, power x/provider 1 Idle"},
+    });
+}
+
+TEST_F(Assertion, HasOneProviderWhoMayLeave) {
+    play({
+        {"power provides x", "power x/provider 1 Idle"},
+        {"me leaves x", ""},
+        {"stranger leaves x", ""},
+        {"me asserts x", "power x/provider 1 Pending"},
+        {"me provides x", "me x/provider 1 Pending"},
+        {"power leaves x", ""},
+        {"me releases x", "me x/provider 2 Idle"},
+        {"me leaves x", ""},
+        {"me asserts x", ""},
+        {"me leaves y", ""},
+    });
+    EXPECT_EQ(get("/a/x/provider"), "null");
+    EXPECT_EQ(get("/a/y/provider"), "null");
+}
+
+TEST_F(Assertion, WhoDropsReleases) {
+    play({
+        {"power provides x", "power x/provider 1 Idle"},
+        {"power provides y", "power y/provider 1 Idle"},
+        {"other asserts y", "power y/provider 1 Pending"},
+        {"other asserts x", "power x/provider 1 Pending"},
+        {"power grants x 1", "other x 1 Granted, power x/provider 1 Granted"},
+    });
+    drop("other");
+    EXPECT_EQ(heard(), "power x/provider 2 Idle, power y/provider 2 Idle");
+    play({{"me asserts x", "power x/provider 2 Pending"}});
+    drop("power");
+    EXPECT_EQ(get("/a/x/provider"), "null");
+    play({{"me releases x", ""}});
+}
+
+TEST_F(Assertion, AnUnknownClientHoldsAndProvidesNothingButMakesAssertions) {
+    play({{"stranger asserts x", ""}});
     EXPECT_EQ(get("/a"), R"([0: "x"])");
+    play({
+        {"stranger releases x", ""},
+        {"power provides x", "power x/provider 1 Idle"},
+        {"stranger provides x", ""},
+        {"me asserts x", "power x/provider 1 Pending"},
+    });
+    EXPECT_EQ(get("/a/x/waiting"), R"([0: "me"])");
+}
+
+TEST(AssertionAcquireState, IsReadAsItIsWritten) {
+    const AssertionAcquireState written = {4294967295, AssertionState::kGranted};
+    EXPECT_EQ(oneLine(write_rest_value(written)),
+              R"({"generation": 4294967295,"state": "2:kGranted"})");
+    EXPECT_EQ(oneLine(write_rest_value({1, static_cast<AssertionState>(7)})),
+              R"({"generation": 1,"state": "7:???"})");
+    AssertionAcquireState read;
+    read_rest_value(read, write_rest_value(written));
+    EXPECT_EQ(read, written);
+    read_rest_value(read, vox::string("2:kGranted"));
+    const vox::dict odd = vox::dict::create();
+    odd["generation"] = vox::string("1");
+    odd["state"] = vox::int64(1);
+    read_rest_value(read, odd);
+    EXPECT_EQ(read, written) << "what cannot be read keeps what there was";
 }
 
 }  // namespace
