@@ -4,9 +4,8 @@
 #include <chrono>
 #include <utility>
 
-#include "examples/log_levels.h"
 #include "examples/logging.h"
-#include "examples/remote_log.h"
+#include "examples/radio_tree.h"
 #include "examples/show.h"
 
 namespace radio {
@@ -50,16 +49,10 @@ std::shared_ptr<RadioService> RadioService::create(const std::shared_ptr<plr::Lo
 }
 
 void RadioService::init_sync() {
-    const auto levelsLogger =
-        plr::Logger::create(ownQueue_.queue(), logger().getLogServer(), "log levels",
-                            plr::TrelContext("net.example.radio", "radio.rest"));
-    server_->registerResource("/connections",
-                              std::make_shared<plr::rest::ConnectionRestResource>());
-    server_->registerResource("/radio", std::make_shared<PropertyRestResource>(true));
-    server_->registerResource("/events", std::make_shared<PropertyRestResource>(false));
+    installResources(*server_,
+                     plr::Logger::create(ownQueue_.queue(), logger().getLogServer(), "log levels",
+                                         plr::TrelContext("net.example.radio", "radio.rest")));
     server_->registerResource("/settings", std::make_shared<Settings>(weak_from_this()));
-    server_->registerResource("/log", std::make_shared<LogLevels>(levelsLogger));
-    server_->registerResource("/log_server", std::make_shared<RemoteLog>(logger().getLogServer()));
 }
 
 bool RadioService::serve(const vox::connection& listener, std::function<void()> onFailure) {

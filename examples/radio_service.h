@@ -12,15 +12,10 @@
 
 namespace radio {
 
-// A RadioService has the tree of resources and serves it to clients.
+// A RadioService has the tree of resources (radio_tree.h) and serves it to clients.
+// It acts on what they set itself:
 //
-//   /connections            who is connected
-//   /radio/...              the last value of everything that the modem reported
-//   /events/...             calls and messages as they come; not kept
-//   /settings/...           what clients ask for; status_seconds: a period for
-//                           status lines in the log
-//   /log/DOMAIN             levels of log domains (log_levels.h)
-//   /log_server             an endpoint for clients to log to (remote_log.h)
+//   /settings/status_seconds    a period for status lines in the log
 //
 // Owner:   the std::shared_ptr of create().
 // Queue:   its own has everything: clients' messages, the tree, the timer.

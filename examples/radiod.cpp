@@ -10,7 +10,7 @@
 //
 // systemd may start it (systemd/net.example.radio.service).
 //
-// radio_service.h says what clients find, radio_reports.h which result code
+// radio_tree.h says what clients find, radio_reports.h which result code
 // becomes which path and value.
 
 #include <grp.h>
@@ -26,6 +26,7 @@
 #include "examples/end_signals.h"
 #include "examples/logging.h"
 #include "examples/modem_reader.h"
+#include "examples/power.h"
 #include "examples/radio_service.h"
 #include "vox/service.h"
 
@@ -71,14 +72,18 @@ vox::listener createListener(const std::string& groupName) {
 
 int serve(const Options& options, const std::shared_ptr<plr::LogServer>& logServer,
           radio::EndSignals& end) {
-    const auto service =
-        radio::RadioService::create(logServer, plr::DispatchTimerService::create(logServer));
+    const auto timers = plr::DispatchTimerService::create(logServer);
+    const auto service = radio::RadioService::create(logServer, timers);
     const auto reader = radio::ModemReader::create(
         logServer, options.modem, [service](const std::string& path, const vox::object& value) {
             service->publish(path, value);
         });
+    const auto listener = createListener(options.group);
+    std::shared_ptr<radio::PowerControl> power;
     const plr::StaticLogger logger("radio", logServer);
-    if (service->serve(createListener(options.group), [&end] { end.raise(1); })) {
+    if (service->serve(listener, [&end] { end.raise(1); })) {
+        power = radio::PowerControl::create(logServer, timers,
+                                            vox::endpoint::create(listener).connect());
         radio::log(logger, LogLevel::Notice, "serving ", kService);
         vox_notify_ready();
     }

@@ -80,9 +80,22 @@ class Radiod(unittest.TestCase):
         self.modem_says("RING", "+CSQ: 99,99")  # another writer of the FIFO
         self.assertEqual([self.notified() for _ in range(3)],
                          [("/radio/signal", -73), ("/events/ring", "unspecified"), ("/radio/signal", None)])
-        self.assertEqual(self.get("*"), {
-            "connections": ["python"], "events": {"ring": None, "sms": None}, "log": {}, "settings": {},
-            "radio": {"signal": None}})
+        tree = self.get("*")
+        self.assertIn("python", tree["connections"])
+        self.assertEqual({name: tree[name] for name in ("events", "log", "radio", "settings")}, {
+            "events": {"ring": None, "sms": None}, "log": {}, "radio": {"signal": None}, "settings": {}})
+
+    def test_the_radio_is_on_while_somebody_needs_it(self):
+        path = "/assertions/keep_radio_on"
+        self.watch("/radio/power")
+        self.assertEqual(self.notified(), ("/radio/power", None))
+        for generation in (1, 2):
+            self.client.send(message("push", path))
+            self.assertEqual(self.notified(), ("/radio/power", True))
+            self.assertEqual(self.notified(), (path, {"generation": generation, "state": "2:kGranted"}))
+            self.client.send(message("set", path + "/revoked", generation))  # for the provider alone
+            self.client.send(message("pop", path))
+            self.assertEqual(self.notified(), ("/radio/power", False))
 
     def test_levels_are_set_told_and_taken_back(self):
         self.watch("/radio/signal")
