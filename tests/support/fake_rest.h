@@ -64,9 +64,19 @@ class FakeRestContext : public rest::RestResourceContext {
         to.send(rest::createNotify(author, resource, value));
         return true;
     }
-    bool sendGet(const rest::RestResourceConnection&, const vox::object&, const vox::object&,
-                 const vox::object&, std::shared_ptr<vox::object>) override {
-        return false;
+    bool sendGet(const rest::RestResourceConnection& to, const vox::object& author,
+                 const vox::object& resource, const vox::object& value,
+                 std::shared_ptr<vox::object> autoReply) override {
+        to.sendWithReply(
+            rest::createRestMessage(rest::asObject(rest::Operation::kGet), author, resource, value),
+            dispatch::queue::global(),
+            rest::RestResourceConnection::ReplyHandler(
+                [autoReply = std::move(autoReply)](const vox::object& answer) mutable {
+                    const std::shared_ptr<vox::object> slot = std::move(autoReply);
+                    if (const vox::dict reply(answer); slot && reply)
+                        *slot = rest::getReplyValue(reply);
+                }));
+        return true;
     }
     bool redirect(const std::string& path) override {
         redirects_.push_back(path);
