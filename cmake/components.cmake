@@ -409,6 +409,7 @@ pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
   HEADERS
     include/plr/rest/assertion_resource.h
     include/plr/rest/property_resource.h
+    include/plr/rest/request_resource.h
     include/plr/rest/watchable.h
   SOURCES
     src/rest/assertion_resource.cpp
@@ -416,6 +417,9 @@ pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
     src/rest/property_path.cpp
     src/rest/property_path.h
     src/rest/property_resource.cpp
+    src/rest/request_provider.cpp
+    src/rest/request_provider.h
+    src/rest/request_resource.cpp
     src/rest/watchable.cpp)
 
 pelorin_component(umbrella LEVEL 9 LIBRARY pelorin

@@ -16,6 +16,7 @@
 #include "plr/rest/property_resource.h"
 #include "plr/rest/reconnect_policy.h"
 #include "plr/rest/reply_dict_context.h"
+#include "plr/rest/request_resource.h"
 #include "plr/rest/resource.h"
 #include "plr/rest/resource_connection.h"
 #include "plr/rest/resource_context.h"
