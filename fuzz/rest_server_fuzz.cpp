@@ -12,11 +12,19 @@
 // end it, and nothing that decodes may make a resource throw. The input is one
 // encoded value: a message, or an array of messages for the same server. Each is
 // handled as one that came on no connection, and once more by the resources as
-// one of two known clients that wants an answer.
+// one of two known clients, by turns, that wants an answer. In an array
+//
+//   null    the next client drops, and another comes in its place
+//   string  the next client answers the oldest request that it was sent with it
 namespace {
 
+using plr::rest::asOperation;
+using plr::rest::AssertionRestResource;
 using plr::rest::ConnectionRestResource;
+using plr::rest::Operation;
+using plr::rest::PathView;
 using plr::rest::PropertyRestResource;
+using plr::rest::RequestRestResource;
 using plr::rest::RestServerExample;
 using plr::rest::TreeRestResource;
 using plr::test::FakeRestConnection;
@@ -35,25 +43,60 @@ class Target {
         install("/kept", [] { return std::make_shared<PropertyRestResource>(true); });
         install("/tree", [] { return std::make_shared<TreeRestResource>(); });
         install("/tree/events", [] { return std::make_shared<PropertyRestResource>(false); });
+        install("/asserted", [] { return std::make_shared<AssertionRestResource>(); });
+        install("/strict", [] {
+            return std::make_shared<AssertionRestResource>(plr::rest::hold_off,
+                                                           plr::rest::provider_only);
+        });
+        install("/requests", [] { return std::make_shared<RequestRestResource>(); });
+        install("/queued",
+                [] { return std::make_shared<RequestRestResource>(plr::rest::queue_requests{2}); });
     }
 
-    void handle(const vox::dict& message) {
-        queue_.sync([&] { server_->handleRestMessage(nullptr, message); });
-        const auto& author = clients_[turn_++ % 2];
-        FakeRestContext context(plr::rest::asOperation(message["o"]), message["v"], author);
-        const vox::object resource = message["r"];
-        tree_->handleMessage(context, plr::rest::PathView(resource.text()));
-        for (const vox::object& reply : context.replies())
-            static_cast<void>(plr::rest::createReplyWithValue(message, reply));
-        static_cast<void>(message.to_string());
+    void handle(const vox::object& input) {
+        if (const vox::dict message(input); message)
+            handleMessage(message);
+        else if (!input)
+            drop(turn_++ % 2);
+        else if (input.type() == VOX_TYPE_STRING)
+            answer(*clients_[turn_++ % 2], input);
     }
 
   private:
     template <class Make>
     void install(const char* path, Make make) {
         if (!server_->registerResource(path, make()) ||
-            !tree_->installSubResource(plr::rest::PathView(path), make()))
+            !tree_->installSubResource(PathView(path), make()))
             std::abort();
+    }
+
+    void handleMessage(const vox::dict& message) {
+        queue_.sync([&] { server_->handleRestMessage(nullptr, message); });
+        const Operation operation = asOperation(message["o"]);
+        const std::string_view path = message.text("r");
+        FakeRestContext context(operation, message["v"], clients_[turn_++ % 2]);
+        tree_->handleMessage(context, PathView(path));
+        for (const vox::object& reply : context.replies())
+            static_cast<void>(plr::rest::createReplyWithValue(message, reply));
+        static_cast<void>(message.to_string());
+    }
+
+    // As a server does: every resource is told, then may tidy up.
+    void drop(std::size_t client) {
+        FakeRestContext context(Operation::kNone);
+        tree_->handleDroppedConnection(context, PathView("/"), clients_[client]);
+        clients_[client] = std::make_shared<FakeRestConnection>("another");
+        tree_->cleanupWatchers(context, PathView("/"));
+    }
+
+    static void answer(const FakeRestConnection& client, const vox::object& value) {
+        if (client.replyHandlers.empty())
+            return;
+        const auto handler = std::move(client.replyHandlers.front());
+        client.replyHandlers.erase(client.replyHandlers.begin());
+        const vox::dict reply = vox::dict::create();
+        reply["v"] = value;
+        handler(reply);
     }
 
     const dispatch::queue queue_ = dispatch::queue::create("fuzz");
@@ -70,12 +113,11 @@ class Target {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const vox::object input = decode({data, size});
     Target target;
-    if (const vox::dict message(input); message) {
-        target.handle(message);
-    } else {
-        const vox::array messages(input);
+    if (const vox::array messages(input); messages) {
         for (std::size_t i = 0; i < messages.count(); ++i)
             target.handle(messages[i]);
+    } else {
+        target.handle(input);
     }
     return 0;
 }
