@@ -12,6 +12,7 @@ void installResources(RestServerExample& server, const std::shared_ptr<plr::Logg
     server.registerResource("/radio", std::make_shared<PropertyRestResource>(true));
     server.registerResource("/events", std::make_shared<PropertyRestResource>(false));
     server.registerResource("/assertions", std::make_shared<AssertionRestResource>(provider_only));
+    server.registerResource("/requests", std::make_shared<RequestRestResource>());
     server.registerResource("/log", std::make_shared<LogLevels>(logger));
     server.registerResource("/log_server", std::make_shared<RemoteLog>(logger->getLogServer()));
 }

@@ -97,6 +97,14 @@ class Radiod(unittest.TestCase):
             self.client.send(message("pop", path))
             self.assertEqual(self.notified(), ("/radio/power", False))
 
+    def test_requests_are_answered_by_who_provides_them(self):
+        self.watch("/assertions/keep_radio_on")  # granted by the same
+        self.notified()
+        for resets in (1, 2):
+            self.assertEqual(self.get("/requests/reset_modem"), resets)
+        refused = self.client.request(message("get", "/requests/fly"))
+        self.assertEqual((refused.get("v"), refused["e"]), (None, "no provider"))
+
     def test_levels_are_set_told_and_taken_back(self):
         self.watch("/radio/signal")
         self.assertEqual(self.notified(), ("/radio/signal", None))
