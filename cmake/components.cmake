@@ -367,9 +367,13 @@ pelorin_component(timers LEVEL 5 LIBRARY pelorin
 
 pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
   HEADERS
+    include/plr/rest/access_guard.h
+    include/plr/rest/access_rules.h
     include/plr/rest/connection_resource.h
     include/plr/rest/connector_server.h
     include/plr/rest/context_delegater.h
+    include/plr/rest/description_resource.h
+    include/plr/rest/path_reach.h
     include/plr/rest/path_view.h
     include/plr/rest/reply_dict_context.h
     include/plr/rest/resource.h
@@ -380,7 +384,11 @@ pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
     include/plr/rest/tree_resource.h
     include/plr/rest/watcher_cleanup.h
   SOURCES
+    src/rest/access_guard.cpp
+    src/rest/access_rules.cpp
     src/rest/connection_resource.cpp
+    src/rest/description_resource.cpp
+    src/rest/path_reach.cpp
     src/rest/path_view.cpp
     src/rest/reply_dict_context.cpp
     src/rest/resource.cpp

@@ -53,4 +53,25 @@ PropertyPath parsePropertyPath(PathView path) noexcept {
             first.substr(std::min(at + 1, first.size()))};
 }
 
+int segmentsOf(PropertyPathKind kind) noexcept {
+    switch (kind) {
+        case Kind::Root:
+        case Kind::DumpState:
+        case Kind::Unknown:
+            return 0;
+        case Kind::Meta:
+        case Kind::Resource:
+            return 1;
+        case Kind::MetaWatchers:
+        case Kind::MetaWatched:
+        case Kind::ResourceMeta:
+            return 2;
+        case Kind::ResourceWatchers:
+            return 3;
+        case Kind::MetaWatchedMetaWatchers:
+            return 4;
+    }
+    return 0;
+}
+
 }  // namespace plr::rest

@@ -43,4 +43,7 @@ struct PropertyPath {
 
 [[nodiscard]] PropertyPath parsePropertyPath(PathView path) noexcept;
 
+// How many segments say it; what follows them does not matter.
+[[nodiscard]] int segmentsOf(PropertyPathKind kind) noexcept;
+
 }  // namespace plr::rest

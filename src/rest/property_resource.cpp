@@ -268,6 +268,13 @@ void PropertyRestResource::cleanupWatchers(RestResourceContext& context, const P
     sendWatchedResourcesNotification(context, behind);
 }
 
+Reached PropertyRestResource::reached(Operation operation, const PathView& path) const {
+    const Kind kind = parsePropertyPath(path).kind;
+    PathView behind = path;
+    behind.advance(segmentsOf(kind));
+    return {behind.head(), kind == Kind::DumpState && operation == Operation::kGet};
+}
+
 // ---- Lists ---------------------------------------------------------------------
 
 vox::array PropertyRestResource::getResourceArray() const {

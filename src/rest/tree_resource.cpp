@@ -89,4 +89,15 @@ void TreeRestResource::cleanupWatchers(RestResourceContext& context, const PathV
     }
 }
 
+// The same look-ups as in handleMessage().
+Reached TreeRestResource::reached(Operation operation, const PathView& path) const {
+    if (!path)
+        return {path.full()};
+    if (const auto* child = children_.find(path.current()))
+        return reachedBy(**child, operation, behind(path));
+    if (path.current() == "*")
+        return {path.head(), operation == Operation::kGet};
+    return {path.full()};
+}
+
 }  // namespace plr::rest

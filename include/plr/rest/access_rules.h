@@ -2,13 +2,15 @@
 
 #include <sys/types.h>
 
+#include <initializer_list>
+#include <memory>
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "plr/base/export.h"
 #include "plr/ipc/connection.h"
 #include "plr/rest/operation.h"
+#include "plr/rest/path_reach.h"
 
 // Who may do what at which path of a server (RestServerExample::setAccessRules).
 //
@@ -23,12 +25,25 @@
 // itself: messages that came on no connection. A redirected message needs what
 // its sender needs at either path.
 //
-// Paths are compared by segment, without a leading or trailing '/'; what follows an
-// '@' is a part of a value and has its rules. A GET that reaches a "*" (a dump) is
-// allowed only to who may GET everything that the rules mention below.
+// What counts is where a message arrives, not how its path is spelled
+// (path_reach.h): a '/' more or less, an empty segment, which ends a path, segments
+// behind a property's name, which mean the property, a part of its value ("@…").
+// What shows everything below a path (a "*", a map's own path) is allowed only to who
+// may do the same at each path below that the rules mention.
+//
+// Mind when writing rules:
+// - a PUSH tells values as a GET does;
+// - names are not secret: a tree and a property resource list them to who may GET
+//   there, and say who watches what;
+// - who watches already goes on, whatever rules are set later.
 //
 // A refused message is not handled; one that asks for a reply gets the error
 // "access denied". The kernel says who the sender is (vox/connection.h).
+//
+// Threads: plain data that does not change; copies share it.
+// Cost:    a step for each segment of the path, without allocation; a rule that
+//          names groups asks the kernel for the sender's when nothing else has
+//          allowed it.
 namespace plr::rest {
 
 struct AccessRule {
@@ -42,16 +57,19 @@ struct AccessRule {
 class PLR_EXPORT AccessRules {
   public:
     AccessRules() = default;
-    // Throws std::invalid_argument for a rule whose path has an '@' or a "*".
-    AccessRules(std::vector<AccessRule> rules);
+    // Throws std::invalid_argument for a rule whose path no message has: with an '@',
+    // a segment "*" or an empty one.
+    explicit AccessRules(const std::vector<AccessRule>& rules);
+    AccessRules(std::initializer_list<AccessRule> rules)
+        : AccessRules(std::vector<AccessRule>(rules)) {}
 
-    [[nodiscard]] bool empty() const noexcept { return rules_.empty(); }
-    // `sender`: asked for its groups only when a rule names some.
-    [[nodiscard]] bool allows(Operation operation, std::string_view path,
+    [[nodiscard]] bool empty() const noexcept { return !root_; }
+    [[nodiscard]] bool allows(Operation operation, const Reached& reached,
                               const vox::connection& sender) const;
 
   private:
-    std::vector<AccessRule> rules_;
+    struct Node;
+    std::shared_ptr<const Node> root_;  // null without rules
 };
 
 }  // namespace plr::rest

@@ -23,6 +23,9 @@ class PathMap {
         const auto place = lowerBound(path);
         return isAt(place, path) ? &place->second : nullptr;
     }
+    [[nodiscard]] const Value* find(std::string_view path) const {
+        return const_cast<PathMap&>(*this).find(path);
+    }
     // Puts `value` at `path` unless there is one. The value that is there, and
     // whether it is the new one.
     std::pair<Value*, bool> insert(std::string_view path, Value value) {

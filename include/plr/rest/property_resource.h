@@ -7,6 +7,7 @@
 #include "plr/ipc/array.h"
 #include "plr/ipc/object.h"
 #include "plr/rest/path_map.h"
+#include "plr/rest/path_reach.h"
 #include "plr/rest/resource.h"
 #include "plr/rest/watchable.h"
 #include "plr/rest/watcher_cleanup.h"
@@ -34,7 +35,9 @@
 // Order:   each watcher is notified of SETs in their order.
 namespace plr::rest {
 
-class PLR_EXPORT PropertyRestResource : public RestResource, public WatcherCleanup {
+class PLR_EXPORT PropertyRestResource : public RestResource,
+                                        public WatcherCleanup,
+                                        public PathReach {
   public:
     explicit PropertyRestResource(bool keepValues);
     ~PropertyRestResource() override;
@@ -45,6 +48,8 @@ class PLR_EXPORT PropertyRestResource : public RestResource, public WatcherClean
     bool handleRestMessage_POP(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_NOTIFY(RestResourceContext& context, const PathView& path) override;
     void cleanupWatchers(RestResourceContext& context, const PathView& path) override;
+    // Its own path shows names only.
+    [[nodiscard]] Reached reached(Operation operation, const PathView& path) const override;
 
   private:
     struct Entry;  // a property

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <algorithm>
+#include <cstdint>
 #include <exception>
 #include <memory>
 #include <string>
@@ -11,9 +12,11 @@
 #include "plr/concurrency/shared_synchronizable.h"
 #include "plr/concurrency/while_alive.h"
 #include "plr/ipc/connection.h"
+#include "plr/rest/access_guard.h"
 #include "plr/rest/auto_reply.h"
 #include "plr/rest/connection_resource.h"
 #include "plr/rest/context_delegater.h"
+#include "plr/rest/description_resource.h"
 #include "plr/rest/message.h"
 #include "plr/rest/path_view.h"
 #include "plr/rest/resource.h"
@@ -43,6 +46,42 @@ class RestServerBase : public SharedSynchronizable<Server> {
             return registerResource_sync(path, std::move(resource));
         });
     }
+    // The same, and says what there is (description_resource.h).
+    bool registerResource(std::string path, std::shared_ptr<RestResourceBase> resource,
+                          ResourceDescription description) {
+        if (!registerResource(path, std::move(resource)))
+            return false;
+        describe(std::move(path), std::move(description));
+        return true;
+    }
+    // Says what there is at a path. Any thread, as registerResource().
+    void describe(std::string path, ResourceDescription description) {
+        this->perform([this, &path, &description] {
+            this->ownQueue_.assertCurrent();
+            descriptions_->describe(path, std::move(description));
+        });
+    }
+    // What was said, as a resource to register. Its members are for the queue.
+    [[nodiscard]] std::shared_ptr<DescriptionRestResource> descriptions() const {
+        return descriptions_;
+    }
+
+    // Who may do what, from now on (access_rules.h); none at first. Any thread, as
+    // registerResource().
+    void setAccessRules(AccessRules rules) {
+        this->perform([this, &rules] {
+            this->ownQueue_.assertCurrent();
+            descriptions_->setAccessRules(rules);
+            guard_.setRules(std::move(rules));
+        });
+    }
+    // How many messages, redirected ones too, they have refused. Any thread, the same.
+    [[nodiscard]] std::uint64_t accessRefusals() const {
+        return this->perform([this] {
+            this->ownQueue_.assertCurrent();
+            return guard_.refusals();
+        });
+    }
 
     // Routes one message to the resource that its "r" names. Returns whether it
     // was handled; if not, nobody answers. A service may call it with messages
@@ -52,7 +91,7 @@ class RestServerBase : public SharedSynchronizable<Server> {
         RestResourceContextDelegater<Server> context(message, self());
         // Something that is no string reads as the root. The context's copy of the
         // message keeps the text.
-        return root_->handleMessage(context, PathView(message.text(key::kResource)));
+        return route_sync(context, PathView(message.text(key::kResource)));
     }
 
     // A message of a client; ignored without an "r". No message ends the
@@ -114,7 +153,7 @@ class RestServerBase : public SharedSynchronizable<Server> {
     }
     bool redirect(RestResourceContext& context, const std::string& path) {
         this->ownQueue_.assertCurrent();
-        return root_->handleMessage(context, PathView(path));
+        return route_sync(context, PathView(path));
     }
 
   protected:
@@ -123,6 +162,9 @@ class RestServerBase : public SharedSynchronizable<Server> {
 
   private:
     Server& self() { return static_cast<Server&>(*this); }
+
+    bool route_sync(RestResourceContext& context, const PathView& path) PLR_ON(this->ownQueue_)
+    { return guard_.admits(context, *root_, path) && root_->handleMessage(context, path); }
 
     bool registerResource_sync(std::string_view path, std::shared_ptr<RestResourceBase>&& resource)
         PLR_ON(this->ownQueue_)
@@ -180,7 +222,10 @@ class RestServerBase : public SharedSynchronizable<Server> {
 
     const std::shared_ptr<TreeRestResource> root_ PLR_CONFINED_TO(this->ownQueue_)
     = std::make_shared<TreeRestResource>();
+    const std::shared_ptr<DescriptionRestResource> descriptions_ =
+        std::make_shared<DescriptionRestResource>();
     std::shared_ptr<ConnectionRestResource> connections_ PLR_CONFINED_TO(this->ownQueue_);
+    AccessGuard guard_ PLR_CONFINED_TO(this->ownQueue_);
     bool isCleanupDue_ PLR_CONFINED_TO(this->ownQueue_)
     = false;
 };

@@ -4,6 +4,7 @@
 
 #include "plr/base/export.h"
 #include "plr/rest/path_map.h"
+#include "plr/rest/path_reach.h"
 #include "plr/rest/resource.h"
 #include "plr/rest/watcher_cleanup.h"
 
@@ -17,7 +18,7 @@
 // Names match exactly, byte for byte.
 namespace plr::rest {
 
-class PLR_EXPORT TreeRestResource : public RestResource, public WatcherCleanup {
+class PLR_EXPORT TreeRestResource : public RestResource, public WatcherCleanup, public PathReach {
   public:
     TreeRestResource();
     ~TreeRestResource() override;
@@ -38,6 +39,8 @@ class PLR_EXPORT TreeRestResource : public RestResource, public WatcherCleanup {
 
     // Passes it on to every resource below that has it.
     void cleanupWatchers(RestResourceContext& context, const PathView& path) override;
+    // What the child reaches, or itself; everything below at a "*".
+    [[nodiscard]] Reached reached(Operation operation, const PathView& path) const override;
 
   private:
     PathMap<std::shared_ptr<RestResourceBase>> children_;  // by name
