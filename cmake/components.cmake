@@ -324,6 +324,7 @@ pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
   HEADERS
     include/plr/rest/assertion_state.h
     include/plr/rest/auto_reply.h
+    include/plr/rest/map_change.h
     include/plr/rest/message.h
     include/plr/rest/operation.h
     include/plr/rest/path_map.h
@@ -332,6 +333,7 @@ pelorin_component(rest_message LEVEL 4 LIBRARY pelorin
   SOURCES
     src/rest/assertion_state.cpp
     src/rest/auto_reply.cpp
+    src/rest/map_change.cpp
     src/rest/message.cpp
     src/rest/operation.cpp
     src/rest/typed_value.cpp
@@ -416,11 +418,13 @@ pelorin_component(rest_client LEVEL 5 LIBRARY pelorin
 pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
   HEADERS
     include/plr/rest/assertion_resource.h
+    include/plr/rest/map_resource.h
     include/plr/rest/property_resource.h
     include/plr/rest/request_resource.h
     include/plr/rest/watchable.h
   SOURCES
     src/rest/assertion_resource.cpp
+    src/rest/map_resource.cpp
     src/rest/notify.h
     src/rest/property_path.cpp
     src/rest/property_path.h
@@ -428,6 +432,7 @@ pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
     src/rest/request_provider.cpp
     src/rest/request_provider.h
     src/rest/request_resource.cpp
+    src/rest/value_part.h
     src/rest/watchable.cpp)
 
 pelorin_component(umbrella LEVEL 9 LIBRARY pelorin

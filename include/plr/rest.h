@@ -12,6 +12,8 @@
 #include "plr/rest/auto_reply.h"
 #include "plr/rest/connection_resource.h"
 #include "plr/rest/description_resource.h"
+#include "plr/rest/map_change.h"
+#include "plr/rest/map_resource.h"
 #include "plr/rest/message.h"
 #include "plr/rest/operation.h"
 #include "plr/rest/path_reach.h"

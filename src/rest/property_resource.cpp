@@ -1,14 +1,13 @@
 #include "plr/rest/property_resource.h"
 
-#include <stdexcept>
 #include <string>
 #include <utility>
 
-#include "plr/ipc/read.h"
 #include "plr/ipc/values.h"
 #include "plr/rest/reply_dict_context.h"
 #include "src/rest/notify.h"
 #include "src/rest/property_path.h"
+#include "src/rest/value_part.h"
 
 namespace plr::rest {
 namespace {
@@ -17,16 +16,6 @@ using Kind = PropertyPathKind;
 
 std::string watchedPath(const PathView& path) {
     return path_join(path.head(), "_/watched");
-}
-
-// The part of `value` that a client asked for; null when its path cannot be
-// followed, whatever is wrong with it.
-vox::object partOf(const vox::object& value, std::string_view subpath) {
-    try {
-        return vox::get_subpath(value, std::string(subpath));
-    } catch (const std::logic_error&) {
-        return {};
-    }
 }
 
 }  // namespace
@@ -154,8 +143,6 @@ void PropertyRestResource::handleMessage_Resource_GET(RestResourceContext& conte
     const Entry* entry = keepValues_ ? find(name) : nullptr;
     if (!entry)
         context.sendReplyWithValue(nullptr);
-    else if (subpath.empty())
-        context.sendReplyWithValue(entry->value);
     else
         context.sendReplyWithValue(partOf(entry->value, subpath));
 }

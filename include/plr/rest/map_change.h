@@ -19,19 +19,21 @@
 //       if (change)
 //           change->applyTo(messages);
 //   });
+//
+// No key is in both, none has a NUL. Any thread.
 namespace plr::rest {
 
 struct PLR_EXPORT MapChange {
     bool whole = false;
-    std::vector<std::pair<std::string, vox::object>> set;
-    std::vector<std::string> removed;
+    std::vector<std::pair<std::string, vox::object>> set = {};
+    std::vector<std::string> removed = {};
 
     // Brings a copy of the map up to date.
     void applyTo(std::map<std::string, vox::object>& copy) const;
 };
 
 [[nodiscard]] PLR_EXPORT vox::object write_rest_value(const MapChange& value);
-// Lenient: what is missing is false or empty.
+// Lenient: what is missing, or of another type, is false or empty.
 PLR_EXPORT void read_rest_value(MapChange& out, const vox::object& value);
 
 }  // namespace plr::rest

@@ -1,0 +1,373 @@
+#include "plr/rest/map_resource.h"
+
+#include <gtest/gtest.h>
+
+#include <array>
+#include <map>
+#include <memory>
+#include <random>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "plr/rest/rest_module.h"
+#include "support/raw_rest_client.h"
+
+namespace {
+
+using namespace plr::test;
+using plr::rest::MapChange;
+using plr::rest::MapRestResource;
+using plr::rest::Operation;
+using plr::rest::PathView;
+
+// A map resource that remembers whether it handled the last message.
+struct RecordingMap : MapRestResource {
+    using MapRestResource::MapRestResource;
+    bool handleMessage(plr::rest::RestResourceContext& context, const PathView& path) override {
+        return handled = MapRestResource::handleMessage(context, path);
+    }
+    bool handled = false;  // touched on the server's queue only
+};
+
+// A server with a map that has one entry, "k": {"part": 5}, and one whose entries
+// are owned; a client that is known to it.
+class Map : public testing::Test {
+  protected:
+    Map() {
+        rig_.add("/map", map_);
+        rig_.add("/owned", std::make_shared<MapRestResource>(plr::rest::owned_entries));
+        rig_.start();
+        client_ = rig_.registeredClient("me");
+        set(*client_, "/map/k", valueOfK());
+    }
+
+    static vox::dict valueOfK() {
+        const vox::dict value = vox::dict::create();
+        value["part"] = vox::int64(5);
+        return value;
+    }
+    // Each is handled when it returns.
+    static void send(RawRestClient& client, Operation operation, const char* path,
+                     const vox::object& value = {}) {
+        client.send(operation, path, value);
+        static_cast<void>(client.textAt(""));
+    }
+    static void set(RawRestClient& client, const char* path, const vox::object& value) {
+        send(client, Operation::kSet, path, value);
+    }
+    std::string get(const char* path) { return client_->textAt(path); }
+    Texts news() { return client_->takeMessages(); }
+
+    const std::shared_ptr<RecordingMap> map_ = std::make_shared<RecordingMap>();
+    RestServerRig rig_;
+    std::unique_ptr<RawRestClient> client_;
+};
+
+TEST_F(Map, HandlesTheseMessagesOnly) {
+    const Texts whole = {
+        R"(notify me /map {"whole": true,"set": {"k": {"part": 5}},"removed": []})"};
+    const Texts ofK = {R"(notify me /map/k {"part": 5})"};
+    const struct {
+        const char* path;
+        const char* got;      // "" where a GET is not answered
+        const char* handled;  // of GET, SET (to null), PUSH, POP and NOTIFY
+        Texts pushNews;
+    } rows[] = {
+        {"map", R"({"k": {"part": 5}})", "get push pop ", whole},
+        {"/map/*", R"({"k": {"part": 5}})", "get ", {}},
+        {"/map/_/watchers", "[]", "get ", {}},
+        {"map/k", R"({"part": 5})", "get set push pop ", ofK},
+        {"/map/k@", R"({"part": 5})", "get set push pop ", ofK},
+        {"/map/k@part", "5", "get ", {}},
+        {"/map/k@part.more", "null", "get ", {}},
+        {"/map/new", "null", "get set push pop ", {"notify me /map/new null"}},
+        {"/map/new@part", "null", "get ", {}},
+        {"/map/k/_/watchers", "[]", "get ", {}},
+        {"/map/new/_/watchers", "[]", "get ", {}},
+        {"/map/k/below", "", "", {}},
+        {"/map/k/_", "", "", {}},
+        {"/map/_", "", "", {}},
+        {"/map/_/watched", "", "", {}},
+        {"/map/*/below", "", "", {}},
+        {"/map/@part", "", "", {}},
+    };
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.path);
+        std::string handled;
+        for (const Operation operation : {Operation::kGet, Operation::kSet, Operation::kPush,
+                                          Operation::kPop, Operation::kNotify}) {
+            send(*client_, operation, row.path);
+            if (rig_.queue().sync([this] { return map_->handled; }))
+                handled += plr::rest::asString(operation) + std::string(" ");
+            if (operation == Operation::kSet)
+                set(*client_, "/map/k", valueOfK());
+        }
+        EXPECT_EQ(handled, row.handled);
+        EXPECT_EQ(news(), row.pushNews);
+        if (*row.got) {
+            EXPECT_EQ(get(row.path), row.got);
+        }
+    }
+    client_->send(Operation::kSet, std::string_view("/map/a\0b", 8), vox::int64(1));
+    EXPECT_EQ(get("/map"), R"({"k": {"part": 5}})");
+}
+
+TEST_F(Map, WatchersHearOfEveryChangeOnceUntilTheyPop) {
+    send(*client_, Operation::kPush, "/map");
+    send(*client_, Operation::kPush, "/map/new");
+    news();
+    const auto other = rig_.registeredClient("other");
+    const struct {
+        vox::object value;
+        Texts news;
+    } rows[] = {
+        {vox::int64(1),
+         {"notify me /map/new 1",
+          R"(notify me /map {"whole": false,"set": {"new": 1},"removed": []})"}},
+        {vox::int64(1),
+         {"notify me /map/new 1",
+          R"(notify me /map {"whole": false,"set": {"new": 1},"removed": []})"}},
+        {nullptr,
+         {"notify me /map/new null",
+          R"(notify me /map {"whole": false,"set": {},"removed": [0: "new"]})"}},
+        {nullptr, {}},
+    };
+    for (const auto& row : rows) {
+        set(*other, "map/new", row.value);
+        EXPECT_EQ(news(), row.news);
+    }
+    EXPECT_EQ(get("/map/_/watchers") + get("/map/new/_/watchers"), R"([0: "me"][0: "me"])");
+    send(*client_, Operation::kPop, "/map/new");
+    send(*client_, Operation::kPop, "/map");
+    set(*other, "/map/new", vox::int64(2));
+    EXPECT_EQ(news(), Texts());
+    EXPECT_EQ(get("/map/_/watchers") + get("/map/new/_/watchers"), "[][]");
+}
+
+TEST_F(Map, AnOwnersEntriesAreItsOwnAndGoWithItInOneChange) {
+    send(*client_, Operation::kPush, "/owned");
+    send(*client_, Operation::kPush, "/owned/a");
+    auto owner = rig_.registeredClient("owner");
+    const auto stranger = rig_.client("stranger");
+    const auto service = [this](const char* path, const vox::object& value) {
+        rig_.queue().sync([&] {
+            const vox::dict message = client_->message(Operation::kSet, path, value);
+            rig_.server().handleRestMessage({}, message);
+        });
+    };
+    set(*owner, "/owned/a", vox::int64(1));
+    set(*owner, "/owned/b", vox::int64(2));
+    set(*client_, "/owned/mine", vox::int64(3));
+    service("/owned/service", vox::int64(4));
+    for (const auto* intruder : {client_.get(), stranger.get()})
+        for (const char* path : {"/owned/a", "/owned/service", "/owned/b"})
+            for (const vox::object& value : {vox::object(), vox::int64(9)}) {
+                intruder->send(Operation::kSet, path, value);
+                EXPECT_EQ(intruder->textAt("/owned"), R"({"a": 1,"b": 2,"mine": 3,"service": 4})")
+                    << path;
+            }
+    set(*stranger, "/owned/new", vox::int64(9));
+    service("/owned/b", vox::int64(5));
+    set(*owner, "/owned/c", vox::int64(6));
+    set(*owner, "/owned/c", nullptr);
+    set(*client_, "/owned/c", vox::int64(7));  // the first one's no more
+    static_cast<void>(news());
+    owner.reset();
+    ASSERT_TRUE(rig_.waitForDrop());
+    EXPECT_EQ(news(),
+              (Texts{"notify me /owned/a null",
+                     R"(notify me /owned {"whole": false,"set": {},"removed": [0: "a",1: "b"]})"}));
+    EXPECT_EQ(get("/owned"), R"({"c": 7,"mine": 3,"service": 4})");
+    set(*client_, "/owned/a", vox::int64(8));
+    EXPECT_EQ(get("/owned/a"), "8") << "who comes next owns it";
+}
+
+TEST_F(Map, AModuleKeepsACopy) {
+    const dispatch::queue queue = dispatch::queue::create("module");
+    plr::RestModule module(queue, "module");
+    std::map<std::string, vox::object> copy;
+    Event changed;
+    queue.sync([&] {
+        module.watch<MapChange>("/map", [&](const std::optional<MapChange>& change) {
+            ASSERT_TRUE(change);
+            change->applyTo(copy);
+            changed.signal();
+        });
+        module.connect(rig_.connect());
+    });
+    ASSERT_TRUE(changed.wait());
+    set(*client_, "/map/k", nullptr);
+    set(*client_, "/map/new", vox::int64(1));
+    ASSERT_TRUE(changed.wait() && changed.wait());
+    const std::map<std::string, vox::object> expected = {{"new", vox::int64(1)}};
+    queue.sync([&] {
+        EXPECT_EQ(copy, expected);
+        std::exchange(module, plr::RestModule()).disconnect();
+    });
+    drain(queue);
+}
+
+TEST(MapChange, ReadsLeniently) {
+    const vox::dict odd = vox::dict::create();
+    odd["whole"] = vox::string("yes");
+    odd["set"] = vox::array::create();
+    const vox::array removed = vox::array_creator()("a");
+    removed.append(vox::int64(5));
+    odd["removed"] = removed;
+    for (const vox::object& value : {vox::object(odd), vox::object(), vox::object(removed)}) {
+        MapChange change{.whole = true, .set = {{"x", vox::int64(1)}}, .removed = {"b"}};
+        read_rest_value(change, value);
+        EXPECT_EQ(change.whole, false);
+        EXPECT_TRUE(change.set.empty());
+        EXPECT_EQ(change.removed, value == odd ? Texts{"a"} : Texts());
+    }
+}
+
+// ---- Without connections -----------------------------------------------------------
+
+using Client = std::shared_ptr<FakeRestConnection>;
+
+bool tell(MapRestResource& map, Operation operation, const std::string& path, const Client& client,
+          const vox::object& value = {}) {
+    FakeRestContext context(operation, value, client);
+    PathView view(path);
+    view.advance(1);
+    return map.handleMessage(context, view);
+}
+
+TEST(MapLimits, HoldForEntriesAndForWatchedKeysUntilTheyGo) {
+    MapRestResource map(2);
+    auto client = std::make_shared<FakeRestConnection>("client");
+    for (const char* key : {"/map/a", "/map/b"}) {
+        EXPECT_TRUE(tell(map, Operation::kPush, key, client));
+        EXPECT_TRUE(tell(map, Operation::kPush, key, client));
+    }
+    EXPECT_FALSE(tell(map, Operation::kPush, "/map/c", client));
+    EXPECT_TRUE(tell(map, Operation::kPop, "/map/b", client));
+    EXPECT_TRUE(tell(map, Operation::kPush, "/map/c", client));
+    // Watched keys do not take the place of entries.
+    EXPECT_TRUE(tell(map, Operation::kSet, "/map/x", client, vox::int64(1)));
+    EXPECT_TRUE(tell(map, Operation::kSet, "/map/a", client, vox::int64(1)));
+    EXPECT_FALSE(tell(map, Operation::kSet, "/map/c", client, vox::int64(1)));
+    EXPECT_TRUE(tell(map, Operation::kSet, "/map/a", client, vox::int64(2)));
+    EXPECT_TRUE(tell(map, Operation::kSet, "/map/x", client));
+    EXPECT_TRUE(tell(map, Operation::kSet, "/map/c", client, vox::int64(1)));
+
+    client = std::make_shared<FakeRestConnection>("next");
+    EXPECT_FALSE(tell(map, Operation::kPush, "/map/d", client));
+    FakeRestContext context(Operation::kNone);
+    map.cleanupWatchers(context, PathView("/map"));
+    EXPECT_TRUE(tell(map, Operation::kPush, "/map/d", client));
+    EXPECT_TRUE(tell(map, Operation::kPush, "/map/e", client));
+}
+
+// A map of its own kind beside the resource; clients who keep copies by what they are
+// told. Every step, all of them agree.
+class MapModel {
+  public:
+    explicit MapModel(bool areOwned)
+        : areOwned_(areOwned),
+          map_(areOwned ? MapRestResource(plr::rest::owned_entries) : MapRestResource()) {}
+
+    void step(std::mt19937& random) {
+        Watcher& watcher = watchers_.at(random() % watchers_.size());
+        const std::string key(1, static_cast<char>('a' + random() % 8));
+        switch (random() % 16) {
+            case 0:
+                drop(watcher);
+                break;
+            case 1:
+                tell(map_, Operation::kPush, "/map", watcher.client);
+                watcher.isWatching = watcher.isToBeTold = true;
+                break;
+            case 2:
+                tell(map_, Operation::kPop, "/map", watcher.client);
+                watcher.isWatching = false;
+                break;
+            case 3:
+                cleanup();
+                break;
+            default:
+                const bool isRemoval = random() % 3 == 0;
+                set(watcher, key, isRemoval ? vox::object() : vox::int64(random() % 100));
+        }
+        compare();
+    }
+
+  private:
+    struct Watcher {
+        Client client = std::make_shared<FakeRestConnection>("watcher");
+        bool isWatching = false;
+        bool isToBeTold = false;  // of this step
+        std::map<std::string, vox::object> copy = {};
+    };
+
+    void set(const Watcher& watcher, const std::string& key, const vox::object& value) {
+        const auto owner = owners_.find(key);
+        const bool isAllowed =
+            !areOwned_ || owner == owners_.end() || owner->second == watcher.client;
+        EXPECT_EQ(tell(map_, Operation::kSet, "/map/" + key, watcher.client, value), isAllowed);
+        if (!isAllowed || (!value && !model_.count(key)))
+            return;
+        if (value) {
+            model_[key] = value;
+            owners_[key] = watcher.client;
+        } else {
+            model_.erase(key);
+            owners_.erase(key);
+        }
+        everybodyIsToBeTold();
+    }
+    void drop(Watcher& watcher) {
+        FakeRestContext context(Operation::kNone);
+        map_.handleDroppedConnection(context, PathView("/map"), watcher.client);
+        const std::size_t gone = !areOwned_ ? 0 : std::erase_if(model_, [&](const auto& entry) {
+            return owners_.at(entry.first) == watcher.client;
+        });
+        std::erase_if(owners_, [&](const auto& entry) { return entry.second == watcher.client; });
+        EXPECT_TRUE(watcher.client->sent.empty()) << "who went is told nothing";
+        watcher = Watcher();
+        if (gone > 0)
+            everybodyIsToBeTold();
+    }
+    void cleanup() {
+        FakeRestContext context(Operation::kNone);
+        map_.cleanupWatchers(context, PathView("/map"));
+    }
+    void everybodyIsToBeTold() {
+        for (Watcher& watcher : watchers_)
+            watcher.isToBeTold = watcher.isWatching;
+    }
+    void compare() {
+        for (Watcher& watcher : watchers_) {
+            ASSERT_EQ(watcher.client->sent.size(),
+                      std::exchange(watcher.isToBeTold, false) ? 1 : 0);
+            for (const vox::dict& message : std::exchange(watcher.client->sent, {})) {
+                MapChange change;
+                read_rest_value(change, message["v"]);
+                change.applyTo(watcher.copy);
+            }
+            if (watcher.isWatching) {
+                ASSERT_EQ(watcher.copy, model_);
+            }
+        }
+    }
+
+    const bool areOwned_;
+    MapRestResource map_;
+    std::map<std::string, vox::object> model_;
+    std::map<std::string, Client> owners_;  // who made the entry
+    std::array<Watcher, 6> watchers_;
+};
+
+TEST(MapModel, CopiesByWhatWatchersAreToldEqualTheMapAtEveryStep) {
+    for (const bool areOwned : {false, true}) {
+        std::mt19937 random(7);
+        MapModel model(areOwned);
+        for (int i = 0; i < 20'000 && !testing::Test::HasFailure(); i++)
+            model.step(random);
+    }
+}
+
+}  // namespace
