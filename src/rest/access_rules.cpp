@@ -95,7 +95,11 @@ bool AccessRules::allows(Operation operation, const Reached& reached,
             deciding = node;
         if (!path)
             break;
-        const auto* found = node->below.find(nameIn(path.current()));
+        const std::string_view name = nameIn(path.current());
+        const bool isOtherName = name != path.current() && !reached.splitsNames;
+        if (isOtherName && deciding && !deciding->allows(operation, sender))
+            return false;
+        const auto* found = node->below.find(name);
         node = found ? found->get() : nullptr;
     }
     if (deciding && !deciding->allows(operation, sender))

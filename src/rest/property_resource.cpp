@@ -259,7 +259,9 @@ Reached PropertyRestResource::reached(Operation operation, const PathView& path)
     const Kind kind = parsePropertyPath(path).kind;
     PathView behind = path;
     behind.advance(segmentsOf(kind));
-    return {behind.head(), kind == Kind::DumpState && operation == Operation::kGet};
+    return {.path = behind.head(),
+            .everythingBelow = kind == Kind::DumpState && operation == Operation::kGet,
+            .splitsNames = true};
 }
 
 // ---- Lists ---------------------------------------------------------------------

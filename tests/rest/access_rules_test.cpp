@@ -145,6 +145,7 @@ class AccessRulesOfAServer : public testing::Test {
         rig.add("/kept", std::make_shared<PropertyRestResource>(true));
         rig.add("/t", std::make_shared<TreeRestResource>());
         rig.add("/t/kept", std::make_shared<PropertyRestResource>(true));
+        rig.add("/t/open", std::make_shared<Open>());
         rig.start();
         client = rig.registeredClient("me");
     }
@@ -173,6 +174,8 @@ TEST_F(AccessRulesOfAServer, TheLongestPathThatNamesTheOperationDecides) {
         {.path = "/t/kept/either", .users = {kStranger}},
         {.path = "/t/kept/either", .everybody = true},
         {.path = "/t/kept/unknown", .users = {static_cast<uid_t>(-1)}},
+        {.path = "/t/open", .users = {kStranger}},
+        {.path = "/t/open/mine", .users = {kMe}},
     });
     const struct {
         Operation operation;
@@ -199,6 +202,9 @@ TEST_F(AccessRulesOfAServer, TheLongestPathThatNamesTheOperationDecides) {
         {Operation::kGet, "/kept/set", true},
         {Operation::kGet, "/t", false},
         {Operation::kSet, "/t/kept/mine", true},
+        {Operation::kGet, "/t/kept/mine@part", true},
+        {Operation::kGet, "/t/open/mine", true},
+        {Operation::kGet, "/t/open/mine@part", false},   // or a name below /t/open
         {Operation::kSet, "/t/kept/mine/deeper", true},  // means the property
         {Operation::kGet, "/t/kept/ours", true},
         {Operation::kGet, "/t/kept/theirs", false},

@@ -28,6 +28,8 @@
 // What counts is where a message arrives, not how its path is spelled
 // (path_reach.h): a '/' more or less, an empty segment, which ends a path, segments
 // behind a property's name, which mean the property, a part of its value ("@…").
+// Where an '@' may also belong to a name, both must be allowed: what is named before
+// it, and what the name is below.
 // What shows everything below a path (a "*", a map's own path) is allowed only to who
 // may do the same at each path below that the rules mention.
 //

@@ -18,6 +18,7 @@ namespace plr::rest {
 struct Reached {
     std::string_view path;         // from the root; lent by the message's path
     bool everythingBelow = false;  // and all that is below that path
+    bool splitsNames = false;      // what follows an '@' is a part of a value, not of a name
 };
 
 class PLR_EXPORT PathReach {
