@@ -5,6 +5,7 @@
 #include <sys/mman.h>
 #include <sys/prctl.h>
 
+#include <algorithm>
 #include <array>
 #include <atomic>
 #include <condition_variable>

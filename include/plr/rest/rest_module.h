@@ -73,7 +73,8 @@ class PLR_EXPORT RestModule {
     // connection cannot be made or ends, with the policy's pauses, until
     // disconnect(), another connect or the module's end. The registrations go
     // first, then a GET of "": any answer to it, a refusal too, says that the
-    // service is reached. Throws std::invalid_argument for a bad policy.
+    // service is reached. One that ends when idle, and is started by its socket, is
+    // thus started again. Throws std::invalid_argument for a bad policy.
     void connectToService(const std::string& serviceName, const ReconnectPolicy& policy = {}) const;
     // Closes the connection, once everything sent was handed to the kernel.
     void disconnect() const;
