@@ -66,6 +66,32 @@ void RestModuleState::disconnect() {
     tellOfTheEnd_sync(stop_sync());
 }
 
+bool RestModuleState::isConnected() const {
+    ownQueue_.assertCurrent();
+    return connector_.isConnected();
+}
+
+void RestModuleState::setConnectionHandler(std::function<void(bool)> handler) {
+    ownQueue_.assertCurrent();
+    connectionHandler_ = std::move(handler);
+}
+
+void RestModuleState::setServerErrorHandler(Handler handler) {
+    ownQueue_.assertCurrent();
+    serverErrorHandler_ = std::move(handler);
+}
+
+void RestModuleState::flush(const dispatch::group& group) const {
+    ownQueue_.assertCurrent();
+    connector_.flush(group);
+}
+
+void RestModuleState::flush() const {
+    const dispatch::group group;
+    execute_wrapped_sync([this, &group] { flush(group); });
+    static_cast<void>(group.wait());
+}
+
 void RestModuleState::handleServerError(const vox::object& error) {
     ownQueue_.assertCurrent();
     const EndedConnection ended = stop_sync();
@@ -150,32 +176,6 @@ void RestModuleState::probeAnswered_sync(const vox::object& reply) {
     isReached_ = true;
     if (const auto handler = connectionHandler_)
         handler(true);
-}
-
-bool RestModuleState::isConnected() const {
-    ownQueue_.assertCurrent();
-    return connector_.isConnected();
-}
-
-void RestModuleState::setConnectionHandler(std::function<void(bool)> handler) {
-    ownQueue_.assertCurrent();
-    connectionHandler_ = std::move(handler);
-}
-
-void RestModuleState::setServerErrorHandler(Handler handler) {
-    ownQueue_.assertCurrent();
-    serverErrorHandler_ = std::move(handler);
-}
-
-void RestModuleState::flush(const dispatch::group& group) const {
-    ownQueue_.assertCurrent();
-    connector_.flush(group);
-}
-
-void RestModuleState::flush() const {
-    const dispatch::group group;
-    execute_wrapped_sync([this, &group] { flush(group); });
-    static_cast<void>(group.wait());
 }
 
 // ---- Registrations -----------------------------------------------------------------------

@@ -151,8 +151,8 @@ TEST(AutomaticReconnection, EndsWithTheNextConnection) {
     RawRestClient server(theirs, "server");
     Client client;
     Event waited;
-    client.on([&] {
-        client.module.setServerErrorHandler([&, mine = mine](const vox::object&) {
+    client.on([&, mine = mine] {
+        client.module.setServerErrorHandler([&, mine](const vox::object&) {
             client.module.connect(mine);  // an attempt is due in 2 ms at most
             client.queue.after(dispatch::time::after(20ms),
                                dispatch::block<void()>([&] { waited.signal(); }));
