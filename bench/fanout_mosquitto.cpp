@@ -1,7 +1,7 @@
 // The mosquitto broker, started here on a Unix socket of its own, with clients
-// that speak MQTT 3.1.1 (OASIS standard, 2014) by hand: QoS 0, one topic, each
-// watcher a connection of its own. Packets here are shorter than 128 bytes, so
-// that their length is one byte.
+// that speak MQTT 3.1.1 (OASIS standard, 2014) by hand: QoS 0, one topic whose
+// value is retained, as our properties keep theirs; each watcher a connection of its
+// own. Packets here are shorter than 128 bytes, so that their length is one byte.
 
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -31,8 +31,9 @@ std::string packet(unsigned char type, const std::string& body) {
     return std::string{static_cast<char>(type), static_cast<char>(body.size())} + body;
 }
 
+// QoS 0, retained; as long as what the watchers get, which lacks that bit.
 std::string publishPacket() {
-    return packet(0x30, text(bench::fanout_cases::kPath).append(bench::fanout_cases::kValue));
+    return packet(0x31, text(bench::fanout_cases::kPath).append(bench::fanout_cases::kValue));
 }
 
 // Null when nobody listens yet.

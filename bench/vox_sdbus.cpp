@@ -3,34 +3,25 @@
 // which the receiver reads; one way, calls that ask for no reply.
 
 #include <sys/socket.h>
-#include <systemd/sd-bus.h>
 #include <unistd.h>
 
 #include <array>
-#include <cerrno>
 #include <cstddef>
 #include <string>
 #include <vector>
 
+#include "bench/support/sdbus.h"
 #include "bench/vox_cases.h"
 
 namespace {
 
+using bench::sdbus::succeed;
 using bench::vox_cases::Case;
 using bench::vox_cases::kEntries;
 
 constexpr const char* kPath = "/bench";
 constexpr const char* kInterface = "net.example.Bench";
 constexpr std::uint64_t kFlushEvery = 1'024;  // messages; its queue is bounded
-
-// sd-bus returns negative error numbers.
-int succeed(int result, const char* what) {
-    if (result < 0) {
-        errno = -result;
-        bench::fail(what);
-    }
-    return result;
-}
 
 sd_bus* start(int fd, bool server) {
     sd_bus* bus = nullptr;
@@ -98,13 +89,7 @@ void serve(const Case& measured, int fd) {
     Server server{measured};
     sd_bus* bus = start(fd, true);
     succeed(::sd_bus_add_filter(bus, nullptr, handleMessage, &server), "sd_bus_add_filter");
-    for (;;) {
-        const int handled = ::sd_bus_process(bus, nullptr);
-        if (handled < 0)
-            return;
-        if (handled == 0)
-            ::sd_bus_wait(bus, UINT64_MAX);
-    }
+    bench::sdbus::serve(bus);
 }
 
 sd_bus_message* makeCall(sd_bus* bus, const void* data) {

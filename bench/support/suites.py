@@ -50,6 +50,7 @@ ZEROMQ = "ZeroMQ"
 RELAY = "raw relay"
 RELAY_BATCHED = "raw relay, batched"
 MOSQUITTO = "mosquitto"
+DBUS = "D-Bus PropertiesChanged"
 LIBUV = "libuv"
 LIBEVENT = "libevent"
 ASIO_TIMERS = "Asio steady_timer"
@@ -105,16 +106,17 @@ def vox():
 
 
 def fanout():
-    programs = {OURS: "fanout_pelorin", RELAY: "fanout_raw", MOSQUITTO: "fanout_mosquitto"}
+    programs = {OURS: "fanout_pelorin", RELAY: "fanout_raw", MOSQUITTO: "fanout_mosquitto",
+                DBUS: "fanout_dbus"}
     for count in (1, 100, 1000):
         held = () if count == 1 else (Bar((RELAY,), 1.5, "at most 1.5 times"),
-                                      Bar((MOSQUITTO,), 1.0, "ahead"))
+                                      Bar((MOSQUITTO,), 1.0, "ahead"), Bar((DBUS,), 1.0, "ahead"))
         yield Measurement("fanout", f"SET to the last of {count:,} watchers, p50", "us",
                           {peer: Cell(program, ("latency", str(count)), "p50_us")
                            for peer, program in programs.items()}, held)
     for count in (1, 100, 1000):
         held = () if count == 1 else (Bar((RELAY,), 1 / 1.5, "within 1.5 times"),
-                                      Bar((MOSQUITTO,), 1.0, "ahead"))
+                                      Bar((MOSQUITTO,), 1.0, "ahead"), Bar((DBUS,), 1.0, "ahead"))
         yield Measurement("fanout", f"deliveries to {count:,} watchers", "million/s",
                           {**{peer: Cell(program, ("rate", str(count)), "million_per_s")
                               for peer, program in programs.items()},
