@@ -6,6 +6,7 @@
 #include <optional>
 
 #include "plr/ipc/dict.h"
+#include "plr/ipc/read.h"
 #include "plr/ipc/values.h"
 
 namespace radio {
@@ -181,6 +182,12 @@ Reading readLine(const AtLine& line) {
     if (Value value = code->read(line))
         return {code->path, std::move(*value), nullptr};
     return {{}, {}, "malformed"};
+}
+
+std::string placeOf(const vox::object& message) {
+    const vox::dict place(message);
+    const unsigned long index = vox::dyn_cast_or_default(place["index"], 0UL);
+    return std::string(place.text("memory")) + '-' + std::to_string(index);
 }
 
 }  // namespace radio

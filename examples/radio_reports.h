@@ -33,4 +33,7 @@ struct Reading {
 // Answers to commands, such as "OK", are understood and report nothing.
 [[nodiscard]] Reading readLine(const AtLine& line);
 
+// Where a message of /events/sms is kept, as a word: SM-3.
+[[nodiscard]] std::string placeOf(const vox::object& message);
+
 }  // namespace radio

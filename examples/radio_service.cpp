@@ -1,10 +1,10 @@
 #include "examples/radio_service.h"
 
-#include <algorithm>
 #include <chrono>
 #include <utility>
 
 #include "examples/logging.h"
+#include "examples/radio_reports.h"
 #include "examples/radio_tree.h"
 #include "examples/show.h"
 
@@ -52,7 +52,8 @@ void RadioService::init_sync() {
     installResources(*server_,
                      plr::Logger::create(ownQueue_.queue(), logger().getLogServer(), "log levels",
                                          plr::TrelContext("net.example.radio", "radio.rest")));
-    server_->registerResource("/settings", std::make_shared<Settings>(weak_from_this()));
+    server_->registerResource("/settings", std::make_shared<Settings>(weak_from_this()),
+                              {"properties", "What clients want the service to do."});
 }
 
 bool RadioService::serve(const vox::connection& listener, std::function<void()> onFailure) {
@@ -80,10 +81,16 @@ void RadioService::publish(const std::string& path, const vox::object& value) {
 }
 
 void RadioService::publish_sync(const std::string& path, const vox::object& value) {
-    using plr::rest::Operation;
     published_++;
     if (enabled(LogLevel::Info))
         forceLog(LogLevel::Info, plr::LogMessageBuffer() << path << " = " << oneLine(value));
+    set_sync(path, value);
+    if (path == "/events/sms")  // the modem keeps it
+        set_sync("/messages/" + placeOf(value), value);
+}
+
+void RadioService::set_sync(const std::string& path, const vox::object& value) {
+    using plr::rest::Operation;
     server_->handleRestMessage(
         nullptr, plr::rest::createRestMessage(asObject(Operation::kSet), vox::string("radiod"),
                                               vox::string(path), value));

@@ -39,6 +39,7 @@ class RadioService : public plr::SharedLoggable<RadioService> {
                  std::shared_ptr<plr::TimerService> timers);
     void init_sync() PLR_ON(ownQueue_);
     void publish_sync(const std::string& path, const vox::object& value) PLR_ON(ownQueue_);
+    void set_sync(const std::string& path, const vox::object& value) PLR_ON(ownQueue_);
     void applySetting_sync(const std::string& name, const vox::object& value) PLR_ON(ownQueue_);
     void setStatusPeriod_sync(std::int64_t seconds) PLR_ON(ownQueue_);
 

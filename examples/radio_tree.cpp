@@ -1,20 +1,68 @@
 #include "examples/radio_tree.h"
 
+#include <unistd.h>
+
 #include "examples/log_levels.h"
 #include "examples/remote_log.h"
 
 namespace radio {
+namespace {
 
 using namespace plr::rest;
 
+constexpr std::size_t kStoredMessages = 1000;
+
+constexpr struct {
+    const char *path, *type, *doc;
+} kDescriptions[] = {
+    {"/radio/operator", "string", "The network's name; null while there is none."},
+    {"/radio/power", "bool", "Whether the radio is on."},
+    {"/radio/registration", "dictionary", "Whether a network takes calls, and where."},
+    {"/radio/signal", "int64", "Signal strength in dBm; null when it is not known."},
+    {"/radio/sim", "string", "READY, or what the card waits for."},
+    {"/assertions/keep_radio_on", "assertion", "Keeps the radio on while somebody holds it."},
+    {"/requests/reset_modem", "request", "Answers the number of resets when the modem is back."},
+    {"/settings/airplane_mode", "bool", "Kept for whom it concerns."},
+    {"/settings/status_seconds", "int64", "Period of status lines in the log; 0 ends them."},
+};
+
+// Others watch, hold and ask. Reports, grants and answers come from this user only.
+void restrictAccess(RestServerExample& server) {
+    const uid_t self = ::geteuid();
+    const auto only = [self](const char* path, Operation operation) {
+        return AccessRule{.path = path, .operations = {operation}, .users = {self}};
+    };
+    server.setAccessRules({
+        only("/radio", Operation::kSet),
+        only("/events", Operation::kSet),
+        only("/assertions/keep_radio_on/provider", Operation::kPush),
+        only("/requests", Operation::kPush),
+    });
+}
+
+}  // namespace
+
 void installResources(RestServerExample& server, const std::shared_ptr<plr::Logger>& logger) {
-    server.registerResource("/connections", std::make_shared<ConnectionRestResource>());
-    server.registerResource("/radio", std::make_shared<PropertyRestResource>(true));
-    server.registerResource("/events", std::make_shared<PropertyRestResource>(false));
-    server.registerResource("/assertions", std::make_shared<AssertionRestResource>(provider_only));
-    server.registerResource("/requests", std::make_shared<RequestRestResource>());
-    server.registerResource("/log", std::make_shared<LogLevels>(logger));
-    server.registerResource("/log_server", std::make_shared<RemoteLog>(logger->getLogServer()));
+    server.registerResource("/connections", std::make_shared<ConnectionRestResource>(),
+                            {"array", "Who is connected."});
+    server.registerResource("/radio", std::make_shared<PropertyRestResource>(true),
+                            {"properties", "What the modem reported last."});
+    server.registerResource("/events", std::make_shared<PropertyRestResource>(false),
+                            {"events", "Calls and messages as they come."});
+    server.registerResource("/messages", std::make_shared<MapRestResource>(kStoredMessages),
+                            {"map", "Messages that the modem keeps; null removes one."});
+    server.registerResource("/assertions", std::make_shared<AssertionRestResource>(provider_only),
+                            {"assertions", "What clients need."});
+    server.registerResource("/requests", std::make_shared<RequestRestResource>(),
+                            {"requests", "What clients ask for."});
+    server.registerResource("/log", std::make_shared<LogLevels>(logger),
+                            {"properties", "Levels of log domains by name; null takes one back."});
+    server.registerResource("/log_server", std::make_shared<RemoteLog>(logger->getLogServer()),
+                            {"endpoint", "Where clients log to."});
+    server.registerResource("/descriptions", server.descriptions());
+    for (const auto& [path, type, doc] : kDescriptions)
+        server.describe(path, {type, doc});
+    restrictAccess(server);
 }
 
 }  // namespace radio

@@ -8,10 +8,8 @@
 //                   or the path of a file
 //   --group NAME    its members may be clients; without it only this user and root
 //
-// systemd may start it (systemd/net.example.radio.service).
-//
-// radio_tree.h says what clients find, radio_reports.h which result code
-// becomes which path and value.
+// systemd may start it (systemd/net.example.radio.service). radio_tree.h says what
+// clients find, radio_reports.h which result code becomes which path and value.
 
 #include <grp.h>
 
@@ -31,8 +29,6 @@
 #include "vox/service.h"
 
 namespace {
-
-using plr::LogLevel;
 
 constexpr const char* kService = "net.example.radio";
 
@@ -75,22 +71,21 @@ int serve(const Options& options, const std::shared_ptr<plr::LogServer>& logServ
     const auto timers = plr::DispatchTimerService::create(logServer);
     const auto service = radio::RadioService::create(logServer, timers);
     const auto reader = radio::ModemReader::create(
-        logServer, options.modem, [service](const std::string& path, const vox::object& value) {
-            service->publish(path, value);
-        });
+        logServer, options.modem,
+        [service](const auto& path, const auto& value) { service->publish(path, value); });
     const auto listener = createListener(options.group);
     std::shared_ptr<radio::PowerControl> power;
     const plr::StaticLogger logger("radio", logServer);
     if (service->serve(listener, [&end] { end.raise(1); })) {
         power = radio::PowerControl::create(logServer, timers,
                                             vox::endpoint::create(listener).connect());
-        radio::log(logger, LogLevel::Notice, "serving ", kService);
+        radio::log(logger, plr::LogLevel::Notice, "serving ", kService);
         vox_notify_ready();
     }
     reader->start();
     const int status = end.wait();
     vox_notify_stopping();
-    radio::log(logger, LogLevel::Notice, "ending");
+    radio::log(logger, plr::LogLevel::Notice, "ending");
     return status;
 }
 
@@ -101,7 +96,7 @@ int run(const Options& options, radio::EndSignals& end) {
     try {
         return serve(options, logServer, end);
     } catch (const std::exception& error) {
-        radio::log(plr::StaticLogger("radio", logServer), LogLevel::Fatal, error.what());
+        radio::log(plr::StaticLogger("radio", logServer), plr::LogLevel::Fatal, error.what());
         return 1;
     }
 }

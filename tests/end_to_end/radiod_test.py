@@ -82,8 +82,11 @@ class Radiod(unittest.TestCase):
                          [("/radio/signal", -73), ("/events/ring", "unspecified"), ("/radio/signal", None)])
         tree = self.get("*")
         self.assertIn("python", tree["connections"])
-        self.assertEqual({name: tree[name] for name in ("events", "log", "radio", "settings")}, {
-            "events": {"ring": None, "sms": None}, "log": {}, "radio": {"signal": None}, "settings": {}})
+        self.assertEqual({name: tree[name] for name in ("events", "log", "messages", "radio", "settings")}, {
+            "events": {"ring": None, "sms": None}, "log": {}, "messages": {"SM-3": {"memory": "SM", "index": 3}},
+            "radio": {"signal": None}, "settings": {}})
+        self.client.send(message("set", "/messages/SM-3", None))
+        self.assertEqual(self.get("/messages"), {})
 
     def test_the_radio_is_on_while_somebody_needs_it(self):
         path = "/assertions/keep_radio_on"
