@@ -50,6 +50,7 @@ ZEROMQ = "ZeroMQ"
 RELAY = "raw relay"
 RELAY_BATCHED = "raw relay, batched"
 MOSQUITTO = "mosquitto"
+MOSQUITTO_RESIDENT = "mosquitto, resident"
 DBUS = "D-Bus PropertiesChanged"
 LIBUV = "libuv"
 LIBEVENT = "libevent"
@@ -122,6 +123,13 @@ def fanout():
                               for peer, program in programs.items()},
                            RELAY_BATCHED: Cell("fanout_raw", ("rate", str(count), "batched"), "million_per_s")},
                           held, big_is_good=True)
+    memory = {OURS: "rest_memory", MOSQUITTO_RESIDENT: "rest_memory_mosquitto"}
+    for key, what in (("client", "a connected client"), ("property", "a property"),
+                      ("watcher", "one more watcher of a property"), ("assertion", "an assertion and its first holder"),
+                      ("holder", "one more holder of an assertion")):
+        peers = memory if key in ("client", "property", "watcher") else {OURS: memory[OURS]}
+        yield Measurement("fanout", f"memory of {what}", "bytes",
+                          {peer: Cell(program, (), f"{key}_bytes") for peer, program in peers.items()})
 
 
 def log():
