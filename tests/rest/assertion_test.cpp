@@ -15,16 +15,6 @@ namespace {
 using namespace plr::test;
 using namespace plr::rest;
 
-// Assertions that remember whether they handled the last message.
-class RecordingAssertions : public AssertionRestResource {
-  public:
-    using AssertionRestResource::AssertionRestResource;
-    bool handleMessage(RestResourceContext& context, const PathView& path) override {
-        return handled = AssertionRestResource::handleMessage(context, path);
-    }
-    bool handled = false;  // touched on the server's queue only
-};
-
 // Assertions of which "x" goes on where a former process left it.
 class PrimedAssertions : public AssertionRestResource {
   public:
@@ -103,8 +93,8 @@ class Parties {
 
   private:
     std::string mount_ = "/a";
-    const std::shared_ptr<RecordingAssertions> assertions_ =
-        std::make_shared<RecordingAssertions>();
+    const std::shared_ptr<Recording<AssertionRestResource>> assertions_ =
+        std::make_shared<Recording<AssertionRestResource>>();
     RestServerRig rig_;
     std::map<std::string, std::unique_ptr<RawRestClient>> clients_;
 };

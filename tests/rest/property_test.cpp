@@ -16,17 +16,6 @@ using namespace plr::test;
 using plr::rest::Operation;
 using plr::rest::PropertyRestResource;
 
-// A property resource that remembers whether it handled the last message.
-class RecordingProperties : public PropertyRestResource {
-  public:
-    using PropertyRestResource::PropertyRestResource;
-    bool handleMessage(plr::rest::RestResourceContext& context,
-                       const plr::rest::PathView& path) override {
-        return handled = PropertyRestResource::handleMessage(context, path);
-    }
-    bool handled = false;  // touched on the server's queue only
-};
-
 constexpr const char* kValueOfX = R"({"k": [0: 5]})";
 
 vox::dict valueOfX() {
@@ -65,7 +54,8 @@ class Property : public testing::Test {
         return news();
     }
 
-    const std::shared_ptr<RecordingProperties> kept_ = std::make_shared<RecordingProperties>(true);
+    const std::shared_ptr<Recording<PropertyRestResource>> kept_ =
+        std::make_shared<Recording<PropertyRestResource>>(true);
     RestServerRig rig_;
     std::unique_ptr<RawRestClient> client_;
 };

@@ -88,15 +88,8 @@ class Requests : public testing::Test {
         return client->takeMessages();
     }
 
-    struct Recording : RequestRestResource {
-        bool handleMessage(plr::rest::RestResourceContext& context,
-                           const plr::rest::PathView& path) override {
-            return handled = RequestRestResource::handleMessage(context, path);
-        }
-        bool handled = false;  // touched on the server's queue only
-    };
-
-    const std::shared_ptr<Recording> requests_ = std::make_shared<Recording>();
+    const std::shared_ptr<Recording<RequestRestResource>> requests_ =
+        std::make_shared<Recording<RequestRestResource>>();
     RestServerRig rig_;
     Client asker_;
     std::size_t seen_ = 0;

@@ -93,6 +93,16 @@ class FakeRestContext : public rest::RestResourceContext {
     std::vector<std::string> redirects_;
 };
 
+// A resource that remembers whether it handled the last message.
+template <class Resource>
+struct Recording : Resource {
+    using Resource::Resource;
+    bool handleMessage(rest::RestResourceContext& context, const rest::PathView& path) override {
+        return handled = Resource::handleMessage(context, path);
+    }
+    bool handled = false;  // touched on the server's queue only
+};
+
 // A leaf that answers every operation it is asked for, and remembers the calls.
 class FakeRestResource : public rest::RestResource {
   public:
