@@ -32,7 +32,7 @@ constexpr int kClients = 20;
 constexpr int kNobody = -1;
 constexpr std::array kNames = {"a", "b", "c", "d", "e"};
 // "e" passes the last generation after this many.
-constexpr std::uint32_t kGenerationsBeforeLast = 200;
+constexpr std::uint32_t kGenerationsBeforeLast = 20;
 
 // What a connection is told: its number, which is its name; path; generation;
 // state.
