@@ -19,7 +19,11 @@ using namespace plr::test;
 using namespace plr::test::property_model;
 using plr::rest::PathView;
 
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr int kSteps = 10'000;
+#else
 constexpr int kSteps = 100'000;
+#endif
 constexpr std::uint32_t kSeed = 20'261'121;
 
 // Writes what it is sent into a log that all share.
