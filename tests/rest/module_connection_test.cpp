@@ -222,7 +222,7 @@ class Answers : public plr::rest::RestResource {
 std::string asText(const plr::Result<vox::object>& result) {
     if (result)
         return oneLine(result.value());
-    const vox::object error = result.error();
+    const vox::object& error = result.error();
     return std::to_string(vox_error_get_code(error.get())) + " " +
            std::string(
                vox::object::retain(vox_error_get_value(error.get(), vox_error_key_description))

@@ -61,7 +61,8 @@ class StoredProperties : public plr::rest::PropertyRestResource {
     explicit StoredProperties(Values& values) : PropertyRestResource(true), values_(values) {
         for (std::size_t i = 0; i < kProperties; ++i) {
             FakeRestContext context(Operation::kSet, vox::int64(values_[i]));
-            handleRestMessage_SET(context, plr::rest::PathView(std::to_string(i)));
+            PropertyRestResource::handleRestMessage_SET(context,
+                                                        plr::rest::PathView(std::to_string(i)));
         }
     }
     bool handleRestMessage_SET(plr::rest::RestResourceContext& context,
