@@ -255,6 +255,17 @@ TEST(MapLimits, HoldForEntriesAndForWatchedKeysUntilTheyGo) {
     EXPECT_TRUE(tell(map, Operation::kPush, "/map/e", client));
 }
 
+TEST(MapDrop, TellsWhoWentNothingOfItsOwnKeys) {
+    MapRestResource map(plr::rest::owned_entries, 1);
+    const auto client = std::make_shared<FakeRestConnection>("client");
+    EXPECT_TRUE(tell(map, Operation::kSet, "/map/a", client, vox::int64(1)));
+    EXPECT_TRUE(tell(map, Operation::kPush, "/map/a", client));
+    FakeRestContext context(Operation::kNone);
+    map.handleDroppedConnection(context, PathView("/map"), client);
+    EXPECT_EQ(client->sent.size(), 1U) << "by the PUSH";
+    EXPECT_TRUE(tell(map, Operation::kPush, "/map/b", client)) << "it watches nothing now";
+}
+
 // A map of its own kind beside the resource; clients who keep copies by what they are
 // told. Every step, all of them agree.
 class MapModel {

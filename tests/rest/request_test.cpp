@@ -196,8 +196,9 @@ TEST_F(Requests, OfAClientThatDropsWaitNoMore) {
     other.reset();
     ASSERT_TRUE(rig_.waitForDrop());
     EXPECT_EQ(asker_->textAt("/queued/*"), R"({"call": {"provider": "provider","waiting": 0}})");
-    ask("/queued/a", 1);
-    EXPECT_EQ(asker_->textAt("/queued/a/waiting"), "1");
+    for (const char* path : {"/queued/a", "/queued/a", "/queued/b"})
+        ask(path, 1);
+    EXPECT_EQ(asker_->textAt("/queued/a/waiting") + asker_->textAt("/queued/b/waiting"), "21");
 }
 
 TEST_F(Requests, AtAProviderHaveALimitToo) {
