@@ -353,7 +353,10 @@ class Walk {
         const vox::dict dump(get("/at/*"));
         bool same = dump.count() == model_.assertions.size();
         for (const auto& [name, expected] : model_.assertions)
-            same = same && sameDocument(vox::dict(dump[name.c_str()]), expected);
+            // Who dropped is out of the sets, not only expired in them.
+            same =
+                same && sameDocument(vox::dict(dump[name.c_str()]), expected) &&
+                resource_.createIfNotPresent(name).revoked.hasWatchers() != expected.lost.empty();
         return same ? "" : "all is " + oneLine(dump);
     }
     static bool sameDocument(const vox::dict& document, const Model::Assertion& expected) {
