@@ -4,9 +4,9 @@
 #include <string>
 
 #include "plr/ipc/dict.h"
-#include "plr/ipc/read.h"
 #include "plr/ipc/values.h"
 #include "plr/rest/reply_dict_context.h"
+#include "plr/rest/typed_value.h"
 #include "src/rest/notify.h"
 
 namespace plr::rest {
@@ -287,7 +287,8 @@ void AssertionRestResource::handleMessage_Resource_Provider_POP(RestResourceCont
 AssertionRestResourceState* AssertionRestResource::findAnswered(RestResourceContext& context,
                                                                 std::string_view name) {
     AssertionRestResourceState* state = find(name);
-    if (!state || vox::dyn_cast_or_default(context.getRestValue(), 0U) != state->generation)
+    const std::uint32_t answered = valueAs<std::uint32_t>(context.getRestValue()).value_or(0);
+    if (!state || answered != state->generation)
         return nullptr;
     const std::shared_ptr<RestResourceConnection> author = context.getAuthorResource();
     const bool isAllowed = !providerOnly_ || (author && author == state->provider.lock());

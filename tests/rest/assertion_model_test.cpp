@@ -253,13 +253,17 @@ class Walk {
         }
     }
     vox::object garbage() {
-        switch (below(4)) {
+        switch (below(6)) {
             case 0:
                 return {};
             case 1:
                 return vox::string("1");
             case 2:
                 return vox::real(1);
+            case 3:
+                return vox::boolean(true);
+            case 4:
+                return vox::int64((1LL << 32) + 1);
             default:
                 return vox::dict::create();
         }

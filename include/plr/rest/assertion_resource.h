@@ -29,8 +29,7 @@
 // answers with the generation that it was told; an answer to an older one is
 // ignored. A generation ends when the provider revokes, and when the last who is
 // granted, or the last who waits, leaves. The first is 1, and 4294967295 is
-// followed by 1: what is no number reads as 0 (plr/ipc/read.h), and is never
-// current.
+// followed by 1: what is no integer of that range reads as 0, and is never current.
 //
 // The document of an assertion, its own GET and its entry in a dump:
 //
