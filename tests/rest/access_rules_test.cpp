@@ -178,39 +178,39 @@ TEST_F(AccessRulesOfAServer, TheLongestPathThatNamesTheOperationDecides) {
         {.path = "/t/open/mine", .users = {kMe}},
     });
     const struct {
-        Operation operation;
         const char* path;
+        Operation operation;
         bool isAllowed;
     } rows[] = {
-        {Operation::kGet, "/", true},
-        {Operation::kGet, "/kept", true},  // the names only
-        {Operation::kGet, "/kept/x", false},
-        {Operation::kPush, "kept/x/", false},
-        {Operation::kGet, "/kept/x/_/watchers", false},
-        {Operation::kGet, "/kept/x@part", false},
-        {Operation::kGet, "/kept/xx", true},
-        {Operation::kGet, "/kept//x", true},  // the names again
-        {Operation::kGet, "/kept/x@y@", false},
-        {Operation::kSet, "/kept/_", false},
-        {Operation::kSet, "/kept/_@", true},   // a property of the name "_"
-        {Operation::kSet, "/kept/_/x", true},  // nothing
-        {Operation::kGet, "/kept/*", false},   // x is among them
-        {Operation::kGet, "/*", false},
-        {Operation::kGet, "/*/x", false},
-        {Operation::kSet, "/*", true},  // does nothing
-        {Operation::kSet, "/kept/set", false},
-        {Operation::kGet, "/kept/set", true},
-        {Operation::kGet, "/t", false},
-        {Operation::kSet, "/t/kept/mine", true},
-        {Operation::kGet, "/t/kept/mine@part", true},
-        {Operation::kGet, "/t/open/mine", true},
-        {Operation::kGet, "/t/open/mine@part", false},   // or a name below /t/open
-        {Operation::kSet, "/t/kept/mine/deeper", true},  // means the property
-        {Operation::kGet, "/t/kept/ours", true},
-        {Operation::kGet, "/t/kept/theirs", false},
-        {Operation::kGet, "/t/kept/either", true},
-        {Operation::kGet, "/t/kept/unknown", false},
-        {Operation::kGet, "/t/nothing", false},
+        {"/", Operation::kGet, true},
+        {"/kept", Operation::kGet, true},  // the names only
+        {"/kept/x", Operation::kGet, false},
+        {"kept/x/", Operation::kPush, false},
+        {"/kept/x/_/watchers", Operation::kGet, false},
+        {"/kept/x@part", Operation::kGet, false},
+        {"/kept/xx", Operation::kGet, true},
+        {"/kept//x", Operation::kGet, true},  // the names again
+        {"/kept/x@y@", Operation::kGet, false},
+        {"/kept/_", Operation::kSet, false},
+        {"/kept/_@", Operation::kSet, true},   // a property of the name "_"
+        {"/kept/_/x", Operation::kSet, true},  // nothing
+        {"/kept/*", Operation::kGet, false},   // x is among them
+        {"/*", Operation::kGet, false},
+        {"/*/x", Operation::kGet, false},
+        {"/*", Operation::kSet, true},  // does nothing
+        {"/kept/set", Operation::kSet, false},
+        {"/kept/set", Operation::kGet, true},
+        {"/t", Operation::kGet, false},
+        {"/t/kept/mine", Operation::kSet, true},
+        {"/t/kept/mine@part", Operation::kGet, true},
+        {"/t/open/mine", Operation::kGet, true},
+        {"/t/open/mine@part", Operation::kGet, false},   // or a name below /t/open
+        {"/t/kept/mine/deeper", Operation::kSet, true},  // means the property
+        {"/t/kept/ours", Operation::kGet, true},
+        {"/t/kept/theirs", Operation::kGet, false},
+        {"/t/kept/either", Operation::kGet, true},
+        {"/t/kept/unknown", Operation::kGet, false},
+        {"/t/nothing", Operation::kGet, false},
     };
     for (const auto& row : rows)
         EXPECT_EQ(refusals(client->message(row.operation, row.path)), row.isAllowed ? 0U : 1U)
