@@ -128,6 +128,8 @@ bool AssertionRestResource::handleRestMessage_SET(RestResourceContext& context,
 bool AssertionRestResource::handleRestMessage_PUSH(RestResourceContext& context,
                                                    const PathView& path) {
     const Kind kind = kindOf(path);
+    if ((kind == Kind::Resource || kind == Kind::Provider) && isOneTooMany(context, path.current()))
+        return false;
     if (kind == Kind::Resource)
         handleMessage_Resource_PUSH(context, path);
     else if (kind == Kind::Provider)
@@ -337,6 +339,10 @@ vox::array AssertionRestResource::getResourceArray() const {
 AssertionRestResourceState* AssertionRestResource::find(std::string_view name) {
     const auto* found = assertions_.find(name);
     return found ? found->get() : nullptr;
+}
+
+bool AssertionRestResource::isOneTooMany(RestResourceContext& context, std::string_view name) {
+    return assertions_.size() >= limit_ && context.getRawAuthorConnection() && !find(name);
 }
 
 AssertionRestResourceState& AssertionRestResource::createIfNotPresent(std::string_view name) {

@@ -81,6 +81,8 @@ bool PropertyRestResource::handleRestMessage_SET(RestResourceContext& context,
 bool PropertyRestResource::handleRestMessage_PUSH(RestResourceContext& context,
                                                   const PathView& path) {
     const PropertyPath parsed = parsePropertyPath(path);
+    if (parsed.kind == Kind::Resource && isOneTooMany(context, parsed.name))
+        return false;
     if (parsed.kind == Kind::Root)
         handleMessage_Root_PUSH(context, path);
     else if (parsed.kind == Kind::MetaWatched)
@@ -162,7 +164,7 @@ void PropertyRestResource::handleMessage_Resource_Watchers_GET(RestResourceConte
 bool PropertyRestResource::handleMessage_Resource_SET(RestResourceContext& context,
                                                       const PathView& path, std::string_view name,
                                                       std::string_view subpath) {
-    if (!subpath.empty())
+    if (!subpath.empty() || isOneTooMany(context, name))
         return false;
     const vox::object value = context.getRestValue();
     Entry* entry = nullptr;
@@ -284,6 +286,10 @@ vox::array PropertyRestResource::getWatchedResourceArray() const {
 PropertyRestResource::Entry* PropertyRestResource::find(std::string_view name) {
     const auto* found = properties_.find(name);
     return found ? found->get() : nullptr;
+}
+
+bool PropertyRestResource::isOneTooMany(RestResourceContext& context, std::string_view name) {
+    return properties_.size() >= limit_ && context.getRawAuthorConnection() && !find(name);
 }
 
 bool PropertyRestResource::createIfNotPresent(std::string_view name, Entry*& entry) {

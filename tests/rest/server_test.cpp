@@ -149,6 +149,32 @@ TEST_F(RestServer, BoundsTheNamesOfConnections) {
     EXPECT_EQ(client->textAt("/connections"), "[]");
 }
 
+TEST_F(RestServer, BoundsTheNamesThatClientsMakeWhereThatIsWanted) {
+    const auto assertions = std::make_shared<AssertionRestResource>();
+    const auto properties = std::make_shared<PropertyRestResource>(true);
+    assertions->limitNames(1);
+    properties->limitNames(2);
+    rig.add("/a", assertions);
+    rig.add("/p", properties);
+    start().registerName();
+    for (const char* path : {"/a/x", "/a/y", "/a/y/provider", "/a/x/provider", "/p/x", "/p/y"})
+        client->send(Operation::kPush, path);
+    for (const char* path : {"/p/z", "/p/y"})
+        client->send(Operation::kSet, path, vox::int64(1));
+    client->send(Operation::kPush, "/p/z");
+    EXPECT_EQ(client->takeMessages(),
+              (Texts{R"(notify me /a/x/provider {"generation": 1,)"
+                     R"("state": "1:kPending"})",
+                     "notify me /p/x null", "notify me /p/y null", "notify me /p/y 1"}));
+    // The service itself is not bound.
+    rig.queue().sync([this] {
+        rig.server().handleRestMessage(nullptr,
+                                       client->message(Operation::kSet, "/p/own", vox::int64(1)));
+    });
+    EXPECT_EQ(client->textAt("/p"), R"([0: "own",1: "x",2: "y"])");
+    EXPECT_EQ(client->textAt("/a"), R"([0: "x"])");
+}
+
 TEST_F(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
     rig.add("/leaf", std::make_shared<FakeRestResource>());
     start();

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -38,7 +40,8 @@
 //   "provider"                        its name; null without one
 //
 // and null, or an empty array, for an assertion that is not known. Assertions
-// exist from their first PUSH for the resource's life; a GET makes none.
+// exist from their first PUSH for the resource's life, as many as limitNames() says; a
+// GET makes none.
 //
 // Owner:   the tree. Clients and providers are held weakly; who is not registered
 //          at "/connections" can be neither.
@@ -78,6 +81,11 @@ class PLR_EXPORT AssertionRestResource : public RestResource {
     AssertionRestResource(hold_off_tag, provider_only_tag);
     ~AssertionRestResource() override;
 
+    // From `limit` assertions on, a client's PUSH of a further name is not handled; the
+    // service's own messages, on no connection, are. No limit at first. On the queue,
+    // or before the resource is registered.
+    void limitNames(std::size_t limit) noexcept { limit_ = limit; }
+
     bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_SET(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_PUSH(RestResourceContext& context, const PathView& path) override;
@@ -114,6 +122,7 @@ class PLR_EXPORT AssertionRestResource : public RestResource {
 
     [[nodiscard]] vox::array getResourceArray() const;
     [[nodiscard]] AssertionRestResourceState* find(std::string_view name);
+    [[nodiscard]] bool isOneTooMany(RestResourceContext& context, std::string_view name);
     // The assertion that a SET of a generation is about; null when the message is
     // to be ignored.
     [[nodiscard]] AssertionRestResourceState* findAnswered(RestResourceContext& context,
@@ -130,6 +139,7 @@ class PLR_EXPORT AssertionRestResource : public RestResource {
     const bool holdOff_;
     PathMap<std::unique_ptr<AssertionRestResourceState>> assertions_;  // by name
     const bool providerOnly_;
+    std::size_t limit_ = std::numeric_limits<std::size_t>::max();  // names
 };
 
 }  // namespace plr::rest

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstddef>
+#include <limits>
 #include <memory>
 #include <string_view>
 
@@ -24,8 +26,8 @@
 //                           what there is to ask, and who watches what
 //
 // A property exists from its first SET or PUSH for the resource's life; a GET
-// makes none. Without kept values it only passes SETs on: GETs answer null, and
-// a new watcher is told nothing.
+// makes none; limitNames() says how many clients can make. Without kept values it
+// only passes SETs on: GETs answer null, and a new watcher is told nothing.
 //
 // Owner:   the tree. Watchers are held weakly: one whose client went is told
 //          nothing and listed nowhere any more. Its entry goes with the next PUSH on
@@ -41,6 +43,11 @@ class PLR_EXPORT PropertyRestResource : public RestResource,
   public:
     explicit PropertyRestResource(bool keepValues);
     ~PropertyRestResource() override;
+
+    // From `limit` properties on, a client's SET or PUSH of a further name is not
+    // handled; the service's own messages, on no connection, are. No limit at first.
+    // On the queue, or before the resource is registered.
+    void limitNames(std::size_t limit) noexcept { limit_ = limit; }
 
     bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override;
     bool handleRestMessage_SET(RestResourceContext& context, const PathView& path) override;
@@ -80,14 +87,16 @@ class PLR_EXPORT PropertyRestResource : public RestResource,
     [[nodiscard]] vox::array getResourceArray() const;
     [[nodiscard]] vox::array getWatchedResourceArray() const;
     [[nodiscard]] Entry* find(std::string_view name);
+    [[nodiscard]] bool isOneTooMany(RestResourceContext& context, std::string_view name);
     // Stores the entry in `entry`; true when it was made now.
     bool createIfNotPresent(std::string_view name, Entry*& entry);
     void sendResourcesNotification(RestResourceContext& context, const PathView& path) const;
     void sendWatchedResourcesNotification(RestResourceContext& context, const PathView& path) const;
 
     const bool keepValues_;
-    PathMap<std::unique_ptr<Entry>> properties_;   // by name
-    WatchableRestResourceHelper rootWatchers_;     // of the list of names
+    std::size_t limit_ = std::numeric_limits<std::size_t>::max();  // names
+    PathMap<std::unique_ptr<Entry>> properties_;                   // by name
+    WatchableRestResourceHelper rootWatchers_;                     // of the list of names
     WatchableRestResourceHelper watchedWatchers_;  // of the list of watched properties
 };
 
