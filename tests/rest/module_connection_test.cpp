@@ -168,6 +168,27 @@ TEST(AutomaticReconnection, EndsWithTheNextConnection) {
               (Texts{"push me /connections null"}));
 }
 
+TEST(AutomaticReconnection, FollowsOnlyTheServiceThatWasNamedLast) {
+    const RuntimeDirectory directory;
+    const Service service(7);
+    Client client;
+    Event waited;
+    client.on([&] {
+        client.module.setConnectionHandler(
+            [&](bool isReached) { client.note(isReached ? "reached" : "lost"); });
+        client.module.setServerErrorHandler([&](const vox::object&) {
+            client.module.connectToService(kName, kQuick);  // an attempt at the other is due
+            client.queue.after(dispatch::time::after(20ms),
+                               dispatch::block<void()>([&] { waited.signal(); }));
+        });
+        client.module.connectToService("net.example.missing", kQuick);
+    });
+    ASSERT_TRUE(waited.wait());
+    // Answered behind all that was asked before.
+    client.on([&] { client.module.sendRawGet("", [&](auto&&) { client.note("answered"); }); });
+    EXPECT_EQ(client.next(2), (Texts{"reached", "answered"}));
+}
+
 TEST(AutomaticReconnection, RefusesAPolicyThatMakesNoSense) {
     Client client;
     const ReconnectPolicy policies[] = {
