@@ -2,6 +2,7 @@
 
 pelorin_component(base LEVEL 0 LIBRARY platform
   HEADERS
+    include/Pelorin
     include/plr/base/assert.h
     include/plr/base/export.h
     include/plr/base/report.h
@@ -9,6 +10,7 @@ pelorin_component(base LEVEL 0 LIBRARY platform
   SOURCES
     src/base/assert.cpp
     src/base/brief_mutex.h
+    src/base/debug_print.cpp
     src/base/magazines.h
     src/base/report.cpp)
 

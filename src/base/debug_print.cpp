@@ -1,0 +1,71 @@
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <mutex>
+#include <shared_mutex>
+#include <string_view>
+
+#include "Pelorin"
+
+namespace {
+
+void writeToStandardError(void* /*context*/, const char* function, const char* text) {
+    // One write, so that lines of several threads and processes stay whole.
+    std::array<char, 1200> line;
+    const bool ended = std::string_view(text).ends_with('\n');
+    const int length =
+        std::snprintf(line.data(), line.size(), "%s: %s%s", function, text, ended ? "" : "\n");
+    if (length > 0)
+        static_cast<void>(!::write(STDERR_FILENO, line.data(),
+                                   std::min(static_cast<std::size_t>(length), line.size() - 1)));
+}
+
+struct Registration {
+    PelorinDebugDelegate delegate = &writeToStandardError;
+    void* context = nullptr;
+};
+
+// Callers of the delegate share it; who replaces the delegate waits for them.
+// Never destroyed: threads may print until the process ends.
+std::shared_mutex& mutex() {
+    static auto* const instance = new std::shared_mutex;
+    return *instance;
+}
+constinit Registration registration;
+
+// A delegate that prints is covered by the share its caller holds; a second one could
+// wait behind somebody who waits for the first.
+thread_local bool insideDelegate = false;
+
+}  // namespace
+
+extern "C" {
+
+void PelorinDebugSetDelegate(PelorinDebugDelegate delegate, void* context) {
+    const std::unique_lock lock(mutex());
+    registration = delegate ? Registration{delegate, context} : Registration{};
+}
+
+void PelorinDebugPrint(const char* function, const char* format, ...) {
+    const int savedErrno = errno;
+    std::array<char, 1024> text;
+    va_list arguments;
+    va_start(arguments, format);
+    std::vsnprintf(text.data(), text.size(), format, arguments);
+    va_end(arguments);
+    if (insideDelegate) {
+        registration.delegate(registration.context, function, text.data());
+    } else {
+        const std::shared_lock lock(mutex());
+        insideDelegate = true;
+        registration.delegate(registration.context, function, text.data());
+        insideDelegate = false;
+    }
+    errno = savedErrno;
+}
+
+}  // extern "C"
