@@ -192,6 +192,11 @@ pelorin_component(kel LEVEL 1 LIBRARY platform
     platform/linux/kel/socket_io.cpp
     platform/linux/kel/socket_io.h)
 
+pelorin_component(format_core LEVEL 1 LIBRARY pelorin
+  SOURCES
+    src/format/hex_kernel.cpp
+    src/format/hex_kernel.h)
+
 pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
   HEADERS
     include/plr/ipc/array.h
