@@ -194,8 +194,12 @@ pelorin_component(kel LEVEL 1 LIBRARY platform
 
 pelorin_component(format_core LEVEL 1 LIBRARY pelorin
   SOURCES
+    src/format/hex_avx2.cpp
     src/format/hex_kernel.cpp
-    src/format/hex_kernel.h)
+    src/format/hex_kernel.h
+    src/format/hex_neon.cpp
+    src/format/hex_plain.cpp
+    src/format/hex_vector.h)
 
 pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
   HEADERS

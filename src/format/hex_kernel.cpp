@@ -1,85 +1,68 @@
 #include "src/format/hex_kernel.h"
 
 #include <array>
-#include <cstring>
+#include <atomic>
+
+#include "src/format/hex_vector.h"
 
 namespace plr::hexkernel {
 namespace {
 
-using DigitPairs = std::array<std::array<char, 2>, 256>;
+constexpr std::array kKernels{
+    Kernel{"plain", encodePlain, decodePlain, decodeStrictPlain},
+#ifdef PLR_HEX_VECTOR
+    Kernel{kVectorName, encodeVector, decodeVector, decodeStrictVector},
+#endif
+};
 
-constexpr DigitPairs digitPairs(const char (&digits)[17]) {
-    DigitPairs pairs{};
-    for (std::size_t byte = 0; byte < pairs.size(); ++byte) {
-        pairs[byte] = {digits[byte >> 4], digits[byte & 15]};
-    }
-    return pairs;
+const Kernel& choose() noexcept;
+
+// Stands in until the first call has chosen.
+constexpr Kernel kUndecided{
+    "undecided",
+    [](char* out, const std::uint8_t* data, std::size_t bytes, bool lowerCase) noexcept {
+        choose().encode(out, data, bytes, lowerCase);
+    },
+    [](std::uint8_t* out, const char* text, std::size_t pairs) noexcept {
+        choose().decode(out, text, pairs);
+    },
+    [](std::uint8_t* out, const char* text, std::size_t pairs) noexcept {
+        return choose().decodeStrict(out, text, pairs);
+    }};
+
+// What it points to is constant, and whoever chooses, chooses the same.
+constinit std::atomic<const Kernel*> chosen{&kUndecided};
+
+const Kernel& choose() noexcept {
+    const Kernel& fastest = kernels().back();
+    chosen.store(&fastest, std::memory_order_relaxed);
+    return fastest;
 }
 
-constexpr DigitPairs kLowerPairs = digitPairs("0123456789abcdef");
-constexpr DigitPairs kUpperPairs = digitPairs("0123456789ABCDEF");
-
-// Lies above a byte in either nibble's place: a cast to a byte makes it 0, and
-// a compare finds it.
-constexpr std::uint16_t kNoDigit = 0x100;
-
-constexpr std::array<std::uint16_t, 256> kNibbles = [] {
-    std::array<std::uint16_t, 256> nibbles{};
-    nibbles.fill(kNoDigit);
-    for (std::uint16_t n = 0; n < 16; ++n) {
-        nibbles[static_cast<std::uint8_t>(kLowerPairs[n][1])] = n;
-        nibbles[static_cast<std::uint8_t>(kUpperPairs[n][1])] = n;
-    }
-    return nibbles;
-}();
-
-unsigned pairValue(const char* pair) {
-    return static_cast<unsigned>(kNibbles[static_cast<std::uint8_t>(pair[0])]) << 4 |
-           kNibbles[static_cast<std::uint8_t>(pair[1])];
+const Kernel& kernel() noexcept {
+    return *chosen.load(std::memory_order_relaxed);
 }
-
-void encodePlain(char* out, const std::uint8_t* data, std::size_t bytes, bool lowerCase) noexcept {
-    const DigitPairs& pairs = lowerCase ? kLowerPairs : kUpperPairs;
-    for (std::size_t i = 0; i < bytes; ++i) {
-        std::memcpy(out + 2 * i, pairs[data[i]].data(), 2);
-    }
-}
-
-void decodePlain(std::uint8_t* out, const char* text, std::size_t pairs) noexcept {
-    for (std::size_t i = 0; i < pairs; ++i) {
-        out[i] = static_cast<std::uint8_t>(pairValue(text + 2 * i));
-    }
-}
-
-std::size_t decodeStrictPlain(std::uint8_t* out, const char* text, std::size_t pairs) noexcept {
-    for (std::size_t i = 0; i < pairs; ++i) {
-        const unsigned value = pairValue(text + 2 * i);
-        if (value > 0xFF) {
-            return i;
-        }
-        out[i] = static_cast<std::uint8_t>(value);
-    }
-    return pairs;
-}
-
-constexpr std::array kKernels{Kernel{"plain", encodePlain, decodePlain, decodeStrictPlain}};
 
 }  // namespace
 
 void encodeHex(char* out, const std::uint8_t* data, std::size_t bytes, bool lowerCase) noexcept {
-    encodePlain(out, data, bytes, lowerCase);
+    kernel().encode(out, data, bytes, lowerCase);
 }
 
 void decodeHex(std::uint8_t* out, const char* text, std::size_t pairs) noexcept {
-    decodePlain(out, text, pairs);
+    kernel().decode(out, text, pairs);
 }
 
 std::size_t decodeHexStrict(std::uint8_t* out, const char* text, std::size_t pairs) noexcept {
-    return decodeStrictPlain(out, text, pairs);
+    return kernel().decodeStrict(out, text, pairs);
 }
 
 std::span<const Kernel> kernels() noexcept {
+#ifdef PLR_HEX_VECTOR
+    return std::span(kKernels).first(canVector() ? 2 : 1);
+#else
     return kKernels;
+#endif
 }
 
 }  // namespace plr::hexkernel

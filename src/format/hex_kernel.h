@@ -9,7 +9,8 @@
 // Threads: pure functions, any thread, also before main().
 // Memory:  nothing is allocated; no NUL is written; input and output may not
 //          overlap. Nothing outside the given lengths is read or written.
-// Cost:    the fastest kernel this machine can run, chosen at the first call.
+// Cost:    the fastest kernel that this machine can run, chosen at the first
+//          call; bench/bytes_pelorin.cpp.
 namespace plr::hexkernel {
 
 // Writes 2 * `bytes` digits, high nibble first.
@@ -27,12 +28,12 @@ void decodeHex(std::uint8_t* out, const char* text, std::size_t pairs) noexcept;
 // One implementation of the three.
 struct Kernel {
     const char* name;
-    void (*encode)(char*, const std::uint8_t*, std::size_t, bool) noexcept;
-    void (*decode)(std::uint8_t*, const char*, std::size_t) noexcept;
-    std::size_t (*decodeStrict)(std::uint8_t*, const char*, std::size_t) noexcept;
+    void (*encode)(char* out, const std::uint8_t* data, std::size_t bytes, bool lowerCase) noexcept;
+    void (*decode)(std::uint8_t* out, const char* text, std::size_t pairs) noexcept;
+    std::size_t (*decodeStrict)(std::uint8_t* out, const char* text, std::size_t pairs) noexcept;
 };
 
-// The kernels that this machine can run, the plain one first, the chosen one last.
+// What this machine can run, from the plain kernel to the fastest.
 [[nodiscard]] std::span<const Kernel> kernels() noexcept;
 
 }  // namespace plr::hexkernel
