@@ -1,0 +1,142 @@
+#include "support/scripted_modem.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <poll.h>
+#include <unistd.h>
+
+#include <array>
+#include <optional>
+#include <stdexcept>
+#include <string>
+
+#include "support/waiting.h"
+
+namespace {
+
+using plr::test::ModemScript;
+using plr::test::ScriptedModem;
+
+constexpr auto kScript = R"(# A small modem.
+AT+CSQ
+    +CSQ: 20,99
+    OK
+ATD*
+    OK
+    RING
+AT+C*
+    +CME ERROR: 4
+AT+SILENT
+)";
+
+// What a program with the terminal open sees.
+class Client {
+  public:
+    explicit Client(const ScriptedModem& modem)
+        : fd_(::open(modem.path().c_str(), O_RDWR | O_NOCTTY | O_NONBLOCK)) {}
+    Client(const Client&) = delete;
+    Client& operator=(const Client&) = delete;
+    ~Client() { ::close(fd_); }
+
+    [[nodiscard]] bool write(const std::string& bytes) const {
+        return ::write(fd_, bytes.data(), bytes.size()) == static_cast<ssize_t>(bytes.size());
+    }
+    [[nodiscard]] std::string read(std::size_t count) const {
+        std::string bytes;
+        while (bytes.size() < count) {
+            const std::string part = readOnce(count - bytes.size());
+            if (part.empty())
+                break;
+            bytes += part;
+        }
+        return bytes;
+    }
+    // Empty when the line is gone.
+    [[nodiscard]] std::string readOnce(std::size_t most) const {
+        pollfd wait = {.fd = fd_, .events = POLLIN, .revents = 0};
+        std::string bytes(most, '\0');
+        ::poll(&wait, 1, 60'000);
+        const ssize_t count = ::read(fd_, bytes.data(), most);
+        bytes.resize(count > 0 ? static_cast<std::size_t>(count) : 0);
+        return bytes;
+    }
+    [[nodiscard]] std::string ask(const std::string& command, const std::string& expected) const {
+        return write(command) ? read(expected.size()) : "not written";
+    }
+
+  private:
+    int fd_;
+};
+
+TEST(ScriptedModem, AnswersAsTheScriptSays) {
+    ScriptedModem modem(ModemScript::fromText(kScript));
+    const std::string tooLong(ScriptedModem::kLongestCommand + 1, 'x');
+    struct Row {
+        std::string command, answer;
+    };
+    const std::array rows = {
+        Row{"AT\r", "AT\r\r\nOK\r\n"},
+        Row{"\nat+csq\r", "\nat+csq\r\r\n+CSQ: 20,99\r\n\r\nOK\r\n"},
+        Row{"AT+CSQX\r", "AT+CSQX\r\r\n+CME ERROR: 4\r\n"},
+        Row{"ATD123;\r", "ATD123;\r\r\nOK\r\n\r\nRING\r\n"},
+        Row{"ATX\r", "ATX\r\r\nERROR\r\n"},
+        Row{tooLong + "\r", tooLong + "\r\r\nERROR\r\n"},
+        Row{"AT+SILENT\rate0\r", "AT+SILENT\rate0\r\r\nOK\r\n"},
+        Row{"AT\r", "\r\nOK\r\n"},
+        Row{"ATE1\r", "\r\nOK\r\n"},
+        Row{"AT\r", "AT\r\r\nOK\r\n"},
+    };
+    for (const Row& row : rows)  // each with a client of its own
+        EXPECT_EQ(Client(modem).ask(row.command, row.answer), row.answer) << row.command;
+    EXPECT_TRUE(modem.waitForCommands(rows.size() + 1));
+    EXPECT_EQ(modem.received().at(3), "ATD123;");
+}
+
+TEST(ScriptedModem, SpeaksOnItsOwnAlsoInPieces) {
+    ScriptedModem modem((ModemScript()));
+    const Client client(modem);
+    EXPECT_TRUE(modem.say("RING"));
+    EXPECT_TRUE(modem.sayBytes(std::string("\0\xFF", 2)));
+    EXPECT_EQ(client.read(10), std::string("\r\nRING\r\n\0\xFF", 10));
+    modem.sendInPieces(3);
+    EXPECT_TRUE(modem.say("RING"));
+    for (std::size_t bytes = 8; bytes > 0;) {
+        const std::size_t count = client.readOnce(bytes).size();
+        ASSERT_GE(count, 1);
+        ASSERT_LE(count, 3);
+        bytes -= count;
+    }
+    while (modem.say("RING")) {  // nobody reads: it ends
+    }
+}
+
+TEST(ScriptedModem, TakesNothingWhilePaused) {
+    ScriptedModem modem((ModemScript()));
+    const Client client(modem);
+    modem.pauseReading();
+    while (client.write("AT\r")) {  // until the terminal is full
+    }
+    EXPECT_TRUE(modem.received().empty());
+    modem.resumeReading();
+    EXPECT_TRUE(modem.waitForCommands(1));
+}
+
+TEST(ScriptedModem, IsGoneWhenItHungUp) {
+    ScriptedModem modem((ModemScript()));
+    const Client client(modem);
+    modem.hangUp();
+    EXPECT_EQ(client.readOnce(1), "");
+    EXPECT_FALSE(client.write("AT\r"));
+    EXPECT_FALSE(modem.say("RING"));
+    EXPECT_LT(::open(modem.path().c_str(), O_RDWR | O_NOCTTY), 0);
+}
+
+TEST(ModemScript, RefusesWhatItCannotMean) {
+    EXPECT_THROW((void)ModemScript::fromText("# none\n  OK\n"), std::invalid_argument);
+    EXPECT_THROW((void)ModemScript::fromText("AT\nATE*\nat\n"), std::invalid_argument);
+    EXPECT_THROW((void)ModemScript::fromText(std::string(ModemScript::kMostBytes + 1, '\n')),
+                 std::invalid_argument);
+    EXPECT_THROW((void)ModemScript::fromFile("/nowhere/script"), std::system_error);
+}
+
+}  // namespace
