@@ -244,6 +244,16 @@ pelorin_component(log_values LEVEL 2 LIBRARY pelorin
     src/log/log_message_buffer.cpp
     src/log/log_tag.cpp)
 
+pelorin_component(io LEVEL 2 LIBRARY pelorin
+  SOURCES
+    src/io/descriptor.cpp
+    src/io/descriptor_transport.cpp
+    src/io/descriptor_transport.h
+    src/io/fd_transport.cpp
+    src/io/file_transport.cpp
+    src/io/ring_buffer.cpp
+    src/io/transport.cpp)
+
 pelorin_component(log_core LEVEL 3 LIBRARY pelorin
   HEADERS
     include/plr/log/console_log_writer.h
