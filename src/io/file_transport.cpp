@@ -3,6 +3,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <initializer_list>
 #include <new>
 
 #include "Pelorin"
