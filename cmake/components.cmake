@@ -193,13 +193,29 @@ pelorin_component(kel LEVEL 1 LIBRARY platform
     platform/linux/kel/socket_io.h)
 
 pelorin_component(format_core LEVEL 1 LIBRARY pelorin
+  HEADERS
+    include/plr/format/binary.h
+    include/plr/format/bitfield.h
+    include/plr/format/byte_dump.h
+    include/plr/format/flag_names.h
+    include/plr/format/hex.h
+    include/plr/format/integer.h
+    include/plr/format/rle.h
   SOURCES
+    src/format/binary.cpp
+    src/format/bitfield.cpp
+    src/format/byte_dump.cpp
+    src/format/flag_names.cpp
+    src/format/flat_dump.cpp
+    src/format/flat_hex.cpp
+    src/format/hex.cpp
     src/format/hex_avx2.cpp
     src/format/hex_kernel.cpp
     src/format/hex_kernel.h
     src/format/hex_neon.cpp
     src/format/hex_plain.cpp
-    src/format/hex_vector.h)
+    src/format/hex_vector.h
+    src/format/rle.cpp)
 
 pelorin_component(ipc_values LEVEL 2 LIBRARY pelorin
   HEADERS
@@ -331,6 +347,12 @@ pelorin_component(ipc_assertion LEVEL 3 LIBRARY pelorin
     src/ipc/result_errors.cpp
     src/ipc/vox_drosk_assertion.cpp)
 
+pelorin_component(format_log LEVEL 4 LIBRARY pelorin
+  HEADERS
+    include/plr/format/bitfield_log.h
+  SOURCES
+    src/format/bitfield_log.cpp)
+
 pelorin_component(log_loggable LEVEL 4 LIBRARY pelorin
   HEADERS
     include/plr/log/loggable.h
@@ -459,6 +481,7 @@ pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
 pelorin_component(umbrella LEVEL 9 LIBRARY pelorin
   HEADERS
     include/plr/concurrency.h
+    include/plr/format.h
     include/plr/ipc.h
     include/plr/log.h
     include/plr/plr.h

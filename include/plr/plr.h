@@ -2,6 +2,7 @@
 
 // The whole class interface.
 #include "plr/concurrency.h"
+#include "plr/format.h"
 #include "plr/ipc.h"
 #include "plr/log.h"
 #include "plr/log/vox_log_server.h"
