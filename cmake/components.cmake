@@ -192,6 +192,16 @@ pelorin_component(kel LEVEL 1 LIBRARY platform
     platform/linux/kel/socket_io.cpp
     platform/linux/kel/socket_io.h)
 
+pelorin_component(serial LEVEL 1 LIBRARY platform
+  HEADERS
+    platform/include/serial/serial.h
+  SOURCES
+    platform/linux/serial/baud.cpp
+    platform/linux/serial/bytes.cpp
+    platform/linux/serial/port.cpp
+    platform/linux/serial/settings.cpp
+    platform/linux/serial/wake.cpp)
+
 pelorin_component(format_core LEVEL 1 LIBRARY pelorin
   HEADERS
     include/plr/format/binary.h
@@ -268,7 +278,16 @@ pelorin_component(io LEVEL 2 LIBRARY pelorin
     src/io/fd_transport.cpp
     src/io/file_transport.cpp
     src/io/ring_buffer.cpp
-    src/io/transport.cpp)
+    src/io/timed_uart.cpp
+    src/io/timed_uart.h
+    src/io/timed_uart_connection.cpp
+    src/io/timed_uart_workers.cpp
+    src/io/transport.cpp
+    src/io/uart_settings.cpp
+    src/io/uart_settings.h
+    src/io/uart_timeout_transport.cpp
+    src/io/uart_transport.cpp
+    src/io/wait_mutex.h)
 
 pelorin_component(log_core LEVEL 3 LIBRARY pelorin
   HEADERS

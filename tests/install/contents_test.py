@@ -15,7 +15,7 @@ del sys.argv[1:]
 LIBRARIES = ("libpelorin-platform", "libpelorin")
 # What the libraries may offer: names of C functions and data, of C++ after demangling.
 OFFERED = re.compile(
-    r"(Pelorin|vox_|VOX_|qf_|trel_|kel_|ob_)\w*$|__PLAssertTrigger$|"
+    r"(Pelorin|vox_|VOX_|qf_|trel_|kel_|ob_|serial_)\w*$|__PLAssertTrigger$|"
     r"((typeinfo|typeinfo name|vtable|VTT|(non-)?virtual thunk) (for|to) |guard variable for )?"
     r"((plr|vox|dispatch)::|PelorinAsync)")
 # What they may need from the system.
