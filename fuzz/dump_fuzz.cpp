@@ -1,14 +1,12 @@
-#include <cctype>
 #include <cstdint>
 #include <cstdlib>
-#include <cstring>
 #include <string>
 #include <vector>
 
 #include "Pelorin"
 #include "plr/format/byte_dump.h"
 #include "plr/format/hex.h"
-#include "tests/support/dump_model.h"
+#include "tests/support/byte_models.h"
 
 // Dumps of any bytes with any line length into any room, and of any text as if it
 // were hex, against plain formatters. The input is a line length, a size of two bytes,
@@ -38,26 +36,6 @@ void checkFlat(const Bytes& bytes, std::int8_t lineLength, std::uint16_t size) {
     check(dump == cutDump(modelDump(bytes, static_cast<std::size_t>(lineLength)), size));
 }
 
-// Lines of 16 characters, read in pairs.
-std::string modelOfText(const std::string& text) {
-    std::string dump;
-    for (std::size_t i = 0; i < text.size(); i += 2) {
-        if (i % 16 == 0)
-            dump +=
-                print(i == 0 ? "%04x    " : "\n%04x    ", static_cast<unsigned>(i / 2 & 0xFFFF));
-        if (i + 1 == text.size())
-            break;
-        unsigned value = 0;
-        for (const char digit : text.substr(i, 2))
-            value = value * 16 +
-                    (std::isxdigit(static_cast<unsigned char>(digit)) != 0
-                         ? static_cast<unsigned>(std::stoi(std::string(1, digit), nullptr, 16))
-                         : 0);
-        dump += print(i % 16 == 0 ? "%02x" : " %02x", value);
-    }
-    return dump;
-}
-
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -67,8 +45,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     checkFlat(bytes, static_cast<std::int8_t>(data[0]),
               static_cast<std::uint16_t>(data[1] | data[2] << 8));
     const std::string text(bytes.begin(), bytes.end());
-    check(plr::getBytedumpPrettyPrint(text) == modelOfText(text));
+    check(plr::getBytedumpPrettyPrint(text) == modelTextDump(text));
     check(plr::getBytedumpPrettyPrintBinary(bytes.data(), static_cast<unsigned>(bytes.size())) ==
-          modelOfText(plr::hex(bytes)));
+          modelTextDump(plr::hex(bytes)));
     return 0;
 }

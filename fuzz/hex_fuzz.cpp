@@ -2,44 +2,29 @@
 #include <cctype>
 #include <cstdint>
 #include <cstdlib>
-#include <cstring>
 #include <string>
-#include <vector>
 
 #include "Pelorin"
 #include "plr/format/hex.h"
+#include "tests/support/byte_models.h"
 
 // Hex text of any kind: PelorinHexToBin() into every capacity and parse_hex() in its
 // three modes, against readings of one character at a time.
 namespace {
 
-using Bytes = std::vector<unsigned char>;
+using namespace plr::test;
 
 void check(bool holds) {
     if (!holds)
         std::abort();
 }
 
-bool isDigit(char character) {
-    return std::isxdigit(static_cast<unsigned char>(character)) != 0;
-}
-
-unsigned char valueOf(const std::string& digits) {
-    unsigned value = 0;
-    for (const char digit : digits)
-        value =
-            value * 16 + (isDigit(digit)
-                              ? static_cast<unsigned>(std::stoi(std::string(1, digit), nullptr, 16))
-                              : 0);
-    return static_cast<unsigned char>(value);
-}
-
 void checkLenient(const std::string& text) {
     Bytes expected;
     if (text.size() % 2 != 0)
-        expected.push_back(valueOf(text.substr(0, 1)));
+        expected.push_back(modelByte(text.substr(0, 1)));
     for (std::size_t i = text.size() % 2; i < text.size(); i += 2)
-        expected.push_back(valueOf(text.substr(i, 2)));
+        expected.push_back(modelByte(text.substr(i, 2)));
     for (std::size_t capacity = 0; capacity <= expected.size() + 2; ++capacity) {
         Bytes out(capacity);  // the sanitizer guards its end
         const std::uint32_t count =
@@ -59,9 +44,9 @@ Bytes readStrictly(std::string text, plr::HexWhitespaceOption option) {
             ++i;
             continue;
         }
-        if (i + 1 == text.size() || !isDigit(text[i]) || !isDigit(text[i + 1]))
+        if (i + 1 == text.size() || !isHexDigit(text[i]) || !isHexDigit(text[i + 1]))
             return {};
-        bytes.push_back(valueOf(text.substr(i, 2)));
+        bytes.push_back(modelByte(text.substr(i, 2)));
         i += 2;
         if (option == plr::kHexWhitespaceSingleSpace && text[i++] != ' ')
             return {};
