@@ -61,6 +61,16 @@ BOOST_LOG = "Boost.Log"
 LOG4CPLUS = "log4cplus"
 REMOTE = "ours, into another process"
 EMPTY_LOOP = "the loop alone"
+SODIUM = "libsodium"
+OPENSSL = "OpenSSL"
+BOOST = "Boost.Algorithm"
+TABLE = "a table, in a loop"
+PAIRS = "a table of pairs, in a loop"
+MEMCPY = "memcpy of the bytes"
+CIRCULAR = "boost::circular_buffer"
+SPSC = "boost::lockfree::spsc_queue"
+SNPRINTF = "snprintf, in a loop"
+READ = "read, in a loop"
 
 
 def dispatch():
@@ -175,4 +185,35 @@ def timers():
                       (Bar((), 1000.0, "under 1 ms"),), most_rounds=1)
 
 
-SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log, "timers": timers}
+def bytes_():
+    def cells(key, size, programs):
+        return {peer: Cell(f"bytes_{program}", (case, str(size)), key) for peer, (program, case) in programs.items()}
+
+    for case, what in (("to_hex", "bin to hex"), ("from_hex", "hex to bin")):
+        programs = {OURS: ("pelorin", case), SODIUM: ("sodium", case), OPENSSL: ("openssl", case),
+                    BOOST: ("boost", case), TABLE: ("loops", case)}
+        if case == "to_hex":
+            programs[PAIRS] = ("loops", "to_hex_pairs")
+        rivals = tuple(programs)[1:]
+        for size, named in ((64, "64 B"), (4096, "4 KiB"), (1 << 20, "1 MiB")):
+            bars = (Bar(rivals, 1.0, "ahead of each"),)
+            if size == 4096:
+                bars += (Bar((PAIRS,), 2.0, "at least 2 times") if case == "to_hex" else
+                         Bar((TABLE,), 3.0, "at least 3 times"),)
+            yield Measurement("bytes", f"{what}, {named}", "GB/s",
+                              cells("gigabyte_per_s", size, {**programs, MEMCPY: ("loops", "copy")}), bars,
+                              big_is_good=True)
+    for size, named in ((16, "16 B"), (256, "256 B"), (4096, "4 KiB")):
+        yield Measurement("bytes", f"ring buffer, insert + extract {named}", "ns",
+                          cells("ns", size, {OURS: ("pelorin", "ring"), CIRCULAR: ("boost", "ring"),
+                                             SPSC: ("boost", "ring_queue")}),
+                          (Bar((CIRCULAR, SPSC), 1.0, "ahead of each"),))
+    yield Measurement("bytes", "dump, a line of 32 bytes", "ns",
+                      cells("ns", 0, {OURS: ("pelorin", "dump"), SNPRINTF: ("loops", "dump")}),
+                      (Bar((SNPRINTF,), 1.0, "ahead"),))
+    yield Measurement("bytes", "timed transport, bursts of 64 KiB", "MB/s",
+                      cells("megabyte_per_s", 0, {OURS: ("pelorin", "line"), READ: ("loops", "line")}),
+                      (Bar((READ,), 1.0, "ahead"),), big_is_good=True)
+
+
+SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log, "timers": timers, "bytes": bytes_}
