@@ -1,0 +1,215 @@
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <pthread.h>
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <atomic>
+#include <cerrno>
+#include <csignal>
+#include <future>
+#include <string>
+#include <thread>
+#include <utility>
+
+#include "Pelorin"
+#include "support/waiting.h"
+
+namespace {
+
+constexpr std::uint32_t kLongest = 0xFFFFFFFE;  // of those that end: 49 days
+
+// Two descriptors of one connection: a pipe, or sockets that keep the limits of messages.
+class Ends {
+  public:
+    enum class Kind { pipe, packets };
+    explicit Ends(Kind kind = Kind::pipe) {
+        const int failed = kind == Kind::pipe
+                               ? ::pipe2(ends_.data(), O_CLOEXEC)
+                               : ::socketpair(AF_UNIX, SOCK_SEQPACKET, 0, ends_.data());
+        if (failed != 0)
+            std::abort();
+    }
+    ~Ends() {
+        ::close(ends_[0]);
+        closeIn();
+    }
+    Ends(const Ends&) = delete;
+    Ends& operator=(const Ends&) = delete;
+    [[nodiscard]] int out() const { return ends_[0]; }
+    [[nodiscard]] int in() const { return ends_[1]; }
+    const Ends& put(const std::string& text) const {
+        EXPECT_EQ(::write(in(), text.data(), text.size()), static_cast<ssize_t>(text.size()));
+        return *this;
+    }
+    void closeIn() { ::close(std::exchange(ends_[1], -1)); }
+    // The read end moves to `number`.
+    void renumber(int number) {
+        ASSERT_EQ(::dup2(ends_[0], number), number);
+        ::close(std::exchange(ends_[0], number));
+    }
+
+  private:
+    std::array<int, 2> ends_{};
+};
+
+// A read of up to four bytes.
+struct Read {
+    Read(int fd, int unblockFd, std::uint32_t timeoutMs) {
+        errno = 0;
+        result = PelorinUnblockableReadWithTimeout(fd, unblockFd, bytes.data(), 4, timeoutMs);
+        error = errno;
+    }
+    std::array<char, 5> bytes{};
+    std::int32_t result;
+    int error;
+};
+
+TEST(Descriptor, AReadEndsForOneOfTheseReasons) {
+    Ends empty;
+    Ends full;
+    full.put("abcdef");
+    Ends unblock;
+    unblock.put("u");
+    Ends ended;
+    ended.closeIn();
+    Ends hungUp(Ends::Kind::packets);
+    hungUp.closeIn();
+    constexpr int kNotOpen = 987;
+    struct {
+        const char* name;
+        int fd, unblockFd;
+        std::uint32_t timeoutMs;
+        std::int32_t result;
+        int error;
+    } const rows[] = {
+        {"unblock", full.out(), unblock.out(), 0, 0, ECANCELED},
+        {"unblock, closed", full.out(), ended.out(), 0, 0, ECANCELED},
+        {"data", full.out(), empty.out(), kLongest, 4, 0},
+        {"the rest", full.out(), -1, PELORIN_FOREVER, 2, 0},
+        {"time-out 0", empty.out(), -1, 0, 0, ETIMEDOUT},
+        {"time-out", empty.out(), empty.out(), 1, 0, ETIMEDOUT},
+        {"end of input", ended.out(), -1, PELORIN_FOREVER, 0, ENODATA},
+        {"hang-up", hungUp.out(), -1, PELORIN_FOREVER, 0, ENODATA},
+        {"negative", -2, full.out(), 0, -9, EBADF},
+        {"not open", kNotOpen, -1, 0, -1, EBADF},
+        {"unblock not open", full.out(), kNotOpen, 0, -1, EBADF},
+        {"not to be read", empty.in(), -1, 0, 0, ETIMEDOUT},
+    };
+    for (const auto& row : rows) {
+        const Read read(row.fd, row.unblockFd, row.timeoutMs);
+        EXPECT_EQ(read.result, row.result) << row.name;
+        EXPECT_EQ(read.error, row.error) << row.name;
+    }
+}
+
+TEST(Descriptor, NumbersFrom1024OnWork) {
+    rlimit limit{};
+    ::getrlimit(RLIMIT_NOFILE, &limit);
+    limit.rlim_cur = std::min<rlim_t>(limit.rlim_max, 4096);
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &limit), 0);
+    Ends data;
+    data.renumber(1024);
+    Ends unblock;
+    unblock.renumber(2047);
+    data.put("abcd");
+    EXPECT_EQ(Read(1024, 2047, 0).result, 4);
+    EXPECT_EQ(Read(1024, 2047, 0).error, ETIMEDOUT);
+    unblock.put("x");
+    EXPECT_EQ(Read(1024, 2047, PELORIN_FOREVER).error, ECANCELED);
+}
+
+TEST(Descriptor, ALongWaitEndsWhenDataComesOrTheUnblock) {
+    for (const std::uint32_t timeoutMs : {kLongest, PELORIN_FOREVER}) {
+        const Ends data;
+        const Ends unblock;
+        const auto readLater = [&] { return Read(data.out(), unblock.out(), timeoutMs).result; };
+        auto first = std::async(std::launch::async, readLater);
+        data.put("abc");
+        EXPECT_EQ(first.get(), 3);
+        auto second = std::async(std::launch::async, readLater);
+        unblock.put("x");
+        EXPECT_EQ(second.get(), 0);
+    }
+}
+
+TEST(Descriptor, ToCompletionGoesOnUntilTheLength) {
+    Ends ends(Ends::Kind::packets);
+    std::string text(5, '.');
+    ends.put("ab").put("cde").put("x");
+    EXPECT_TRUE(
+        PelorinUnblockableReadToCompletionWithTimeout(ends.out(), -1, text.data(), 5, 1000));
+    EXPECT_EQ(text, "abcde");
+    EXPECT_TRUE(PelorinUnblockableReadToCompletionWithTimeout(-1, -1, text.data(), 0, 0));
+    EXPECT_FALSE(PelorinUnblockableReadToCompletionWithTimeout(ends.out(), -1, text.data(), 5, 0));
+    EXPECT_EQ(errno, ETIMEDOUT);
+    ends.put("x");
+    ends.closeIn();
+    EXPECT_FALSE(PelorinUnblockableReadToCompletionWithTimeout(ends.out(), -1, text.data(), 5,
+                                                               PELORIN_FOREVER));
+    EXPECT_EQ(errno, ENODATA);
+}
+
+// Runs `call` on a thread that gets signals until it returns.
+template <class Call>
+void interrupt(Call call) {
+    struct sigaction action {};
+    action.sa_handler = [](int) {};
+    ::sigaction(SIGUSR1, &action, nullptr);
+    std::atomic<bool> done = false;
+    std::thread thread([&] {
+        call();
+        done = true;
+    });
+    EXPECT_TRUE(plr::test::eventually([&] {
+        ::pthread_kill(thread.native_handle(), SIGUSR1);
+        return done.load();
+    }));
+    thread.join();
+}
+
+TEST(Descriptor, ASignalEndsTheWait) {
+    const Ends empty;
+    interrupt([&] {
+        const Read read(empty.out(), -1, PELORIN_FOREVER);
+        EXPECT_EQ(read.result, -1);
+        EXPECT_EQ(read.error, EINTR);
+    });
+}
+
+TEST(Descriptor, AWriteGoesOnUntilAnErrorAndCountsUpToIt) {
+    const Ends ends;
+    std::uint32_t written = 77;
+    EXPECT_EQ(PelorinWriteToCompletion(-1, "", 0, &written), 0);
+    EXPECT_EQ(written, 0u);
+    EXPECT_EQ(PelorinWriteToCompletion(-1, "abc", 3, &written), EBADF);
+    EXPECT_EQ(written, 0u);
+
+    // A signal cuts the write at what found room; the next one finds nothing written.
+    const auto room = static_cast<std::uint32_t>(::fcntl(ends.in(), F_SETPIPE_SZ, 65536));
+    const std::string more(room + 1000, 'm');
+    interrupt([&] {
+        EXPECT_EQ(PelorinWriteToCompletion(ends.in(), more.data(), room + 1000, &written), EINTR);
+    });
+    EXPECT_EQ(written, room);
+}
+
+TEST(Descriptor, AWriteToCompletionIsWhole) {
+    const Ends ends;
+    const std::string text(300'000, 't');
+    std::uint32_t written = 0;
+    auto error = std::async(std::launch::async, [&] {
+        return PelorinWriteToCompletion(ends.in(), text.data(), 300'000, &written);
+    });
+    std::string got(text.size(), '.');
+    EXPECT_TRUE(PelorinUnblockableReadToCompletionWithTimeout(ends.out(), -1, got.data(), 300'000,
+                                                              PELORIN_FOREVER));
+    EXPECT_EQ(error.get(), 0);
+    EXPECT_EQ(written, 300'000u);
+    EXPECT_EQ(got, text);
+}
+
+}  // namespace
