@@ -278,6 +278,9 @@ pelorin_component(io LEVEL 2 LIBRARY pelorin
     src/io/fd_transport.cpp
     src/io/file_transport.cpp
     src/io/ring_buffer.cpp
+    src/io/secret_mask.cpp
+    src/io/secret_mask.h
+    src/io/tap_transport.cpp
     src/io/timed_uart.cpp
     src/io/timed_uart.h
     src/io/timed_uart_connection.cpp
