@@ -81,6 +81,7 @@ TEST_F(BitFieldLog, LinesOfAStraddlingField) {
     EXPECT_THAT(straddle(9, 10), ElementsAre(picture("    "), second, picture("0-------    desc")));
     EXPECT_THAT(straddle(8, 0), ElementsAre(second, picture("    desc")));
     EXPECT_THAT(straddle(3, -1), ElementsAre(picture("    desc")));
+    EXPECT_THAT(straddle(-249, -250), ElementsAre(picture("    desc")));
 }
 
 TEST_F(BitFieldLog, EveryPositionAndWidthShowsTheFieldsBits) {

@@ -140,7 +140,7 @@ void checkInteger(T value) {
 template <class... Ts>
 void checkTypes() {
     for (unsigned bit = 0; bit < 64; ++bit)
-        for (const long long value : {1LL << bit, -(1LL << bit), 0x123456789ABCDEF0LL >> bit})
+        for (const auto value : {1ULL << bit, ~0ULL << bit, 0x123456789ABCDEF0ULL >> bit})
             (checkInteger(static_cast<Ts>(value)), ...);
 }
 

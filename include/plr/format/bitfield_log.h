@@ -28,9 +28,9 @@ PLR_EXPORT void logBitFieldWithDesc(const StaticLogger& logger, unsigned char by
                                     const BitRange& range,
                                     const std::function<std::string(unsigned char)>& describe);
 
-// Logs a field that may lie in several bytes: each byte that it begins as a line of
-// getBytePrettyPrint(), then, for a part of a byte, its picture. The description
-// stands in the last line.
+// Logs a field that may lie in several bytes. A byte whose first bit belongs to it is
+// shown as a line of getBytePrettyPrint(); where only a part of a byte does, the picture
+// of that part follows. The description stands in the last line.
 // `bitPosition`: where the field ends: the number of the first bit behind it, counted
 // from the most significant bit of the first byte, which is 0.
 // `width`: bits. One below 1 shows an empty picture.
