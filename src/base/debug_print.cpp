@@ -29,11 +29,21 @@ struct Registration {
     void* context = nullptr;
 };
 
-// Callers of the delegate share it; who replaces the delegate waits for them.
+// Callers of the delegate share `delegate`; who replaces the delegate waits for them.
+// All go through `gate`, at which he keeps new callers back: a shared mutex alone lets
+// them pass by him for ever.
+struct Locks {
+    std::mutex gate;
+    std::shared_mutex delegate;
+};
 // Never destroyed: threads may print until the process ends.
-std::shared_mutex& mutex() {
-    static auto* const instance = new std::shared_mutex;
+Locks& locks() {
+    static auto* const instance = new Locks;
     return *instance;
+}
+std::shared_lock<std::shared_mutex> share() {
+    const std::lock_guard pass(locks().gate);
+    return std::shared_lock(locks().delegate);
 }
 constinit Registration registration;
 
@@ -46,7 +56,8 @@ thread_local bool insideDelegate = false;
 extern "C" {
 
 void PelorinDebugSetDelegate(PelorinDebugDelegate delegate, void* context) {
-    const std::unique_lock lock(mutex());
+    const std::lock_guard pass(locks().gate);
+    const std::lock_guard lock(locks().delegate);
     registration = delegate ? Registration{delegate, context} : Registration{};
 }
 
@@ -60,7 +71,7 @@ void PelorinDebugPrint(const char* function, const char* format, ...) {
     if (insideDelegate) {
         registration.delegate(registration.context, function, text.data());
     } else {
-        const std::shared_lock lock(mutex());
+        const auto lock = share();
         insideDelegate = true;
         registration.delegate(registration.context, function, text.data());
         insideDelegate = false;
