@@ -8,6 +8,7 @@
 #include <mutex>
 #include <shared_mutex>
 #include <string_view>
+#include <type_traits>
 
 #include "Pelorin"
 
@@ -36,14 +37,13 @@ struct Locks {
     std::mutex gate;
     std::shared_mutex delegate;
 };
-// Never destroyed: threads may print until the process ends.
-Locks& locks() {
-    static auto* const instance = new Locks;
-    return *instance;
-}
+// Threads may print until the process ends: nothing of it is ever torn down.
+constinit Locks locks;
+static_assert(std::is_trivially_destructible_v<Locks>);
+
 std::shared_lock<std::shared_mutex> share() {
-    const std::lock_guard pass(locks().gate);
-    return std::shared_lock(locks().delegate);
+    const std::lock_guard pass(locks.gate);
+    return std::shared_lock(locks.delegate);
 }
 constinit Registration registration;
 
@@ -56,8 +56,8 @@ thread_local bool insideDelegate = false;
 extern "C" {
 
 void PelorinDebugSetDelegate(PelorinDebugDelegate delegate, void* context) {
-    const std::lock_guard pass(locks().gate);
-    const std::lock_guard lock(locks().delegate);
+    const std::lock_guard pass(locks.gate);
+    const std::lock_guard lock(locks.delegate);
     registration = delegate ? Registration{delegate, context} : Registration{};
 }
 

@@ -5,7 +5,6 @@
 #include <cstdint>
 #include <cstring>
 #include <limits>
-#include <memory>
 #include <new>
 
 #include "Pelorin"
@@ -136,12 +135,13 @@ std::int32_t writePiece(void* context, const void* piece, std::uint32_t length) 
 bool linearizeWrapped(PelorinRingBuffer& ring, const Positions& at) {
     const std::uint32_t tail = at.toStorageEnd;
     // Deliberate: also of a full and of an empty buffer, whose bytes need not move.
-    const std::unique_ptr<std::uint8_t[]> block(new (std::nothrow) std::uint8_t[tail]);
+    void* const block = ::operator new(tail, std::nothrow);
     if (!block)
         return false;
-    std::memcpy(block.get(), ring.buffer + at.read, tail);
+    std::memcpy(block, ring.buffer + at.read, tail);
     std::memmove(ring.buffer + tail, ring.buffer, at.write);
-    std::memcpy(ring.buffer, block.get(), tail);
+    std::memcpy(ring.buffer, block, tail);
+    ::operator delete(block);
     return true;
 }
 
