@@ -5,8 +5,6 @@
 #include <string>
 #include <string_view>
 
-#include "dispatch/dispatch.h"
-
 namespace radio {
 
 struct ModemLine {
@@ -33,32 +31,6 @@ class LineSplitter {
 
     Handler handler_;
     ModemLine line_{1, {}, false};
-};
-
-// A Modem reads what a terminal, a FIFO or a file says, line by line, and never
-// blocks its queue. A file is read to its end; a FIFO stays open when its
-// writers leave; a terminal is set to raw mode.
-//
-// Owner:   its creator, who makes it on any thread and destroys it on its queue;
-//          no handler runs afterwards.
-// Queues:  both handlers run on `queue`, from start() on.
-class Modem {
-  public:
-    // Called once when nothing will follow: 0 at the end of a file or after a
-    // hang-up, else the error number.
-    using EndHandler = std::function<void(int error)>;
-
-    // Throws std::system_error when `path` cannot be opened or watched.
-    Modem(const std::string& path, const dispatch::queue& queue, LineSplitter::Handler onLine,
-          EndHandler onEnd);
-    Modem(const Modem&) = delete;
-    Modem& operator=(const Modem&) = delete;
-    ~Modem() { source_.cancel(); }
-
-    void start() const { source_.resume(); }  // once
-
-  private:
-    dispatch::source source_;
 };
 
 }  // namespace radio

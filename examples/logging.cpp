@@ -1,6 +1,8 @@
 #include "examples/logging.h"
 
+#include <Pelorin>
 #include <stdexcept>
+#include <string_view>
 
 namespace radio {
 namespace {
@@ -25,6 +27,21 @@ std::shared_ptr<plr::LogServer> startLog(const char* program,
     server->start();
     plr::drainLogsOnCrash(server);
     return server;
+}
+
+DebugPrints::DebugPrints(const std::shared_ptr<plr::LogServer>& logServer)
+    : logger_("radio.port", logServer) {
+    const auto print = [](void* context, const char* function, const char* text) {
+        std::string_view line(text);
+        line.remove_suffix(line.ends_with('\n') ? 1 : 0);
+        log(static_cast<DebugPrints*>(context)->logger_, plr::LogLevel::Debug, function, ": ",
+            std::string(line));
+    };
+    PelorinDebugSetDelegate(print, this);
+}
+
+DebugPrints::~DebugPrints() {
+    PelorinDebugSetDelegate(nullptr, nullptr);
 }
 
 }  // namespace radio

@@ -31,4 +31,17 @@ void log(const Logger& logger, plr::LogLevel level, const Parts&... parts) {
     logger.forceLog(level, std::move(text));
 }
 
+// Sends what the flat interface has to say (debug prints) into the log, at Debug in the
+// domain radio.port, while it exists. One at a time.
+class DebugPrints {
+  public:
+    explicit DebugPrints(const std::shared_ptr<plr::LogServer>& logServer);
+    DebugPrints(const DebugPrints&) = delete;
+    DebugPrints& operator=(const DebugPrints&) = delete;
+    ~DebugPrints();
+
+  private:
+    const plr::StaticLogger logger_;
+};
+
 }  // namespace radio

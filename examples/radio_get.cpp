@@ -5,7 +5,8 @@
 //                           there; PATH/* for everything there, * for everything;
 //                           /descriptions for what there is
 //   radio_get PATH VALUE    asks with the value: true, false, null, an integer, else
-//                           a string; /requests/reset_modem null
+//                           a string, in quotes where it is to be one:
+//                           /requests/enter_pin '"1234"'
 
 #include <chrono>
 #include <optional>

@@ -1,6 +1,7 @@
 // radio_set: sets one property.
 //
-//   radio_set PATH VALUE    VALUE: true, false, null, an integer, else a string
+//   radio_set PATH VALUE    VALUE: true, false, null, an integer, else a string,
+//                           in quotes where it is to be one: '"1234"'
 
 #include <string>
 

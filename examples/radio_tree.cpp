@@ -21,6 +21,8 @@ constexpr struct {
     {"/radio/signal", "int64", "Signal strength in dBm; null when it is not known."},
     {"/radio/sim", "string", "READY, or what the card waits for."},
     {"/assertions/keep_radio_on", "assertion", "Keeps the radio on while somebody holds it."},
+    {"/requests/enter_pin", "request", "Gives the card its PIN, a string; answers the result."},
+    {"/requests/refresh", "request", "Asks the modem for what it reports; answers the result."},
     {"/requests/reset_modem", "request", "Answers the number of resets when the modem is back."},
     {"/settings/airplane_mode", "bool", "Kept for whom it concerns."},
     {"/settings/status_seconds", "int64", "Period of status lines in the log; 0 ends them."},
@@ -37,6 +39,7 @@ void restrictAccess(RestServerExample& server) {
         only("/events", Operation::kSet),
         only("/assertions/keep_radio_on/provider", Operation::kPush),
         only("/requests", Operation::kPush),
+        only("/requests/enter_pin", Operation::kGet),
     });
 }
 

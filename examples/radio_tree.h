@@ -14,13 +14,13 @@ namespace radio {
 //   /events/...             calls and messages as they come; not kept
 //   /messages/KEY           what the modem keeps, SM-3 for instance, until a client removes it
 //   /assertions/...         what clients need: keep_radio_on (power.h)
-//   /requests/...           what clients ask for: reset_modem (power.h)
+//   /requests/...           what clients ask for: reset_modem and more (modem_requests.h)
 //   /log/DOMAIN             levels of log domains (log_levels.h)
 //   /log_server             an endpoint for clients to log to (remote_log.h)
 //   /descriptions           all this, to read
 //
-// What the modem and the power component tell comes from this user only, by access
-// rules. `logger` has the log that the last ones are about. Any thread.
+// What the modem and the power component tell, and the card's PIN, come from this user
+// only, by access rules. `logger` has the log that the last ones are about. Any thread.
 void installResources(plr::rest::RestServerExample& server,
                       const std::shared_ptr<plr::Logger>& logger);
 

@@ -1,9 +1,12 @@
-// radiod: a radio service. It reads what a modem says, line by line, and
-// publishes it as properties and events under the name net.example.radio.
+// radiod: a radio service. It asks a modem, reads what it says, line by line, and
+// publishes that as properties and events under the name net.example.radio.
 //
-//   radiod --modem PATH [--log PLACE]... [--group NAME]
+//   radiod --modem PATH [--baud N] [--no-flow-control] [--log PLACE]... [--group NAME]
 //
-//   --modem PATH    a terminal, a FIFO or a file with a recorded session
+//   --modem PATH    a terminal with a modem that speaks AT, there already or yet to come;
+//                   or a FIFO or file with a recorded session
+//   --baud N        bits a second of the terminal, 115200
+//   --no-flow-control   the terminal has no lines for it
 //   --log PLACE     console (standard error; used when there is no --log), system,
 //                   or the path of a file
 //   --group NAME    its members may be clients; without it only this user and root
@@ -18,42 +21,20 @@
 #include <memory>
 #include <stdexcept>
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "examples/end_signals.h"
 #include "examples/logging.h"
-#include "examples/modem_reader.h"
+#include "examples/modem_control.h"
+#include "examples/modem_requests.h"
 #include "examples/power.h"
 #include "examples/radio_service.h"
+#include "examples/radiod_options.h"
 #include "vox/service.h"
 
 namespace {
 
 constexpr const char* kService = "net.example.radio";
-
-struct Options {
-    std::string modem;
-    std::vector<std::string> logs;
-    std::string group;
-};
-
-// False when they are wrong.
-bool parse(int argc, char** argv, Options& options) {
-    for (int i = 1; i + 1 < argc; i += 2) {
-        if (std::string_view(argv[i]) == "--modem")
-            options.modem = argv[i + 1];
-        else if (std::string_view(argv[i]) == "--log")
-            options.logs.emplace_back(argv[i + 1]);
-        else if (std::string_view(argv[i]) == "--group")
-            options.group = argv[i + 1];
-        else
-            return false;
-    }
-    if (options.logs.empty())
-        options.logs.emplace_back("console");
-    return argc % 2 == 1 && !options.modem.empty();
-}
 
 vox::listener createListener(const std::string& groupName) {
     const auto listener = vox::listener::create(kService);
@@ -66,33 +47,37 @@ vox::listener createListener(const std::string& groupName) {
     return listener;
 }
 
-int serve(const Options& options, const std::shared_ptr<plr::LogServer>& logServer,
+int serve(const radio::RadiodOptions& options, const std::shared_ptr<plr::LogServer>& logServer,
           radio::EndSignals& end) {
     const auto timers = plr::DispatchTimerService::create(logServer);
     const auto service = radio::RadioService::create(logServer, timers);
-    const auto reader = radio::ModemReader::create(
-        logServer, options.modem,
+    const auto modem = radio::ModemControl::create(
+        logServer, timers, options.modem,
         [service](const auto& path, const auto& value) { service->publish(path, value); });
     const auto listener = createListener(options.group);
     std::shared_ptr<radio::PowerControl> power;
+    std::shared_ptr<radio::ModemRequests> requests;
     const plr::StaticLogger logger("radio", logServer);
     if (service->serve(listener, [&end] { end.raise(1); })) {
-        power = radio::PowerControl::create(logServer, timers,
-                                            vox::endpoint::create(listener).connect());
+        const auto endpoint = vox::endpoint::create(listener);
+        power = radio::PowerControl::create(logServer, endpoint.connect());
+        requests = radio::ModemRequests::create(logServer, modem, endpoint.connect());
         radio::log(logger, plr::LogLevel::Notice, "serving ", kService);
         vox_notify_ready();
     }
-    reader->start();
+    modem->start();
     const int status = end.wait();
     vox_notify_stopping();
+    modem->close();
     radio::log(logger, plr::LogLevel::Notice, "ending");
     return status;
 }
 
 // What stops the service is in its log, and the log is out before the process is.
-int run(const Options& options, radio::EndSignals& end) {
+int run(const radio::RadiodOptions& options, radio::EndSignals& end) {
     const auto logServer = radio::startLog("radiod", options.logs);
     const plr::ScopedLogFlusher flusher(logServer);
+    const radio::DebugPrints debugPrints(logServer);
     try {
         return serve(options, logServer, end);
     } catch (const std::exception& error) {
@@ -104,14 +89,15 @@ int run(const Options& options, radio::EndSignals& end) {
 }  // namespace
 
 int main(int argc, char** argv) {
-    Options options;
-    if (!parse(argc, argv, options)) {
-        std::cerr << "usage: radiod --modem PATH [--log console|system|PATH]... [--group NAME]\n";
+    const auto options = radio::parseOptions({argv + 1, argv + argc});
+    if (!options) {
+        std::cerr << "usage: radiod --modem PATH [--baud N] [--no-flow-control]"
+                     " [--log console|system|PATH]... [--group NAME]\n";
         return 2;
     }
     radio::EndSignals end;
     try {
-        return run(options, end);
+        return run(*options, end);
     } catch (const std::exception& error) {
         std::cerr << "radiod: " << error.what() << '\n';
         return 1;

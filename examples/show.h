@@ -26,12 +26,14 @@ inline std::string oneLine(const vox::object& value) {
     return text;
 }
 
-// true, false, null, an integer, else a string.
+// true, false, null, an integer, else a string, which may stand in quotes: "1234".
 inline vox::object valueOf(std::string_view word) {
     if (word == "true" || word == "false")
         return vox::boolean(word == "true");
     if (word == "null")
         return nullptr;
+    if (word.size() >= 2 && word.starts_with('"') && word.ends_with('"'))
+        return vox::string(word.substr(1, word.size() - 2));
     std::int64_t number = 0;
     const char* const end = word.data() + word.size();
     const auto read = std::from_chars(word.data(), end, number);

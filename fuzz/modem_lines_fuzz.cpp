@@ -8,7 +8,7 @@
 #include <string_view>
 #include <vector>
 
-#include "examples/modem.h"
+#include "examples/line_splitter.h"
 #include "examples/radio_reports.h"
 #include "plr/base/assert.h"
 

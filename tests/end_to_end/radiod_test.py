@@ -8,12 +8,14 @@ import pathlib
 import subprocess
 import sys
 import tempfile
+import time
 import unittest
 
 sys.path.insert(0, str(pathlib.Path(__file__).resolve().parents[1] / "support"))
 import vox_client  # noqa: E402
 
 EXAMPLES = pathlib.Path(sys.argv.pop(1))
+SCRIPTS = pathlib.Path(__file__).resolve().parents[2] / "examples" / "data"
 SERVICE = "net.example.radio"
 
 
@@ -22,6 +24,8 @@ def message(operation, path, value=None, author="python"):
 
 
 class Radiod(unittest.TestCase):
+    """What the tests below stand on."""
+
     def setUp(self):
         folder = tempfile.TemporaryDirectory()
         self.addCleanup(folder.cleanup)
@@ -29,7 +33,10 @@ class Radiod(unittest.TestCase):
         os.mkfifo(self.fifo)
         self.log = pathlib.Path(folder.name, "log")
         os.environ["VOX_RUNTIME_DIR"] = os.path.join(folder.name, "run")
-        self.radiod = self.start("radiod", "--modem", self.fifo, "--log", self.log)
+        self.folder = folder.name
+
+    def serve(self, modem):
+        self.radiod = self.start("radiod", "--modem", modem, "--log", self.log)
         self.client = vox_client.Connection.open(SERVICE)
         self.addCleanup(self.client.close)
 
@@ -39,12 +46,20 @@ class Radiod(unittest.TestCase):
         return process
 
     def end(self, process):
-        process.terminate()
-        self.assertEqual(process.wait(30), 0)
+        if process.poll() is None:
+            process.terminate()
+            self.assertEqual(process.wait(30), 0)
 
     def modem_says(self, *lines):
         with open(self.fifo, "w", encoding="ascii") as modem:
             modem.write("".join(line + "\r\n" for line in lines))
+
+    def ask(self, name, value=None):
+        """The answer of who provides that request, who may still be on the way."""
+        reply, end = {"e": "no provider"}, time.monotonic() + 30
+        while reply.get("e") == "no provider" and time.monotonic() < end:
+            reply = self.client.request(message("get", "/requests/" + name, value))
+        return reply["v"]
 
     def get(self, path):
         return self.client.request(message("get", path))["v"]
@@ -59,6 +74,18 @@ class Radiod(unittest.TestCase):
         self.assertIsNone(request_id)
         self.assertEqual((received["o"], received["a"]), ("notify", "python"))
         return received["r"], received["v"]
+
+    def notified_until(self, path, value):
+        while self.notified() != (path, value):
+            pass
+
+
+class Recorded(Radiod):
+    """The modem is a FIFO, which is only read."""
+
+    def setUp(self):
+        super().setUp()
+        self.serve(self.fifo)
 
     def test_sets_gets_and_watches_a_property(self):
         self.watch("/settings/volume")
@@ -100,11 +127,9 @@ class Radiod(unittest.TestCase):
             self.client.send(message("pop", path))
             self.assertEqual(self.notified(), ("/radio/power", False))
 
-    def test_requests_are_answered_by_who_provides_them(self):
-        self.watch("/assertions/keep_radio_on")  # granted by the same
-        self.notified()
-        for resets in (1, 2):
-            self.assertEqual(self.get("/requests/reset_modem"), resets)
+    def test_requests_that_nobody_can_carry_out_are_answered(self):
+        self.assertEqual(self.ask("reset_modem"), "not reset")
+        self.assertEqual(self.ask("enter_pin", "1234"), "no answer")
         refused = self.client.request(message("get", "/requests/fly"))
         self.assertEqual((refused.get("v"), refused["e"]), (None, "no provider"))
 
@@ -130,6 +155,52 @@ class Radiod(unittest.TestCase):
                                 stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
         self.assertEqual(second.returncode, 1)
         self.assertEqual(self.get("/radio"), [], "the first one goes on")
+
+
+class Terminal(Radiod):
+    """The modem is a process behind a terminal, which comes and goes."""
+
+    def setUp(self):
+        super().setUp()
+        self.terminal = os.path.join(self.folder, "terminal")
+        self.serve(self.terminal)  # before it is there
+
+    def start_modem(self, script):
+        modem = subprocess.Popen([EXAMPLES / "modem", "--script", SCRIPTS / script, "--link", self.terminal,
+                                  "--lines", self.fifo], stdout=subprocess.DEVNULL)
+        self.addCleanup(self.end, modem)
+        return modem
+
+    def test_asks_a_modem_as_often_as_it_comes(self):
+        self.watch("/radio/signal", "/radio/sim", "/radio/operator")
+        for _ in range(2):
+            modem = self.start_modem("modem_script.txt")
+            self.notified_until("/radio/signal", -59)
+            modem.kill()
+            modem.wait(30)
+            os.remove(self.terminal)
+            self.assertEqual({self.notified() for _ in range(3)}, {
+                ("/radio/signal", None), ("/radio/sim", None), ("/radio/operator", None)})
+
+    def test_carries_out_what_clients_ask_and_keeps_the_pin_out_of_the_log(self):
+        self.client.send(message("set", "/log/radio.modem", "Trace"))
+        self.watch("/radio/sim", "/radio/signal")
+        self.start_modem("locked_modem_script.txt")
+        self.notified_until("/radio/sim", "SIM PIN")
+        answers = {"12": "no PIN", '1234"\rATH\r': "no PIN", "9876": "+CME ERROR: 16", "1234": "OK"}
+        for pin, answer in answers.items():
+            with self.subTest(pin=pin):
+                self.assertEqual(self.ask("enter_pin", pin), answer)
+        self.notified_until("/radio/sim", "READY")
+        self.assertEqual(self.ask("refresh"), "OK")
+        self.assertEqual([self.ask("reset_modem"), self.ask("reset_modem")], [1, 2])
+        self.modem_says("+CSQ: 1,0")
+        self.notified_until("/radio/signal", -111)
+        self.end(self.radiod)
+        log = self.log.read_text()
+        self.assertIn('AT+CPIN="****"', log)
+        for secret in ('"1234', "31 32 33 34", '"9876', "39 38 37 36"):
+            self.assertNotIn(secret, log)
 
 
 if __name__ == "__main__":

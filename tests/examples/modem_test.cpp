@@ -1,15 +1,13 @@
 #include "examples/modem.h"
 
-#include <fcntl.h>
 #include <gtest/gtest.h>
-#include <unistd.h>
 
-#include <cstdlib>
 #include <optional>
+#include <stdexcept>
 #include <string>
-#include <system_error>
 #include <vector>
 
+#include "support/scripted_modem.h"
 #include "support/waiting.h"
 
 namespace radio {
@@ -49,36 +47,36 @@ TEST(LineSplitter, FindsTheSameLinesHoweverTheBytesArrive) {
                 << row.input.substr(0, 40) << " by " << size;
 }
 
-TEST(Modem, ReadsATerminalUntilItHangsUp) {
-    const int host = ::posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
-    ASSERT_EQ(::grantpt(host), 0);
-    ASSERT_EQ(::unlockpt(host), 0);
+TEST(Modem, IsReadUntilItHangsUpAndToldWhatIsWritten) {
+    plr::test::ScriptedModem host{plr::test::ModemScript()};
     const auto queue = dispatch::queue::create("modem_test");
     std::vector<std::string> lines;  // touched on the queue only
-    std::optional<int> end;          // the same
     plr::test::Event arrived;
     plr::test::Event ended;
     std::optional<Modem> modem;
-    modem.emplace(
-        ::ptsname(host), queue,
-        [&](const ModemLine& line) {
-            lines.push_back(shown(line));
-            arrived.signal();
-        },
-        [&](int error) {
-            end = error;
-            ended.signal();
-        });
-    modem->start();
-    ASSERT_EQ(::write(host, "\r\nRING\r\n", 8), 8);
+    const auto open = [&](const std::string& path) {
+        modem.emplace(ModemSettings{.path = path}, queue,
+                      ModemHandlers{.onLine =
+                                        [&](const ModemLine& line) {
+                                            lines.push_back(shown(line));
+                                            arrived.signal();
+                                        },
+                                    .onEnd = [&] { ended.signal(); },
+                                    .onTrace = [](std::string_view) {}});
+    };
+    queue.sync([&] { open(host.path()); });
+    ASSERT_TRUE(host.say("RING"));
     ASSERT_TRUE(arrived.wait());
-    ::close(host);
+    queue.sync([&] { EXPECT_TRUE(modem->write("ATE0\r")); });
+    ASSERT_TRUE(arrived.wait());  // the echo
+    host.hangUp();
     ASSERT_TRUE(ended.wait());
     queue.sync([&] {
-        EXPECT_EQ(lines, std::vector<std::string>{"2:RING"});
-        EXPECT_EQ(end, 0);
+        EXPECT_EQ(lines[0], "2:RING");
+        EXPECT_EQ(lines[1], "3:ATE0");
+        EXPECT_FALSE(modem->write("AT\r"));
         modem.reset();
-        EXPECT_THROW(Modem("/nothing", queue, {}, {}).start(), std::system_error);
+        EXPECT_THROW(open("/nothing"), std::runtime_error);
     });
 }
 

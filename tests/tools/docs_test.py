@@ -31,9 +31,9 @@ class Docs(unittest.TestCase):
         self.assertEqual(shown, [(PROJECT / "examples" / "readme_example.cpp").read_text()])
 
     def test_shown_code_is_built(self):
-        examples = [path.read_text() for path in (PROJECT / "examples").iterdir() if path.suffix in (".cpp", ".h")]
+        examples = [path.read_text() for path in (PROJECT / "examples").iterdir() if path.suffix in (".c", ".cpp", ".h")]
         for document in documents():
-            for shown in re.findall(r"```cpp\n(.*?)```", document.read_text(), re.S):
+            for shown in re.findall(r"```(?:c|cpp)\n(.*?)```", document.read_text(), re.S):
                 with self.subTest(document=document.name, shown=shown):
                     self.assertTrue(any(shown in example for example in examples))
 

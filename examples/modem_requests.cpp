@@ -1,0 +1,75 @@
+#include "examples/modem_requests.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "examples/logging.h"
+
+namespace radio {
+namespace {
+
+using plr::LogLevel;
+
+// TS 27.007, 8.3 and TS 31.101, 9.5.1: 4 to 8 digits.
+bool isPin(std::string_view text) {
+    return text.size() >= 4 && text.size() <= 8 &&
+           std::ranges::all_of(text, [](char c) { return c >= '0' && c <= '9'; });
+}
+
+AtChannel::Handler answerWith(const std::shared_ptr<vox::object>& reply) {
+    return [reply](const AtAnswer& answer) {
+        if (reply)
+            *reply = vox::string(answer.result.empty() ? "no answer" : answer.result);
+    };
+}
+
+}  // namespace
+
+std::shared_ptr<ModemRequests> ModemRequests::create(
+    const std::shared_ptr<plr::LogServer>& logServer, std::shared_ptr<ModemControl> modem,
+    vox::connection service) {
+    auto requests = make_shared_ptr(new ModemRequests(logServer, std::move(modem)));
+    requests->execute_wrapped([self = requests.get(), service = std::move(service)] {
+        self->ownQueue_.assertCurrent();
+        self->init_sync(service);
+    });
+    return requests;
+}
+
+void ModemRequests::init_sync(vox::connection service) {
+    // This object goes on its queue, and with it the handlers.
+    rest_.registerAsRequestSink("/requests/enter_pin", [this](const auto& pin, const Reply& reply) {
+        ownQueue_.assertCurrent();
+        enterPin_sync(pin, reply);
+    });
+    rest_.registerAsRequestSink("/requests/refresh", [this](auto&&, const Reply& reply) {
+        ownQueue_.assertCurrent();
+        modem_->refresh(answerWith(reply));
+    });
+    rest_.registerAsRequestSink("/requests/reset_modem", [this](auto&&, const Reply& reply) {
+        ownQueue_.assertCurrent();
+        reset_sync(reply);
+    });
+    rest_.connect(std::move(service));
+}
+
+// Whatever else the text may be would be a command.
+void ModemRequests::enterPin_sync(const vox::object& pin, const Reply& reply) {
+    const std::string digits(pin.text());
+    if (isPin(digits))
+        modem_->send("AT+CPIN=\"" + digits + '"', answerWith(reply));
+    else if (reply)
+        *reply = vox::string("no PIN");
+}
+
+void ModemRequests::reset_sync(const Reply& reply) {
+    log(logger(), LogLevel::Notice, "the modem is to be reset");
+    modem_->reset(plr::whileAlive(weak_from_this(), [reply](ModemRequests& self, bool isBack) {
+        log(self.logger(), LogLevel::Notice, "the modem is ", isBack ? "reset" : "not reset");
+        const std::int64_t resets = self.resets_ += isBack ? 1 : 0;
+        if (reply)
+            *reply = isBack ? vox::int64(resets) : vox::string("not reset");
+    }));
+}
+
+}  // namespace radio
