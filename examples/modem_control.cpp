@@ -24,6 +24,11 @@ std::chrono::nanoseconds pauseAfter(unsigned failures) {
     return plr::rest::pauseAfter(failures, {}, std::uniform_real_distribution<>()(random));
 }
 
+// What every attempt would say again, an operator need not read.
+LogLevel unlessAgain(LogLevel level, unsigned failures) {
+    return failures == 0 ? level : LogLevel::Debug;
+}
+
 }  // namespace
 
 ModemControl::ModemControl(std::shared_ptr<plr::LogServer> logServer,
@@ -81,10 +86,10 @@ void ModemControl::open_sync() {
     try {
         modem_ = std::make_unique<Modem>(settings_, ownQueue_.queue(), handlers());
     } catch (const std::runtime_error& error) {
-        log(logger(), failures_ == 0 ? LogLevel::Warn : LogLevel::Debug, error.what());
+        log(logger(), unlessAgain(LogLevel::Warn, failures_), error.what());
         return openAgain_sync();
     }
-    log(logger(), LogLevel::Info, settings_.path, " is open");
+    log(logger(), unlessAgain(LogLevel::Info, failures_), settings_.path, " is open");
     if (!modem_->isTerminal())
         return;
     channel_ = createChannel();
@@ -145,7 +150,7 @@ void ModemControl::lose_sync(const char* why) {
     if (!channel)
         return;
     modem_.reset();
-    log(logger(), LogLevel::Warn, "the modem ", why);
+    log(logger(), unlessAgain(LogLevel::Warn, failures_), "the modem ", why);
     for (const std::string& path : std::exchange(reported_, {}))
         onReport_(path, {});
     openAgain_sync();
