@@ -1,5 +1,7 @@
+#include <dlfcn.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <poll.h>
 #include <pthread.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
@@ -17,6 +19,18 @@
 
 #include "Pelorin"
 #include "support/waiting.h"
+
+namespace {
+thread_local timespec waitedFor;  // by the last ppoll(); -1 s: for ever
+}  // namespace
+
+extern "C" __attribute__((visibility("default"))) int ppoll(pollfd* descriptors, nfds_t count,
+                                                            const timespec* timeout,
+                                                            const sigset_t* mask) {
+    static auto* const next = reinterpret_cast<decltype(&ppoll)>(::dlsym(RTLD_NEXT, "ppoll"));
+    waitedFor = timeout ? *timeout : timespec{-1, 0};
+    return next(descriptors, count, timeout, mask);
+}
 
 namespace {
 
@@ -120,6 +134,24 @@ TEST(Descriptor, NumbersFrom1024OnWork) {
     EXPECT_EQ(Read(1024, 2047, 0).error, ETIMEDOUT);
     unblock.put("x");
     EXPECT_EQ(Read(1024, 2047, PELORIN_FOREVER).error, ECANCELED);
+}
+
+TEST(Descriptor, TimeOutsAreMilliseconds) {
+    const Ends data;
+    data.put("ready at once, whatever the time-out is");
+    struct {
+        std::uint32_t timeoutMs;
+        time_t seconds;
+        long nanoseconds;
+    } const rows[] = {
+        {0, 0, 0}, {1, 0, 1'000'000}, {2999, 2, 999'000'000}, {kLongest, 4'294'967, 294'000'000}};
+    for (const auto& row : rows) {
+        EXPECT_EQ(Read(data.out(), -1, row.timeoutMs).result, 4);
+        EXPECT_EQ(waitedFor.tv_sec, row.seconds) << row.timeoutMs;
+        EXPECT_EQ(waitedFor.tv_nsec, row.nanoseconds) << row.timeoutMs;
+    }
+    EXPECT_EQ(Read(data.out(), -1, PELORIN_FOREVER).result, 4);
+    EXPECT_EQ(waitedFor.tv_sec, -1);
 }
 
 TEST(Descriptor, ALongWaitEndsWhenDataComesOrTheUnblock) {
