@@ -42,6 +42,7 @@ class SecretMask {
 
   private:
     using States = std::uint64_t;
+    static_assert(kLongestPattern < 8 * sizeof(States));
 
     struct Pattern {
         std::array<States, 256> takes{};  // by byte: the states that it moves on

@@ -1,4 +1,3 @@
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -12,6 +11,7 @@
 
 #include "Pelorin"
 #include "src/io/secret_mask.h"
+#include "support/failing_allocations.h"
 #include "support/fake_transport.h"
 #include "support/tap_records.h"
 
@@ -58,6 +58,12 @@ struct Tapped {
     }
 };
 
+std::string zeroed(std::string text) {
+    std::ranges::replace_if(
+        text, [](char c) { return c >= '1' && c <= '9'; }, '0');
+    return text;
+}
+
 TEST(TapTransport, PassesExchangesOnAndShowsThem) {
     Tapped tapped;
     EXPECT_TRUE(tapped.write("AT\r"));
@@ -81,7 +87,7 @@ TEST(TapTransport, PassesExchangesOnAndShowsThem) {
     for (std::size_t i = 0; i < expected.size(); ++i) {
         const auto& record = tapped.records.all[i];
         EXPECT_EQ(record.heading, expected[i]);
-        EXPECT_THAT(record.time, testing::MatchesRegex("20..-..-..T..:..:..\\.......Z"));
+        EXPECT_EQ(zeroed(record.time), "0000-00-00T00:00:00.000000Z");
         EXPECT_TRUE(record.columnsAgree);
     }
     EXPECT_EQ(tapped.records.bytes('>'), "AT\rA");
@@ -152,16 +158,17 @@ TEST(TapTransport, ShowsDigitsThatAreNoSecret) {
     for (const char* text : {"\r\n+CSQ: 20,99\r\n", "AT+CLCK=\"SC\",2\r", "+CPIN=\r1234\r",
                              "1234567890123\r", "+CPIN: SIM PIN2\r\n"})
         EXPECT_EQ(tapped.shownOf(text), text);
-    Tapped own({"pin*##", "A#B"});
-    EXPECT_EQ(own.shownOf("PIN 1 22 333 a1b A2C 26201123456789012\r"),
-              "PIN 1 ** *** a*b A2C *****************\r");
+    Tapped own({"pin*##", "A#B", "#*!"});
+    EXPECT_EQ(own.shownOf("PIN 1 22 333\ra123b A2C\r1 2!\r3\r!"),
+              "PIN 1 ** ***\ra***b A2C\r* *!\r3\r!");
 }
 
 TEST(TapTransport, HidesSecretsInLongLinesAndLargeExchanges) {
     for (std::size_t blanks = 480; blanks < 600; ++blanks) {
-        const std::string fill(blanks, ' ');
-        // Behind its start, across a piece's end; in front of it, digits that are no secret.
-        const std::string text = "AT+CPWD=" + fill + "777\r" + fill + "1234568890,77777777777777\r";
+        // Behind its start, across a piece's end; before it, digits that are no secret.
+        std::string text = "AT+CPWD=";
+        text.append(blanks, ' ').append("777\r").append(blanks, ' ');
+        text.append("1234568890,77777777777777\r");
         ASSERT_EQ(Tapped().shownOf(text), hidden(text)) << blanks;
     }
     Tapped tapped;
@@ -199,13 +206,15 @@ TEST(TapTransport, ShowsReaderAndWriterOneAtATime) {
     std::thread writer([&tap] {
         std::uint32_t count = 0;
         for (int i = 0; i < kTimes; ++i)
-            tap.write(&tap, "7", 1, &count, true, 0, nullptr);
+            tap.write(&tap, "", 0, &count, true, 0, nullptr);
     });
+    plr::test::succeedingAllocations = 0;  // of this thread, which makes none
     for (int i = 0; i < kTimes; ++i) {
         std::uint32_t count = 0;
         char byte = 0;
         tap.read(&tap, &byte, 1, &count, false, 0, nullptr);
     }
+    plr::test::succeedingAllocations = -1;
     writer.join();
     EXPECT_EQ(context.shown, 2 * kTimes);
     EXPECT_TRUE(PelorinTransportFree(&tap));

@@ -97,7 +97,6 @@ void ScriptedModem::hangUp() {
         wake();
     }
     thread_.join();
-    client_.close();
     master_.close();
 }
 

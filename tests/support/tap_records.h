@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cerrno>
 #include <cstddef>
 #include <cstdlib>
 #include <string>
@@ -45,6 +46,7 @@ struct TapRecords {
 
     static void sink(void* context, const char* text) {
         static_cast<TapRecords*>(context)->all.push_back(tapRecord(text));
+        errno = 0;  // a sink may spoil it
     }
     // All bytes that records of direction `sign` show.
     [[nodiscard]] std::string bytes(char sign) const {
