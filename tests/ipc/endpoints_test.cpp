@@ -1,14 +1,9 @@
-#include <gtest/gtest.h>
-
-#include <memory>
-#include <string>
-#include <utility>
-#include <vector>
-
 #include "dispatch/group.h"
 #include "plr/ipc.h"
 #include "support/waiting.h"
 
+// What VoxServer and VoxClient promise whoever derives from them; see also
+// tests/log/remote_log_test.cpp.
 namespace {
 
 using namespace plr::test;
@@ -19,19 +14,17 @@ vox::dict message(const std::string& text) {
     made["text"] = vox::string(text);
     return made;
 }
-std::string textOf(const vox::object& message) {
-    return std::string(vox::object(vox::dict(message)["text"]).text());
+std::string textOf(const vox::dict& message) {
+    return std::string(message.text("text"));
 }
 
-// A server that remembers what it is told and echoes requests.
+// Remembers what it is told and echoes requests. All on the queue only, the events
+// apart.
 class EchoServer : public plr::VoxServer {
   public:
     static std::shared_ptr<EchoServer> create(const vox::connection& listener) {
-        auto made = make_shared_ptr(new EchoServer(listener));
-        made->execute_wrapped_sync([&] {
-            made->ownQueue_.assertCurrent();
-            made->startListener_sync();
-        });
+        auto made = make_shared_ptr(new EchoServer);
+        made->listenAt(listener);
         return made;
     }
     void listenAt(const vox::connection& listener) {
@@ -42,7 +35,6 @@ class EchoServer : public plr::VoxServer {
             startListener_sync();
         });
     }
-    // All on the queue only, the events apart.
     bool refuses = false;
     Texts heard;
     int listenerErrors = 0;
@@ -67,7 +59,7 @@ class EchoServer : public plr::VoxServer {
     }
 
   private:
-    explicit EchoServer(vox::connection listener) : VoxServer("echo", std::move(listener)) {}
+    EchoServer() : VoxServer("echo", nullptr) {}
 
     // An auto_reply in each of its forms sends it, once that is gone.
     void answer(const vox::connection& client, vox::dict reply) {
@@ -93,16 +85,8 @@ class RememberingClient : public plr::VoxClient {
     static std::shared_ptr<RememberingClient> create(const Queue&... given) {
         return make_shared_ptr(new RememberingClient(given...));
     }
-    // Runs with the connection to the server on the client's queue.
-    template <class Callable>
-    auto on(Callable&& work) {
-        return execute_wrapped_sync([&] {
-            ownQueue_.assertCurrent();
-            return work(helper_sync());
-        });
-    }
     void setServer(const vox::connection& server) {
-        execute_wrapped_sync([&] {
+        on([&](auto&) {
             ownQueue_.assertCurrent();
             setServer_sync(server);
         });
@@ -110,17 +94,23 @@ class RememberingClient : public plr::VoxClient {
     void send(const std::string& text) {
         on([&](auto& helper) { helper.getServer().send_message(message(text)); });
     }
+    // Whether what `group` waits for is over.
+    bool flush(dispatch::time limit) {
+        const dispatch::group sent;
+        on([&](auto& helper) { helper.flush(sent); });
+        return sent.wait(limit) == 0;
+    }
     // The text that answers.
     std::string ask(const std::string& text) {
         Event answered;
         std::string answer;
+        const dispatch::block<void(vox::object)> handler([&](const vox::dict& reply) {
+            answer = textOf(reply);
+            answered.signal();
+        });
         on([&](auto& helper) {
-            helper.getServer().send_message_with_reply(
-                message(text), dispatch::queue::global(),
-                dispatch::block<void(vox::object)>([&](const vox::object& reply) {
-                    answer = textOf(reply);
-                    answered.signal();
-                }));
+            helper.getServer().send_message_with_reply(message(text), dispatch::queue::global(),
+                                                       handler);
         });
         EXPECT_TRUE(answered.wait());
         return answer;
@@ -144,6 +134,15 @@ class RememberingClient : public plr::VoxClient {
   private:
     template <class... Queue>
     explicit RememberingClient(const Queue&... given) : VoxClient("remembering", given...) {}
+
+    // Runs with the connection to the server on the client's queue.
+    template <class Callable>
+    void on(Callable&& work) {
+        execute_wrapped_sync([&] {
+            ownQueue_.assertCurrent();
+            work(helper_sync());
+        });
+    }
 };
 
 class Endpoints : public testing::Test {
@@ -177,21 +176,16 @@ TEST_F(Endpoints, TalkToEachOther) {
     const auto other = RememberingClient::create(queue_);
     EXPECT_EQ(other->queue, queue_);
     other->setServer(connect());
-    const dispatch::group sent;
-    for (int i = 0; i < 1000; ++i) {
+    for (int i = 0; i < 1000; ++i)
         other->send(std::to_string(i));
-        if (i == 100) {
-            other->on([&](auto& helper) { helper.flush(sent); });
-            EXPECT_EQ(sent.wait(), 0);
-        }
-    }
+    EXPECT_TRUE(other->flush(dispatch::time::after(kBound)));
+    other->send("the last");
     other->setServer(nullptr);  // sends what waits
-    other->on([&](auto& helper) { helper.flush(sent); });
-    EXPECT_EQ(sent.wait(dispatch::immediately), 0) << "nothing to wait for without a connection";
+    EXPECT_TRUE(other->flush(dispatch::immediately)) << "nothing to wait for";
     EXPECT_TRUE(server_->clientError.wait());
     server_->queue.sync([this] {
-        EXPECT_EQ(server_->heard.size(), 1 + 3 + 1000U);
-        EXPECT_EQ(server_->heard.back(), "999");
+        EXPECT_EQ(server_->heard.size(), 1 + 3 + 1000 + 1U);
+        EXPECT_EQ(server_->heard.back(), "the last");
     });
     EXPECT_EQ(errors(), 0);
 }

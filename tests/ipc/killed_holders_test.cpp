@@ -1,11 +1,7 @@
 // Activities whose holders die: this program is also the holder, when it is
 // called with arguments.
-#include <gtest/gtest.h>
 
-#include <memory>
 #include <random>
-#include <string>
-#include <vector>
 
 #include "plr/ipc/vox_drosk_assertion.h"
 #include "support/service_process.h"
@@ -41,15 +37,12 @@ class Service {
             return false;
         const auto client = std::make_shared<Client>(
             Client{Ref::retain(event), assertion_->createActivity("client")});
-        const dispatch::block<void(vox_object_t)> handler([this, client](vox_object_t happened) {
+        resumeOn(listener_.queue, event, [this, client](vox_object_t happened) {
             if (vox_get_type(happened) == VOX_TYPE_DICTIONARY)
                 keep(happened);
             else
                 client->activity.reset();
         });
-        vox_connection_set_event_handler(event, &handler);
-        vox_connection_set_target_queue(event, &listener_.queue);
-        vox_connection_resume(event);
         return true;
     }
     // Until the asker is gone.
@@ -69,8 +62,7 @@ class Service {
     const Ref connection(vox_connection_create(kName));
     const dispatch::queue queue = dispatch::queue::create("holder");
     const dispatch::block<void(vox_object_t)> ignore([](vox_object_t) {});
-    vox_connection_set_event_handler(connection, &ignore);
-    vox_connection_resume(connection);
+    resumeOn(queue, connection, [](vox_object_t) {});
     for (std::int64_t n = 0; n < kRequests; ++n)
         vox_connection_send_message_with_reply(connection, message(n), &queue, &ignore);
     serviceIsReady();

@@ -1,17 +1,14 @@
 // A log server that is killed again and again while other processes log into
 // it: nothing is lost uncounted, nothing out of order.
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/mman.h>
 #include <sys/wait.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <array>
 #include <atomic>
 #include <charconv>
 #include <csignal>
-#include <fstream>
 #include <functional>
 #include <random>
 
@@ -22,6 +19,7 @@
 #include "plr/log/vox_log_server.h"
 #include "plr/log/vox_logger.h"
 #include "support/runtime.h"
+#include "support/sanitized.h"
 #include "support/scratch_folder.h"
 #include "support/waiting.h"
 
@@ -33,12 +31,8 @@ using plr::LogLevel;
 constexpr const char* kName = "net.example.log";
 constexpr int kClients = 4;
 constexpr int kServers = 21;  // one after the other; all but the last are killed at work
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int kPortion = 240;  // messages of each client that each server sees begun
-#else
-constexpr int kPortion = 2'400;
-#endif
-constexpr int kSent = kServers * kPortion;  // by each client: 50,400
+constexpr int kPortion = kSanitized ? 240 : 2'400;  // messages of a client that a server begins
+constexpr int kSent = kServers * kPortion;          // by each client: 50,400
 constexpr std::size_t kBuffer = kPortion / 3;
 
 // What the processes tell each other.

@@ -46,9 +46,11 @@ class Model {
         std::int64_t last = 0;
         while (const wheel_entry* due = wheel_->take_due(now_)) {
             EXPECT_LE(due->deadline(), now_);
-            // What was late already when it was inserted has no order to keep.
+            // What was late already when it was inserted has no order to keep; of equal
+            // deadlines the first comes first.
             if (late_.erase(due) == 0) {
                 EXPECT_GE(due->deadline(), last);
+                EXPECT_EQ(sorted_.lower_bound(due->deadline())->second, due);
                 last = due->deadline();
             }
             ASSERT_TRUE(forget(*due));

@@ -77,21 +77,6 @@ TEST(VoxCodec, LimitsAreInclusive) {
     }
 }
 
-TEST(VoxCodec, OutOfDescriptorsIsAnErrorAndLeaksNone) {
-    const Ref fd(vox_fd_create(STDIN_FILENO));
-    const Ref value = array({fd, fd, fd});
-    std::vector<int> fillers;
-    for (int filler; (filler = dup(STDIN_FILENO)) >= 0;)
-        fillers.push_back(filler);
-    close(fillers.back());
-    const int error = encodeError(value, {});
-    const int again = dup(STDIN_FILENO);
-    for (const int filler : fillers)
-        close(filler);
-    EXPECT_EQ(error, EMFILE);
-    EXPECT_EQ(again, fillers.back()) << "the one descriptor that was free is free again";
-}
-
 // ---- What is refused when it comes ------------------------------------------------
 
 const char* const kShort = "the body is shorter than its values declare";

@@ -11,7 +11,7 @@
 #include "support/vox_values.h"
 
 // The examples of docs/wire-protocol.md, held against our codec.
-// tests/platform/vox_client_test.py holds them against another.
+// tests/platform/vox_client_test.py holds their bytes against another.
 namespace {
 
 using namespace plr::test;

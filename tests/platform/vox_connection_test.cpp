@@ -1,8 +1,6 @@
 // What both ends of a connection can rely on while it lasts.
 #include <fcntl.h>
-#include <gtest/gtest.h>
 
-#include <algorithm>
 #include <random>
 #include <thread>
 
@@ -111,28 +109,6 @@ TEST_F(VoxConnection, ARequestIsAnsweredOnceFromAnyThread) {
     EXPECT_EQ(right.send(asked), 0);
     ASSERT_TRUE(left.inbox.wait(1));
     EXPECT_EQ(left.inbox.numbers(), Numbers{5});
-}
-
-TEST_F(VoxConnection, DescriptorsTravelWithTheirMessages) {
-    resumeBoth();
-    int ends[2];
-    ASSERT_EQ(::pipe2(ends, O_CLOEXEC), 0);
-    for (std::int64_t n = 0; n < 100; ++n) {
-        const Ref writer(vox_fd_create(ends[1]));
-        const Ref reader(vox_fd_create(ends[0]));
-        ASSERT_EQ(left.send(dictionary({{"r", reader}, {"w", writer}})), 0);
-        ASSERT_EQ(left.send(message(n)), 0);
-    }
-    ::close(ends[1]);
-    ASSERT_TRUE(right.inbox.wait(200));
-    const int received = vox_fd_dup(vox_dictionary_get_value(right.inbox[198], "w"));
-    EXPECT_EQ(::write(received, "x", 1), 1);
-    ::close(received);
-    right.inbox.clear();
-    char read[2];
-    EXPECT_EQ(::read(ends[0], read, 2), 1);
-    EXPECT_EQ(::read(ends[0], read, 2), 0) << "a duplicate of the writing end is still open";
-    ::close(ends[0]);
 }
 
 TEST_F(VoxConnection, TellsWhoThePeerIs) {

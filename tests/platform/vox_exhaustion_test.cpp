@@ -1,14 +1,10 @@
 // A service with more clients than it has descriptors for, and with very many.
-#include <gtest/gtest.h>
 
-#include <chrono>
-#include <cstdio>
 #include <deque>
 #include <fstream>
-#include <memory>
-#include <string>
 
 #include "support/pressed_service.h"
+#include "support/sanitized.h"
 #include "support/vox_raw_peer.h"
 
 namespace {
@@ -16,12 +12,6 @@ namespace {
 using namespace plr::test;
 using std::chrono::steady_clock;
 using vox_link::frame_type;
-
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kSanitized = true;
-#else
-constexpr bool kSanitized = false;
-#endif
 
 // Processor time that process `pid` has used, in seconds.
 double processorTime(pid_t pid) {
@@ -50,6 +40,7 @@ TEST_F(VoxExhaustion, OutOfDescriptorsAServiceServesAndRestsAndRecovers) {
     const ServiceProcess service({"service", "64"});
     Prober old;
     ASSERT_TRUE(old.works());
+    EXPECT_EQ(vox_connection_get_pid(old), service.pid());
     std::deque<RawPeer> clients;
     while (clients.size() < 300)
         clients.emplace_back(connectRaw());

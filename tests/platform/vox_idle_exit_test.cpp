@@ -1,23 +1,17 @@
 // Idle exit, between real processes: this program is also the service that
 // leaves, when it is called with arguments.
-#include <fcntl.h>
-#include <gtest/gtest.h>
 #include <poll.h>
 #include <sys/eventfd.h>
 #include <sys/mman.h>
-#include <sys/socket.h>
-#include <sys/un.h>
 
 #include <atomic>
-#include <cstdlib>
 #include <cstring>
-#include <memory>
 #include <random>
-#include <string>
 #include <thread>
-#include <vector>
 
+#include "support/sanitized.h"
 #include "support/service_process.h"
+#include "support/unix_socket.h"
 #include "support/vox_service.h"
 
 #ifdef __SANITIZE_THREAD__
@@ -72,11 +66,7 @@ class Service {
     void serve() {
         held_.suspend();
         const Ref listener(vox_connection_create_listener(kName, nullptr));
-        const dispatch::block<void(vox_object_t)> taker(
-            [this](vox_object_t client) { take(client); });
-        vox_connection_set_event_handler(listener, &taker);
-        vox_connection_set_target_queue(listener, &queue_);
-        vox_connection_resume(listener);
+        resumeOn(queue_, listener, [this](vox_object_t client) { take(client); });
         const dispatch::block<void()> leave([] { ::_exit(0); });
         vox_set_idle_exit(kIdleMs, &queue_, &leave);
         serviceIsReady();
@@ -86,14 +76,10 @@ class Service {
     void take(vox_object_t client) {
         if (vox_get_type(client) != VOX_TYPE_CONNECTION)
             ::_exit(1);  // the listener failed
-        const dispatch::block<void(vox_object_t)> handler(
-            [this, own = Ref::retain(client)](vox_object_t event) {
-                if (vox_get_type(event) == VOX_TYPE_DICTIONARY)
-                    handle(own, event);
-            });
-        vox_connection_set_event_handler(client, &handler);
-        vox_connection_set_target_queue(client, &queue_);
-        vox_connection_resume(client);
+        resumeOn(queue_, client, [this, own = Ref::retain(client)](vox_object_t event) {
+            if (vox_get_type(event) == VOX_TYPE_DICTIONARY)
+                handle(own, event);
+        });
     }
     void handle(vox_connection_t from, vox_object_t message) {
         ++(numberIn(message) == 0 ? handled_.messages : handled_.requests);
@@ -215,32 +201,21 @@ INSTANTIATE_TEST_SUITE_P(Each, IdleExitHolder,
 
 // ---- Between requests ------------------------------------------------------------------
 
-#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
-constexpr unsigned kExits = 60;
-#else
-constexpr unsigned kExits = 200;
-#endif
+constexpr unsigned kExits = kSanitized ? 60 : 200;
 
 // A service manager: holds the service's socket, and starts a service whenever a
 // client waits in it.
 class Manager {
   public:
-    explicit Manager(const std::string& directory) {
-        sockaddr_un address = {};
-        address.sun_family = AF_UNIX;
-        (directory + "/" + kName).copy(address.sun_path, sizeof address.sun_path - 1);
-        EXPECT_EQ(::bind(socket_, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
-        EXPECT_EQ(::listen(socket_, 100), 0);
-        thread_ = std::thread([this] { run(); });
-    }
+    explicit Manager(const std::string& directory)
+        : socket_(listeningSocket(directory + "/" + kName, SOCK_NONBLOCK)),
+          thread_([this] { run(); }) {}
     ~Manager() {
         ::eventfd_write(end_, 1);
         thread_.join();
         ::close(socket_);
         ::close(end_);
     }
-    Manager(const Manager&) = delete;
-    Manager& operator=(const Manager&) = delete;
     // Services that have come and gone.
     [[nodiscard]] unsigned exits() const { return exits_; }
 
@@ -256,7 +231,7 @@ class Manager {
         }
     }
 
-    const int socket_ = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+    const int socket_;
     const int end_ = ::eventfd(0, EFD_CLOEXEC);
     std::atomic<unsigned> exits_{0};
     std::thread thread_;

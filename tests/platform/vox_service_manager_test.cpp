@@ -1,14 +1,7 @@
 // What passes between a service and its service manager: sockets at the start,
 // and word of how it goes. This program starts as a service would.
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/resource.h>
-
-#include <array>
-#include <cstdlib>
-#include <filesystem>
-#include <string>
-#include <vector>
 
 #include "platform/linux/vox/passed_sockets.h"
 #include "support/vox_raw_peer.h"
@@ -20,25 +13,6 @@ using namespace plr::test;
 
 std::string folder;  // of the sockets
 
-sockaddr_un addressOf(const std::string& path) {
-    sockaddr_un address = {};
-    address.sun_family = AF_UNIX;
-    path.copy(address.sun_path, sizeof address.sun_path - 1);
-    return address;
-}
-int boundSocket(int type, const std::string& path, socklen_t size = sizeof(sockaddr_un)) {
-    const int fd = ::socket(AF_UNIX, type, 0);
-    sockaddr_un address = addressOf(path);
-    if (path.front() == '@')
-        address.sun_path[0] = '\0';
-    EXPECT_EQ(::bind(fd, reinterpret_cast<const sockaddr*>(&address), size), 0);
-    return fd;
-}
-int listeningSocket(const std::string& name) {
-    const int fd = boundSocket(SOCK_STREAM, folder + "/" + name);
-    EXPECT_EQ(::listen(fd, 16), 0);
-    return fd;
-}
 void set(const char* variable, const std::string& value) {
     ::setenv(variable, value.c_str(), 1);  // NOLINT(concurrency-mt-unsafe): one thread
 }
@@ -50,12 +24,12 @@ constexpr const char* kSuffixed = "net.example.suffixed";
 
 // What the service manager does before it starts a service.
 void passSockets() {
-    const int sockets[] = {listeningSocket(kPassed),
-                           listeningSocket(kSuffixed),
+    const int sockets[] = {listeningSocket(folder + "/" + kPassed),
+                           listeningSocket(folder + "/" + kSuffixed),
                            boundSocket(SOCK_DGRAM, folder + "/datagram"),
                            boundSocket(SOCK_STREAM, folder + "/deaf"),
-                           listeningSocket("first"),
-                           listeningSocket("second")};
+                           listeningSocket(folder + "/first"),
+                           listeningSocket(folder + "/second")};
     std::vector<int> parked;  // above where they go
     for (const int fd : sockets)
         parked.push_back(::fcntl(fd, F_DUPFD, 100));
@@ -154,11 +128,9 @@ std::string received(int fd) {
 
 TEST(VoxNotify, ReachesPathsAndAbstractNames) {
     const std::string place = "@net.example.notify." + std::to_string(::getpid());
-    const auto abstractSize =
-        static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + place.size());
     const std::pair<std::string, int> places[] = {
         {folder + "/notify", boundSocket(SOCK_DGRAM, folder + "/notify")},
-        {place, boundSocket(SOCK_DGRAM, place, abstractSize)}};
+        {place, boundSocket(SOCK_DGRAM, place)}};
     for (const auto& [name, fd] : places) {
         SCOPED_TRACE(name);
         set("NOTIFY_SOCKET", name);

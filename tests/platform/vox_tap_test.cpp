@@ -1,11 +1,7 @@
 // What passes a service, as its taps see it.
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
-
-#include <string>
-#include <vector>
 
 #include "support/vox_raw_peer.h"
 #include "support/vox_service.h"
@@ -39,20 +35,6 @@ std::vector<std::string> summaries(const Inbox& inbox) {
     for (const Ref& event : inbox.all())
         made.push_back(summary(event));
     return made;
-}
-
-sockaddr_un addressOf(const std::string& path) {
-    sockaddr_un address = {};
-    address.sun_family = AF_UNIX;
-    path.copy(address.sun_path, sizeof address.sun_path - 1);
-    return address;
-}
-int listenAt(const std::string& path) {
-    const sockaddr_un address = addressOf(path);
-    const int fd = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    EXPECT_EQ(::bind(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
-    EXPECT_EQ(::listen(fd, 1), 0);
-    return fd;
 }
 
 class VoxTap : public ::testing::Test {
@@ -174,7 +156,7 @@ TEST_F(VoxTap, ThatDoesNotReadStopsNobodyAndLearnsHowMuchItMissed) {
 // Against a service that is spoken by hand.
 TEST(VoxTapsEnd, BearsAnythingThatAServiceSays) {
     const RuntimeDirectory directory;
-    const int listening = listenAt(directory.path() + "/" + kName);
+    const int listening = listeningSocket(directory.path() + "/" + kName);
     Client tap(vox_connection_create_tap(kName));
     const RawPeer other(::accept(listening, nullptr, nullptr));
     ::close(listening);
@@ -194,13 +176,10 @@ TEST(VoxTapsEnd, BearsAnythingThatAServiceSays) {
 // A connection that a process of another user made.
 int connectAs(uid_t user, const std::string& path) {
     const int fd = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    const sockaddr_un address = addressOf(path);
+    const UnixAddress address(path);
     const pid_t child = ::fork();
     if (child == 0)
-        ::_exit(::setuid(user) == 0 && ::connect(fd, reinterpret_cast<const sockaddr*>(&address),
-                                                 sizeof address) == 0
-                    ? 0
-                    : 1);
+        ::_exit(::setuid(user) == 0 && ::connect(fd, address, address.size) == 0 ? 0 : 1);
     int status = 0;
     EXPECT_EQ(::waitpid(child, &status, 0), child);
     EXPECT_EQ(status, 0);

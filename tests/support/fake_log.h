@@ -1,25 +1,17 @@
 #pragma once
 
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <poll.h>
 #include <sys/mman.h>
-#include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/un.h>
-#include <unistd.h>
 
 #include <array>
-#include <chrono>
 #include <cstdlib>
-#include <cstring>
 #include <filesystem>
-#include <string>
-#include <utility>
-#include <vector>
 
 #include "kel/kel.h"
 #include "support/journal_fields.h"
+#include "support/unix_socket.h"
 #include "support/waiting.h"
 
 // Logs for Kel to send to: a test's own in place of the system's.
@@ -33,13 +25,7 @@ class FakeLog {
     FakeLog(const FakeLog&) = delete;
     FakeLog& operator=(const FakeLog&) = delete;
 
-    void start() {
-        sockaddr_un address{};
-        address.sun_family = AF_UNIX;
-        path_.copy(address.sun_path, sizeof address.sun_path - 1);
-        fd_ = ::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0);
-        EXPECT_EQ(::bind(fd_, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
-    }
+    void start() { fd_ = boundSocket(SOCK_DGRAM, path_); }
     void stop() {
         if (fd_ < 0)
             return;

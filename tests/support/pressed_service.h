@@ -5,12 +5,7 @@
 
 #include <algorithm>
 #include <atomic>
-#include <initializer_list>
 #include <map>
-#include <mutex>
-#include <string>
-#include <utility>
-#include <vector>
 
 #include "support/service_process.h"
 #include "support/vox_test.h"
@@ -44,11 +39,7 @@ class PressedService {
         vox_policy_t policy = {};
         policy.everybody = everybody ? 1 : 0;
         vox_listener_set_policy(listener_, &policy);
-        const dispatch::block<void(vox_object_t)> taker(
-            [this](vox_object_t event) { take(event); });
-        vox_connection_set_event_handler(listener_, &taker);
-        vox_connection_set_target_queue(listener_, &queue_);
-        vox_connection_resume(listener_);
+        resumeOn(queue_, listener_, [this](vox_object_t event) { take(event); });
     }
 
   private:
@@ -56,15 +47,12 @@ class PressedService {
         if (vox_get_type(client) != VOX_TYPE_CONNECTION)
             return;
         kept_[client] = {Ref::retain(client)};
-        const dispatch::block<void(vox_object_t)> handler([this, client](vox_object_t event) {
+        resumeOn(queue_, client, [this, client](vox_object_t event) {
             if (vox_get_type(event) == VOX_TYPE_ERROR)
                 kept_.erase(client);
             else
                 serve(client, event);
         });
-        vox_connection_set_event_handler(client, &handler);
-        vox_connection_set_target_queue(client, &queue_);
-        vox_connection_resume(client);
     }
     void serve(vox_object_t client, vox_object_t event) {
         const Ref reply(numberIn(event) == kHold ? nullptr : vox_dictionary_create_reply(event));

@@ -1,13 +1,7 @@
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <future>
-#include <memory>
-#include <string>
 #include <string_view>
-#include <utility>
-#include <vector>
 
 #include "support/fake_rest.h"
 #include "support/waiting.h"
@@ -32,8 +26,6 @@ class RawRestClient {
         connection_.cancel();
         EXPECT_TRUE(waitForEnd());
     }
-    RawRestClient(const RawRestClient&) = delete;
-    RawRestClient& operator=(const RawRestClient&) = delete;
 
     [[nodiscard]] const vox::connection& connection() const { return connection_; }
 

@@ -1,21 +1,12 @@
 #pragma once
 
-#include <sys/socket.h>
-#include <sys/un.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <array>
-#include <cerrno>
 #include <cstring>
-#include <initializer_list>
-#include <span>
-#include <string>
-#include <utility>
-#include <vector>
 
 #include "platform/linux/vox/frame.h"
 #include "platform/linux/vox/hello.h"
+#include "support/unix_socket.h"
 #include "support/vox_test.h"
 
 // The wire protocol by hand, for peers that misbehave.
@@ -144,17 +135,5 @@ class RawPair {
         return ends;
     }
 };
-
-// A stream socket connected to the file at `path`; -1 when that fails.
-inline int connectTo(const std::string& path) {
-    sockaddr_un address = {};
-    address.sun_family = AF_UNIX;
-    std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
-    const int fd = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    if (::connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0)
-        return fd;
-    ::close(fd);
-    return -1;
-}
 
 }  // namespace plr::test

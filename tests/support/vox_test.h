@@ -1,14 +1,9 @@
 #pragma once
 
-#include <gtest/gtest.h>
-
 #include <condition_variable>
 #include <functional>
 #include <memory>
-#include <mutex>
 #include <numeric>
-#include <string>
-#include <vector>
 
 #include "support/runtime.h"
 #include "support/vox_values.h"
@@ -33,6 +28,14 @@ inline Numbers upTo(std::int64_t count) {
     Numbers numbers(static_cast<std::size_t>(count));
     std::iota(numbers.begin(), numbers.end(), 0);
     return numbers;
+}
+
+template <class Handler>
+void resumeOn(const dispatch::queue& queue, vox_connection_t connection, Handler handler) {
+    const dispatch::block<void(vox_object_t)> block(std::move(handler));
+    vox_connection_set_event_handler(connection, &block);
+    vox_connection_set_target_queue(connection, &queue);
+    vox_connection_resume(connection);
 }
 
 // The events of one connection, in order.
@@ -100,20 +103,15 @@ class End {
         }
         drain(queue);
     }
-    End(const End&) = delete;
-    End& operator=(const End&) = delete;
     operator vox_connection_t() const { return connection_; }
 
     void resume(const Handler& first = {}) {
-        const dispatch::block<void(vox_object_t)> handler([this, first](vox_object_t event) {
+        resumeOn(queue, connection_, [this, first](vox_object_t event) {
             if (!first || !first(event))
                 inbox.add(event);
             if (vox_get_type(event) == VOX_TYPE_ERROR)
                 ended_.signal();
         });
-        vox_connection_set_event_handler(connection_, &handler);
-        vox_connection_set_target_queue(connection_, &queue);
-        vox_connection_resume(connection_);
         resumed_ = true;
     }
     // Requests are answered with their number.
