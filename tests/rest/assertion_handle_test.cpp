@@ -1,21 +1,16 @@
 #include "plr/rest/assertion_handle.h"
 
-#include <gtest/gtest.h>
-
-#include <memory>
 #include <optional>
-#include <string>
 #include <thread>
-#include <utility>
 
 #include "plr/rest/assertion_provider.h"
 #include "plr/rest/assertion_resource.h"
+#include "support/module_client.h"
 #include "support/raw_rest_client.h"
 
 namespace {
 
 using namespace plr::test;
-using plr::RestModule;
 using plr::rest::AssertionHandle;
 using plr::rest::AssertionProvider;
 using plr::rest::AssertionState;
@@ -25,24 +20,20 @@ constexpr const char* kPath = "/assertions/radio";
 
 // A server with assertions, a module whose handles write down what they are told,
 // and a client that grants, by hand.
-class Handle : public testing::Test {
+class Handle : public testing::Test, protected ModuleClient {
   protected:
     Handle() {
         rig_.add("/assertions", std::make_shared<plr::rest::AssertionRestResource>());
         rig_.start();
         granter_ = rig_.registeredClient("granter");
-        on([this] { module_.connect(rig_.connect()); });
+        on([this] { module.connect(rig_.connect()); });
     }
     ~Handle() override {
-        on([this] { module_.disconnect(); });
+        on([this] { module.disconnect(); });
     }
 
-    template <class Callable>
-    void on(Callable&& work) {
-        queue_.sync(std::forward<Callable>(work));
-    }
     AssertionHandle make(std::string label) {
-        return {module_, kPath, [this, label = std::move(label)](bool granted) {
+        return {module, kPath, [this, label = std::move(label)](bool granted) {
                     told_.push_back(label + (granted ? " granted" : " lost"));
                 }};
     }
@@ -53,7 +44,7 @@ class Handle : public testing::Test {
     // The module's messages have arrived, and what answers them has been handled.
     void settle() {
         Event answered;
-        on([&] { module_.sendRawGet("", [&](const vox::object&) { answered.signal(); }); });
+        on([&] { module.sendRawGet("", [&](const vox::object&) { answered.signal(); }); });
         EXPECT_TRUE(answered.wait());
     }
     // What the handles were told since the last call, everything so far included.
@@ -66,8 +57,6 @@ class Handle : public testing::Test {
     std::string clients(const char* list) { return granter_->textAt(std::string(kPath) + list); }
 
     RestServerRig rig_;
-    const dispatch::queue queue_ = dispatch::queue::create("module");
-    const RestModule module_{queue_, "me"};
     std::unique_ptr<RawRestClient> granter_;
     Texts told_;  // touched on the queue only
 };
@@ -93,7 +82,7 @@ TEST_F(Handle, AssertsUntilItIsDroppedAndTellsEachChange) {
     EXPECT_EQ(told(), (Texts{"a granted"}));
     // A new connection, then none.
     on([&] {
-        module_.connect(rig_.connect());
+        module.connect(rig_.connect());
         EXPECT_EQ(std::exchange(told_, {}), (Texts{"a lost"})) << "before the return";
     });
     ASSERT_TRUE(rig_.waitForDrop());
@@ -152,7 +141,7 @@ TEST_F(Handle, IsNotTakenInByAGrantThatWasMeantForTheOneBefore) {
 TEST_F(Handle, MayBeDroppedByAHandler) {
     AssertionHandle own, other;
     on([&] {
-        own = {module_, kPath, [&](bool granted) {
+        own = {module, kPath, [&](bool granted) {
                    told_.push_back(granted ? "granted" : "lost");
                    own.reset();
                    other.reset();
@@ -167,12 +156,12 @@ TEST_F(Handle, MayBeDroppedByAHandler) {
 
 TEST_F(Handle, SharesItsPathWithNoOtherObserver) {
     on([&] {
-        module_.observeProperty(kPath, [](const vox::object&) {});
+        module.observeProperty(kPath, [](const vox::object&) {});
         EXPECT_THROW(make("a"), std::invalid_argument);
-        module_.unobserveProperty(kPath);
+        module.unobserveProperty(kPath);
         const AssertionHandle handle = make("a");
-        const AssertionProvider provider(module_, kPath, {});
-        EXPECT_THROW(AssertionProvider(module_, kPath, {}), std::invalid_argument);
+        const AssertionProvider provider(module, kPath, {});
+        EXPECT_THROW(AssertionProvider(module, kPath, {}), std::invalid_argument);
     });
 }
 
@@ -180,7 +169,7 @@ TEST_F(Handle, IsGrantedByAProvider) {
     std::optional<AssertionProvider> provider;
     AssertionHandle handle;
     on([&] {
-        provider.emplace(module_, kPath, [&](const plr::rest::AssertionAcquireState& wanted) {
+        provider.emplace(module, kPath, [&](const plr::rest::AssertionAcquireState& wanted) {
             told_.push_back(asString(wanted.state) + (" " + std::to_string(wanted.generation)));
             EXPECT_EQ(provider->state(), wanted);
             if (wanted.state == AssertionState::kPending)
@@ -195,10 +184,10 @@ TEST_F(Handle, IsGrantedByAProvider) {
     on([&] { provider->revoke(); });
     EXPECT_EQ(told(), (Texts{"a lost", "kIdle 2"}));
     on([&] {
-        module_.disconnect();
+        module.disconnect();
         EXPECT_EQ(std::exchange(told_, {}), (Texts{"kIdle 0"}));
         provider->grant();
-        module_.connect(rig_.connect());
+        module.connect(rig_.connect());
     });
     EXPECT_TRUE(rig_.waitForDrop());
     EXPECT_TRUE(eventually([&] { return clients("/granted") == "[0: \"me\"]"; }));

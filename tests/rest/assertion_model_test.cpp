@@ -4,15 +4,12 @@
 #include <array>
 #include <cstdint>
 #include <map>
-#include <memory>
 #include <random>
 #include <set>
-#include <string>
 #include <tuple>
-#include <utility>
-#include <vector>
 
 #include "support/fake_rest.h"
+#include "support/sanitized.h"
 
 // Random clients and providers against a model of assertions: after every step the
 // document of what it touched, and what every connection was told by it, are equal.
@@ -22,12 +19,7 @@ using namespace plr::test;
 using namespace plr::rest;
 
 constexpr unsigned kSeed = 20240517;
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int kSteps = 50'000;
-#else
-constexpr int kSteps = 1'000'000;
-#endif
-
+constexpr int kSteps = kSanitized ? 50'000 : 1'000'000;
 constexpr int kClients = 20;
 constexpr int kNobody = -1;
 constexpr std::array kNames = {"a", "b", "c", "d", "e"};

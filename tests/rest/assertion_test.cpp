@@ -1,12 +1,8 @@
 #include "plr/rest/assertion_resource.h"
 
-#include <gtest/gtest.h>
-
 #include <map>
-#include <memory>
 #include <regex>
 #include <sstream>
-#include <string>
 
 #include "support/raw_rest_client.h"
 
@@ -15,42 +11,25 @@ namespace {
 using namespace plr::test;
 using namespace plr::rest;
 
-// Assertions of which "x" goes on where a former process left it.
-class PrimedAssertions : public AssertionRestResource {
-  public:
-    PrimedAssertions() { createIfNotPresent("x").generation = 4294967295; }
-};
-
-// What one client does, "me grants x 1" or "me asserts x", and what is heard of
-// it: "other x 1 Granted, power x/provider 1 Granted", by the client's name.
-struct Step {
-    const char* what;
-    const char* heard;
-};
-
-// A server with assertions at /a, and with other kinds elsewhere; three clients
-// that it knows, and one, "stranger", that it does not.
+// A server with assertions at /a; three clients that it knows, and one, "stranger",
+// that it does not.
 class Parties {
   public:
     Parties() {
         rig_.add("/a", assertions_);
-        rig_.add("/held", std::make_shared<AssertionRestResource>(hold_off));
-        rig_.add("/own", std::make_shared<AssertionRestResource>(provider_only));
-        rig_.add("/primed", std::make_shared<PrimedAssertions>());
         rig_.start();
         for (const char* name : {"me", "other", "power"})
             clients_[name] = rig_.registeredClient(name);
         clients_["stranger"] = rig_.client("stranger");
     }
 
-    // Where the steps are from now on.
-    void at(const char* mount) { mount_ = mount; }
     std::string get(const std::string& path) { return clients_["me"]->textAt(path); }
-    // Behind what `client` sent before.
+    // What all hear, "me x 1 Granted, power x/provider 1 Granted", behind what `client`
+    // sent before.
     std::string heard(const std::string& client = "me") {
         static_cast<void>(clients_[client]->get(""));
-        const std::regex notification("notify (.*) " + mount_ +
-                                      R"re(/(.*) \{"generation": (.*),"state": "\d:k(.*)"\})re");
+        static const std::regex notification(
+            R"re(notify (.*?) (?:/a/)?(.*) \{"generation": (.*),"state": "\d:k(.*)"\})re");
         std::string all;
         for (const auto& entry : clients_)
             for (const std::string& message : entry.second->takeMessages())
@@ -58,7 +37,8 @@ class Parties {
                        std::regex_replace(message, notification, "$1 $2 $3 $4");
         return all;
     }
-    std::string does(const std::string& what) {
+    // "me grants x 1" or "me asserts x". Returns what is heard of it.
+    std::string does(const std::string& what, const std::string& mount = "/a/") {
         static const std::map<std::string, std::pair<Operation, const char*>> verbs = {
             {"asserts", {Operation::kPush, ""}},
             {"releases", {Operation::kPop, ""}},
@@ -73,12 +53,8 @@ class Parties {
         std::int64_t generation = 0;
         std::istringstream(what) >> client >> verb >> name >> generation;
         const auto& [operation, word] = verbs.at(verb);
-        clients_.at(client)->send(operation, mount_ + '/' + name + word, vox::int64(generation));
+        clients_.at(client)->send(operation, mount + name + word, vox::int64(generation));
         return heard(client);
-    }
-    void play(const std::vector<Step>& steps) {
-        for (const Step& step : steps)
-            EXPECT_EQ(does(step.what), step.heard) << step.what;
     }
     void drop(const char* client) {
         clients_.erase(client);
@@ -92,14 +68,11 @@ class Parties {
     }
 
   private:
-    std::string mount_ = "/a";
     const std::shared_ptr<Recording<AssertionRestResource>> assertions_ =
         std::make_shared<Recording<AssertionRestResource>>();
     RestServerRig rig_;
     std::map<std::string, std::unique_ptr<RawRestClient>> clients_;
 };
-
-class Assertion : public testing::Test, protected Parties {};
 
 // ---- Every operation on every kind of path ---------------------------------------
 
@@ -194,138 +167,15 @@ TEST(AssertionPath, HasTheEffectOfItsKindAndNoOther) {
     expectEffect(Operation::kGet, "/y/provider", "null", Effect{});
 }
 
-// ---- What happens ----------------------------------------------------------------
-
-TEST_F(Assertion, IsGrantedToWhoWaitsAndEndsWithTheLast) {
-    play({
-        {"power provides x", "power x/provider 1 Idle"},
-        {"me asserts x", "power x/provider 1 Pending"},
-        {"other asserts x", ""},
-        {"power grants x 2", ""},
-        {"power grants x 0", ""},
-        {"power grants y 1", ""},
-        {"stranger grants x 1", "me x 1 Granted, other x 1 Granted, power x/provider 1 Granted"},
-        {"me asserts x", ""},
-        {"me releases x", ""},
-        {"me asserts x", "me x 1 Granted"},
-        {"me releases x", ""},
-        {"other releases x", "power x/provider 2 Idle"},
-        {"other releases x", ""},
-        {"me asserts x", "power x/provider 2 Pending"},
-        {"power grants x 1", ""},
-        {"me releases x", "power x/provider 3 Idle"},
-        {"me releases y", ""},
-    });
-    EXPECT_EQ(get("/a"), R"([0: "x"])") << "a release and an answer make none";
-    at("a");
-    play({{"me asserts x", "power x/provider 3 Pending"}});
-}
-
-TEST_F(Assertion, IsTakenAwayWithTheOldGenerationAndGrantedAgain) {
-    play({
-        {"me asserts x", ""},
-        {"other asserts x", ""},
-        {"power provides x", "power x/provider 1 Pending"},
-        {"power grants x 1", "me x 1 Granted, other x 1 Granted, power x/provider 1 Granted"},
-        {"power revokes x 2", ""},
-        {"power revokes x 1", "me x 1 Idle, other x 1 Idle, power x/provider 2 Idle"},
-        {"me asserts x", "power x/provider 2 Pending"},
-        {"power revokes x 2", "power x/provider 3 Pending"},
-    });
-    EXPECT_EQ(get("/a/x/revoked"), R"([0: "other"])");
-    play({{"other releases x", ""}});
-    EXPECT_EQ(get("/a/x/revoked"), "[]");
-}
-
-// The provider is told of who waits with the next generation only, and a new
-// generation takes nothing away.
-TEST_F(Assertion, HoldsOffWhoAssertsWhileOthersAreGranted) {
-    at("/held");
-    play({
-        {"power provides x", "power x/provider 1 Idle"},
-        {"me asserts x", "power x/provider 1 Pending"},
-        {"power grants x 1", "me x 1 Granted, power x/provider 1 Granted"},
-        {"other asserts x", ""},
-        {"power revokes x 1", "power x/provider 2 Pending"},
-        {"other releases x", "power x/provider 3 Granted"},
-        {"other asserts x", ""},
-        {"power grants x 3", "other x 3 Granted, power x/provider 3 Granted"},
-        {"other releases x", ""},
-        // Granted and waiting at once: two releases.
-        {"me asserts x", ""},
-        {"me releases x", "power x/provider 4 Pending"},
-        {"me releases x", "power x/provider 5 Idle"},
-    });
-}
-
-TEST_F(Assertion, IsAnsweredByItsProviderAloneWhereThatIsWanted) {
-    at("/own");
-    play({
-        {"me asserts x", ""},
-        {"me grants x 1", ""},
-        {"stranger grants x 1", ""},
-        {"power provides x", "power x/provider 1 Pending"},
-        {"me grants x 1", ""},
-        {"power grants x 1", "me x 1 Granted, power x/provider 1 Granted"},
-        {"me revokes x 1", ""},
-        {"power revokes x 1", "me x 1 Idle, power x/provider 2 Idle"},
-    });
-}
-
-TEST_F(Assertion, GenerationsStartAgainAtOne) {
-    at("/primed");
-    play({
-        {"me asserts x", ""},
-        {"power provides x", "power x/provider 4294967295 Pending"},
-        {"power grants x 4294967295",
-         "me x 4294967295 Granted, power x/provider 4294967295 Granted"},
-        {"power revokes x 4294967295", "me x 4294967295 Idle, power x/provider 1 Idle"},
-    });
-}
-
-TEST_F(Assertion, HasOneProviderWhoMayLeave) {
-    play({
-        {"power provides x", "power x/provider 1 Idle"},
-        {"me leaves x", ""},
-        {"stranger leaves x", ""},
-        {"me asserts x", "power x/provider 1 Pending"},
-        {"me provides x", "me x/provider 1 Pending"},
-        {"power leaves x", ""},
-        {"me releases x", "me x/provider 2 Idle"},
-        {"me leaves x", ""},
-        {"me asserts x", ""},
-        {"me leaves y", ""},
-    });
-    EXPECT_EQ(get("/a/x/provider"), "null");
-    EXPECT_EQ(get("/a/y/provider"), "null");
-}
-
-TEST_F(Assertion, WhoDropsReleases) {
-    play({
-        {"power provides x", "power x/provider 1 Idle"},
-        {"power provides y", "power y/provider 1 Idle"},
-        {"other asserts y", "power y/provider 1 Pending"},
-        {"other asserts x", "power x/provider 1 Pending"},
-        {"power grants x 1", "other x 1 Granted, power x/provider 1 Granted"},
-    });
-    drop("other");
-    EXPECT_EQ(heard(), "power x/provider 2 Idle, power y/provider 2 Idle");
-    play({{"me asserts x", "power x/provider 2 Pending"}});
-    drop("power");
-    EXPECT_EQ(get("/a/x/provider"), "null");
-    play({{"me releases x", ""}});
-}
-
-TEST_F(Assertion, AnUnknownClientHoldsAndProvidesNothingButMakesAssertions) {
-    play({{"stranger asserts x", ""}});
-    EXPECT_EQ(get("/a"), R"([0: "x"])");
-    play({
-        {"stranger releases x", ""},
-        {"power provides x", "power x/provider 1 Idle"},
-        {"stranger provides x", ""},
-        {"me asserts x", "power x/provider 1 Pending"},
-    });
-    EXPECT_EQ(get("/a/x/waiting"), R"([0: "me"])");
+// What else happens is the model's, in assertion_model_test.cpp.
+TEST(Assertion, IsOneHoweverItIsSpelledAndEndsWithWhoDrops) {
+    Parties parties;
+    EXPECT_EQ(parties.does("power provides x"), "power x/provider 1 Idle");
+    EXPECT_EQ(parties.does("me asserts x", "a/"), "power a/x/provider 1 Pending");
+    EXPECT_EQ(parties.does("stranger asserts x"), "");
+    EXPECT_EQ(parties.does("stranger grants x 1"), "me x 1 Granted, power x/provider 1 Granted");
+    parties.drop("me");
+    EXPECT_EQ(parties.heard("power"), "power x/provider 2 Idle");
 }
 
 TEST(AssertionAcquireState, IsReadAsItIsWritten) {

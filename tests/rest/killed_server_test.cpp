@@ -1,13 +1,11 @@
 // A REST service that is killed, and comes back. This program is also the
 // service, when it is called with the argument "service".
-#include <gtest/gtest.h>
 
 #include <memory>
 #include <optional>
-#include <string>
-#include <vector>
 
 #include "plr/rest.h"
+#include "support/module_client.h"
 #include "support/runtime.h"
 #include "support/service_process.h"
 #include "support/waiting.h"
@@ -51,30 +49,25 @@ class Log : public plr::rest::RestResource {
     serviceIsReady();
 }
 
-class KilledServer : public testing::Test {
+class KilledServer : public testing::Test, protected ModuleClient {
   protected:
     KilledServer() {
         on([this] {
-            module_.setServerErrorHandler([this](const vox::object&) { serverGone_.signal(); });
+            module.setServerErrorHandler([this](const vox::object&) { serverGone_.signal(); });
         });
     }
     ~KilledServer() override {
-        on([this] { module_.disconnect(); });
-    }
-
-    template <class Callable>
-    void on(Callable&& work) {
-        queue_.sync(std::forward<Callable>(work));
+        on([this] { module.disconnect(); });
     }
     void connect() {
-        on([this] { module_.connect(vox::connection::create(kName)); });
+        on([this] { module.connect(vox::connection::create(kName)); });
     }
     // What was pushed so far.
     vox::object log() {
         Event answered;
         vox::object answer;
         on([&] {
-            module_.getPropertyOnce("/log", [&](const vox::object& value) {
+            module.getPropertyOnce("/log", [&](const vox::object& value) {
                 answer = value;
                 answered.signal();
             });
@@ -84,8 +77,6 @@ class KilledServer : public testing::Test {
     }
 
     const RuntimeDirectory directory_;
-    const dispatch::queue queue_ = dispatch::queue::create("client");
-    const RestModule module_{queue_, "me"};
     Event serverGone_;
 };
 
@@ -93,10 +84,10 @@ TEST_F(KilledServer, AnswersEachRequestOnceAndGetsItsRegistrationsBack) {
     std::optional<ServiceProcess> service(std::in_place);
     const auto ignore = [](auto&&...) {};
     on([&] {
-        module_.observeProperty("/kept/b", RestModule::Handler(ignore));
-        module_.observeProperty("/kept/a", RestModule::Handler(ignore));
-        module_.registerAsRequestSink("/sinks/2", RestModule::RequestHandler(ignore));
-        module_.registerAsRequestSink("/sinks/1", RestModule::RequestHandler(ignore));
+        module.observeProperty("/kept/b", RestModule::Handler(ignore));
+        module.observeProperty("/kept/a", RestModule::Handler(ignore));
+        module.registerAsRequestSink("/sinks/2", RestModule::RequestHandler(ignore));
+        module.registerAsRequestSink("/sinks/1", RestModule::RequestHandler(ignore));
     });
     const vox::object inOrder = vox::array(
         vox::array_creator()("/connections")("/sinks/1")("/sinks/2")("/kept/a")("/kept/b"));
@@ -106,7 +97,7 @@ TEST_F(KilledServer, AnswersEachRequestOnceAndGetsItsRegistrationsBack) {
     std::vector<int> answers(100);  // touched on the client's queue only
     on([&] {
         for (int& count : answers)
-            module_.getPropertyOnce("/log/silent", [&count](const vox::object& value) {
+            module.getPropertyOnce("/log/silent", [&count](const vox::object& value) {
                 EXPECT_EQ(value, vox::object());
                 ++count;
             });
@@ -115,7 +106,7 @@ TEST_F(KilledServer, AnswersEachRequestOnceAndGetsItsRegistrationsBack) {
     service.reset();
     ASSERT_TRUE(serverGone_.wait());
     on([&] {
-        EXPECT_FALSE(module_.isConnected());
+        EXPECT_FALSE(module.isConnected());
         EXPECT_EQ(answers, std::vector<int>(100, 1));
     });
     connect();  // to nobody

@@ -1,18 +1,13 @@
 // Watchers by the thousand: gone at once, and each told of thousands of properties.
 // This program also holds those that go, when it is called with "watchers".
-#include <gtest/gtest.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
 
 #include <charconv>
-#include <csignal>
-#include <cstdlib>
-#include <memory>
-#include <string>
-#include <vector>
 
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
+#include "support/sanitized.h"
 #include "support/service_process.h"
 
 namespace {
@@ -20,12 +15,6 @@ namespace {
 using namespace plr::test;
 using plr::rest::Operation;
 using plr::rest::PropertyRestResource;
-
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kSanitized = true;
-#else
-constexpr bool kSanitized = false;
-#endif
 
 constexpr const char* kName = "net.example.rest";
 constexpr int kLeaving = 1'000;  // watchers
@@ -104,8 +93,6 @@ class Watcher {
         client_.cancel();
         EXPECT_TRUE(end_.wait());
     }
-    Watcher(const Watcher&) = delete;
-    Watcher& operator=(const Watcher&) = delete;
 
     void watchAll() const {
         send("/connections");

@@ -1,17 +1,9 @@
 #include "plr/rest/map_resource.h"
 
-#include <gtest/gtest.h>
-
-#include <array>
 #include <map>
-#include <memory>
 #include <optional>
-#include <random>
-#include <string>
-#include <utility>
-#include <vector>
 
-#include "plr/rest/rest_module.h"
+#include "support/module_client.h"
 #include "support/raw_rest_client.h"
 
 namespace {
@@ -177,28 +169,23 @@ TEST_F(Map, AnOwnersEntriesAreItsOwnAndGoWithItInOneChange) {
 }
 
 TEST_F(Map, AModuleKeepsACopy) {
-    const dispatch::queue queue = dispatch::queue::create("module");
-    plr::RestModule module(queue, "module");
-    std::map<std::string, vox::object> copy;
+    std::map<std::string, vox::object> copy = {{"stale", vox::int64(1)}};
     Event changed;
-    queue.sync([&] {
-        module.watch<MapChange>("/map", [&](const std::optional<MapChange>& change) {
+    const ModuleClient client;
+    client.on([&] {
+        client.module.watch<MapChange>("/map", [&](const std::optional<MapChange>& change) {
             ASSERT_TRUE(change);
             change->applyTo(copy);
             changed.signal();
         });
-        module.connect(rig_.connect());
+        client.module.connect(rig_.connect());
     });
     ASSERT_TRUE(changed.wait());
     set(*client_, "/map/k", nullptr);
     set(*client_, "/map/new", vox::int64(1));
     ASSERT_TRUE(changed.wait() && changed.wait());
     const std::map<std::string, vox::object> expected = {{"new", vox::int64(1)}};
-    queue.sync([&] {
-        EXPECT_EQ(copy, expected);
-        std::exchange(module, plr::RestModule()).disconnect();
-    });
-    drain(queue);
+    client.on([&] { EXPECT_EQ(copy, expected); });
 }
 
 TEST(MapChange, ReadsLeniently) {
@@ -255,123 +242,16 @@ TEST(MapLimits, HoldForEntriesAndForWatchedKeysUntilTheyGo) {
     EXPECT_TRUE(tell(map, Operation::kPush, "/map/e", client));
 }
 
-TEST(MapDrop, TellsWhoWentNothingOfItsOwnKeys) {
+TEST(MapDrop, TellsWhoWentNothing) {
     MapRestResource map(plr::rest::owned_entries, 1);
     const auto client = std::make_shared<FakeRestConnection>("client");
     EXPECT_TRUE(tell(map, Operation::kSet, "/map/a", client, vox::int64(1)));
     EXPECT_TRUE(tell(map, Operation::kPush, "/map/a", client));
+    EXPECT_TRUE(tell(map, Operation::kPush, "/map", client));
     FakeRestContext context(Operation::kNone);
     map.handleDroppedConnection(context, PathView("/map"), client);
-    EXPECT_EQ(client->sent.size(), 1U) << "by the PUSH";
+    EXPECT_EQ(client->sent.size(), 2U) << "by each PUSH";
     EXPECT_TRUE(tell(map, Operation::kPush, "/map/b", client)) << "it watches nothing now";
-}
-
-// A map of its own kind beside the resource; clients who keep copies by what they are
-// told. Every step, all of them agree.
-class MapModel {
-  public:
-    explicit MapModel(bool areOwned)
-        : areOwned_(areOwned),
-          map_(areOwned ? MapRestResource(plr::rest::owned_entries) : MapRestResource()) {}
-
-    void step(std::mt19937& random) {
-        Watcher& watcher = watchers_.at(random() % watchers_.size());
-        const std::string key(1, static_cast<char>('a' + random() % 8));
-        switch (random() % 16) {
-            case 0:
-                drop(watcher);
-                break;
-            case 1:
-                tell(map_, Operation::kPush, "/map", watcher.client);
-                watcher.isWatching = watcher.isToBeTold = true;
-                break;
-            case 2:
-                tell(map_, Operation::kPop, "/map", watcher.client);
-                watcher.isWatching = false;
-                break;
-            case 3:
-                cleanup();
-                break;
-            default:
-                const bool isRemoval = random() % 3 == 0;
-                set(watcher, key, isRemoval ? vox::object() : vox::uint64(random() % 100));
-        }
-        compare();
-    }
-
-  private:
-    struct Watcher {
-        Client client = std::make_shared<FakeRestConnection>("watcher");
-        bool isWatching = false;
-        bool isToBeTold = false;  // of this step
-        std::map<std::string, vox::object> copy = {};
-    };
-
-    void set(const Watcher& watcher, const std::string& key, const vox::object& value) {
-        const auto owner = owners_.find(key);
-        const bool isAllowed =
-            !areOwned_ || owner == owners_.end() || owner->second == watcher.client;
-        EXPECT_EQ(tell(map_, Operation::kSet, "/map/" + key, watcher.client, value), isAllowed);
-        if (!isAllowed || (!value && !model_.count(key)))
-            return;
-        if (value) {
-            model_[key] = value;
-            owners_[key] = watcher.client;
-        } else {
-            model_.erase(key);
-            owners_.erase(key);
-        }
-        everybodyIsToBeTold();
-    }
-    void drop(Watcher& watcher) {
-        FakeRestContext context(Operation::kNone);
-        map_.handleDroppedConnection(context, PathView("/map"), watcher.client);
-        const std::size_t gone = !areOwned_ ? 0 : std::erase_if(model_, [&](const auto& entry) {
-            return owners_.at(entry.first) == watcher.client;
-        });
-        std::erase_if(owners_, [&](const auto& entry) { return entry.second == watcher.client; });
-        EXPECT_TRUE(watcher.client->sent.empty()) << "who went is told nothing";
-        watcher = Watcher();
-        if (gone > 0)
-            everybodyIsToBeTold();
-    }
-    void cleanup() {
-        FakeRestContext context(Operation::kNone);
-        map_.cleanupWatchers(context, PathView("/map"));
-    }
-    void everybodyIsToBeTold() {
-        for (Watcher& watcher : watchers_)
-            watcher.isToBeTold = watcher.isWatching;
-    }
-    void compare() {
-        for (Watcher& watcher : watchers_) {
-            ASSERT_EQ(watcher.client->sent.size(),
-                      std::exchange(watcher.isToBeTold, false) ? 1 : 0);
-            for (const vox::dict& message : std::exchange(watcher.client->sent, {})) {
-                MapChange change;
-                read_rest_value(change, message["v"]);
-                change.applyTo(watcher.copy);
-            }
-            if (watcher.isWatching) {
-                ASSERT_EQ(watcher.copy, model_);
-            }
-        }
-    }
-
-    const bool areOwned_;
-    MapRestResource map_;
-    std::map<std::string, vox::object> model_;
-    std::map<std::string, Client> owners_;  // who made the entry
-    std::array<Watcher, 6> watchers_;
-};
-
-TEST(MapModel, CopiesByWhatWatchersAreToldEqualTheMapAtEveryStep) {
-    for (const bool areOwned : {false, true}) {
-        std::mt19937 random(7);
-        MapModel model(areOwned);
-        for (int i = 0; i < 5000 && !testing::Test::HasFailure(); i++)
-            model.step(random);
-    }
 }
 
 }  // namespace

@@ -1,12 +1,7 @@
-#include <gtest/gtest.h>
-
 #include <limits>
-#include <memory>
 #include <optional>
-#include <string>
-#include <utility>
-#include <vector>
 
+#include "support/module_client.h"
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
 
@@ -40,17 +35,14 @@ TEST(ReconnectPolicy, PausesDoubleUpToTheMaximumLessTheirShare) {
     EXPECT_EQ(plr::rest::pauseAfter(3, {1ms, 24h, 0}, 1), 4ms);
 }
 
-// A module on a queue of its own, which writes down what happens to it.
-class Client {
+// A module that writes down what happens to it.
+class Client : public ModuleClient {
   public:
     ~Client() {
-        queue.sync([this] { module.disconnect(); });
-    }
-    template <class Callable>
-    auto on(Callable&& work) {
-        return queue.is_current() ? work() : queue.sync(std::forward<Callable>(work));
+        on([this] { module.disconnect(); });
     }
     void note(std::string text) {
+        EXPECT_TRUE(queue.is_current());
         notes_.push_back(std::move(text));
         noted_.signal();
     }
@@ -66,9 +58,6 @@ class Client {
             note(label + " " + oneLine(value));
         };
     }
-
-    const dispatch::queue queue = dispatch::queue::create("client");
-    const RestModule module{queue, "me"};
 
   private:
     Event noted_;
@@ -224,7 +213,7 @@ TEST(AutomaticReconnection, TakesNoValueFromAConnectionThatWasReplaced) {
 
 // ---- Requests ---------------------------------------------------------------------------
 
-// Answers with what it is sent, refuses, or keeps the request.
+// Answers with what it is sent or with nothing, refuses, or keeps the request.
 class Answers : public plr::rest::RestResource {
   public:
     bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override {
@@ -232,6 +221,10 @@ class Answers : public plr::rest::RestResource {
             return context.sendReplyWithValue(context.getRestValue());
         if (path.current() == "refusal")
             return context.sendReplyWithValue(vox::error(VOX_ERROR_APPLICATION, "not now"));
+        if (path.current() == "nothing") {
+            context.takeAutoReplyValue().reset();
+            return true;
+        }
         unanswered_.push_back(context.takeAutoReplyValue());
         return true;
     }
@@ -268,6 +261,10 @@ TEST(ModuleRequest, GivesAValueOrTellsWhyThereIsNone) {
     client.on([&] { client.module.connect(rig.connect()); });
     ask("/a/echo", kBound);
     EXPECT_EQ(client.next(1), (Texts{"5"}));
+    for (const char* path : {"/a/echo", "/a/nothing"}) {
+        client.on([&] { client.module.sendRequest(path, vox::int64(5), client.noting("value")); });
+    }
+    EXPECT_EQ(client.next(2), (Texts{"value 5", "value null"}));
     ask("/a/refusal", kBound);
     EXPECT_EQ(client.next(1), (Texts{"1000 not now"}));
     ask("/a/silence", 1ms);

@@ -4,13 +4,11 @@
 
 #include <array>
 #include <cstdint>
-#include <memory>
 #include <random>
-#include <string>
-#include <vector>
 
 #include "plr/rest/property_resource.h"
 #include "support/fake_rest.h"
+#include "support/sanitized.h"
 #include "tests/rest/property_model.h"
 
 namespace {
@@ -19,11 +17,7 @@ using namespace plr::test;
 using namespace plr::test::property_model;
 using plr::rest::PathView;
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int kSteps = 10'000;
-#else
-constexpr int kSteps = 100'000;
-#endif
+constexpr int kSteps = kSanitized ? 10'000 : 100'000;
 constexpr std::uint32_t kSeed = 20'261'121;
 
 // Writes what it is sent into a log that all share.

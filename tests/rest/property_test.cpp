@@ -1,12 +1,6 @@
 #include "plr/rest/property_resource.h"
 
-#include <gtest/gtest.h>
-
 #include <algorithm>
-#include <memory>
-#include <string>
-#include <utility>
-#include <vector>
 
 #include "support/raw_rest_client.h"
 
@@ -46,13 +40,6 @@ class Property : public testing::Test {
     void push(const std::string& path) { client_->send(Operation::kPush, path); }
     void pop(const std::string& path) { client_->send(Operation::kPop, path); }
     Texts news() { return client_->takeMessages(); }
-    // What `client_` hears of what another one does.
-    Texts newsOf(const std::unique_ptr<RawRestClient>& other, Operation operation,
-                 const char* path) {
-        other->send(operation, path, vox::int64(1));
-        static_cast<void>(other->takeMessages());
-        return news();
-    }
 
     const std::shared_ptr<Recording<PropertyRestResource>> kept_ =
         std::make_shared<Recording<PropertyRestResource>>(true);
@@ -200,69 +187,6 @@ TEST_F(Property, GivesPartsOfItsValue) {
         EXPECT_EQ(get(row.path), row.expected) << row.path;
 }
 
-TEST_F(Property, EverySetNotifiesChangedOrNotUnderItsPathWithTheWatchersName) {
-    push("kept/x");
-    EXPECT_EQ(news(), (Texts{R"(notify me kept/x {"k": [0: 5]})"}));
-    set("/kept/x", vox::int64(1));
-    set("/kept/x", vox::int64(1));
-    set("/kept/x@part", vox::int64(2));
-    EXPECT_EQ(news(), (Texts{"notify me /kept/x 1", "notify me /kept/x 1"}));
-    const auto setter = rig_.registeredClient("setter");
-    EXPECT_EQ(newsOf(setter, Operation::kSet, "/kept/x/below"), (Texts{"notify me /kept/x 1"}));
-    pop("/kept/x");
-    EXPECT_EQ(news(), Texts());
-    EXPECT_EQ(newsOf(setter, Operation::kSet, "/kept/x"), Texts());
-    // Where values are not kept, only sets are told.
-    push("/events/x");
-    set("/events/x", vox::int64(2));
-    EXPECT_EQ(news(), (Texts{"notify me /events/x 2"}));
-}
-
-TEST_F(Property, AnUnknownClientWatchesNothingButMakesProperties) {
-    push("/kept");
-    news();
-    const auto stranger = rig_.client("stranger");
-    for (const char* path : {"/kept/new", "/kept", "/kept/_/watched"})
-        for (const Operation operation : {Operation::kPush, Operation::kPop})
-            stranger->send(operation, path);
-    EXPECT_EQ(stranger->takeMessages(), Texts());
-    EXPECT_EQ(news(), (Texts{R"(notify me /kept [0: "new",1: "x"])"}));
-    EXPECT_EQ(get("/kept/new/_/watchers"), "[]");
-}
-
-TEST(PropertyRestResource, WatchersThatWentAwayExpireAndStillCountUntilTheyAreCleanedUp) {
-    PropertyRestResource properties(true);
-    const auto me = std::make_shared<FakeRestConnection>("me");
-    auto other = std::make_shared<FakeRestConnection>("other");
-    const auto send = [&](Operation operation, const char* path,
-                          std::shared_ptr<FakeRestConnection> author) {
-        FakeRestContext context(operation, {}, std::move(author));
-        plr::rest::PathView behind(path);
-        behind.advance(1);
-        EXPECT_TRUE(properties.handleMessage(context, behind)) << path;
-        return context.replies().empty() ? "" : oneLine(context.replies()[0]);
-    };
-    const auto toldOfWatched = [&] {
-        Texts told;
-        for (const vox::dict& message : std::exchange(me->sent, {}))
-            if (message.text("r") == "/kept/_/watched")
-                told.push_back(oneLine(message["v"]));
-        return told;
-    };
-    send(Operation::kPush, "/kept/_/watched", me);
-    send(Operation::kPush, "/kept/x", other);
-    EXPECT_EQ(toldOfWatched(), (Texts{"[]", R"([0: "x"])"}));
-    other.reset();
-    EXPECT_EQ(send(Operation::kGet, "/kept/x/_/watchers", me), "[]");
-    EXPECT_EQ(send(Operation::kGet, "/kept/_/watched", me), "[]");
-    // The expired entry still counts as a watcher: nobody is told of the new one.
-    send(Operation::kPush, "/kept/x", me);
-    EXPECT_EQ(toldOfWatched(), Texts());
-    // That PUSH has cleaned up, so that now the last one leaves.
-    send(Operation::kPop, "/kept/x", me);
-    EXPECT_EQ(toldOfWatched(), (Texts{"[]"}));
-}
-
 // However it goes. Nothing is left of it then: the next watcher is the first.
 TEST_F(Property, WhenAClientWentWhoWatchesWhatIsWatchedIsToldOnce) {
     rig_.add("/tree", std::make_shared<plr::rest::TreeRestResource>());
@@ -285,25 +209,16 @@ TEST_F(Property, WhenAClientWentWhoWatchesWhatIsWatchedIsToldOnce) {
     }
 }
 
-TEST(Watchable, KnowsItsWatchersOnce) {
+TEST(Watchable, HasItsWatchersOnceUntilTheyAreRemoved) {
     plr::rest::WatchableRestResourceHelper watchers;
-    std::shared_ptr<plr::rest::RestResourceConnection> first =
-        std::make_shared<FakeRestConnection>("1");
-    const std::shared_ptr<plr::rest::RestResourceConnection> second =
-        std::make_shared<FakeRestConnection>("2");
-    EXPECT_TRUE(watchers.addWatcher(first));
-    EXPECT_FALSE(watchers.addWatcher(first));
-    EXPECT_TRUE(watchers.addWatcher(second));
-    first.reset();
-    EXPECT_EQ(oneLine(watchers.getWatcherNames()), R"([0: "2"])");
+    std::shared_ptr<plr::rest::RestResourceConnection> watcher =
+        std::make_shared<FakeRestConnection>("me");
+    EXPECT_TRUE(watchers.addWatcher(watcher));
+    EXPECT_FALSE(watchers.addWatcher(watcher));
     EXPECT_FALSE(watchers.removeWatcher(nullptr));
-    EXPECT_TRUE(watchers.removeWatcher(second));
-    EXPECT_FALSE(watchers.removeWatcher(second));
+    watcher.reset();
     EXPECT_TRUE(watchers.hasWatchers());
     EXPECT_FALSE(watchers.hasActiveWatchers());
-    watchers.cleanupExpired();
-    EXPECT_FALSE(watchers.hasWatchers());
-    watchers.addWatcher(second);
     watchers.removeWatchers();
     EXPECT_FALSE(watchers.hasWatchers());
 }

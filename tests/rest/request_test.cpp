@@ -1,19 +1,11 @@
 #include "plr/rest/request_resource.h"
 
-#include <gtest/gtest.h>
-
-#include <memory>
-#include <string>
-#include <utility>
-#include <vector>
-
-#include "plr/rest/rest_module.h"
+#include "support/module_client.h"
 #include "support/raw_rest_client.h"
 
 namespace {
 
 using namespace plr::test;
-using plr::RestModule;
 using plr::rest::Operation;
 using plr::rest::RequestRestResource;
 using Reply = std::shared_ptr<vox::object>;
@@ -24,29 +16,18 @@ std::string errorOf(const vox::object& reply) {
 }
 
 // A module that provides /requests/call, as services do; touched on its queue.
-class Sink {
+class Sink : public ModuleClient {
   public:
-    Sink(vox::connection server, RestModule::RequestHandler handler) {
-        queue_.sync([&] {
-            module_.registerAsRequestSink("/requests/call", std::move(handler));
-            module_.connect(std::move(server));
-            module_.getPropertyOnce("", [this](auto&&) { registered_.signal(); });
+    Sink(const vox::connection& server, const plr::RestModule::RequestHandler& handler)
+        : ModuleClient("sink") {
+        Event registered;
+        on([&] {
+            module.registerAsRequestSink("/requests/call", handler);
+            module.connect(server);
+            module.getPropertyOnce("", [&](auto&&) { registered.signal(); });
         });
-        EXPECT_TRUE(registered_.wait());
+        EXPECT_TRUE(registered.wait());
     }
-    ~Sink() {
-        queue_.sync([this] { std::exchange(module_, RestModule()).disconnect(); });
-        drain(queue_);
-    }
-    Sink(const Sink&) = delete;
-    Sink& operator=(const Sink&) = delete;
-
-    const dispatch::queue& queue() const { return queue_; }
-
-  private:
-    const dispatch::queue queue_ = dispatch::queue::create("sink");
-    RestModule module_{queue_, "sink"};
-    Event registered_;
 };
 
 // Servers' /requests refuse without a provider, their /queued keep two a name and
@@ -98,7 +79,7 @@ class Requests : public testing::Test {
 TEST_F(Requests, AreAnsweredByTheirProviderNowOrLaterWithAValueOrAnError) {
     std::vector<Reply> kept;  // touched on the sink's queue
     Event came;
-    Sink sink(rig_.connect(), [&](const vox::object& value, const Reply& reply) {
+    const Sink sink(rig_.connect(), [&](const vox::object& value, const Reply& reply) {
         if (!value)
             return;
         if (value == vox::string("later"))
@@ -119,7 +100,7 @@ TEST_F(Requests, AreAnsweredByTheirProviderNowOrLaterWithAValueOrAnError) {
     asker_->ask(asker_->message(Operation::kGet, "/requests/call", vox::string("later")));
     EXPECT_TRUE(came.wait());
     EXPECT_EQ(asker_->textAt("/requests/call/waiting"), "1");
-    sink.queue().sync([&] {
+    sink.on([&] {
         *kept.at(0) = vox::int64(7);
         kept.clear();
     });

@@ -1,7 +1,6 @@
 // A service that is restarted again and again under load, and clients that connect
 // to it by themselves. This program is also the service, when it is called with the
 // argument "service".
-#include <gtest/gtest.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
 
@@ -9,16 +8,13 @@
 #include <array>
 #include <atomic>
 #include <condition_variable>
-#include <csignal>
-#include <memory>
-#include <mutex>
 #include <optional>
-#include <string>
-#include <vector>
 
 #include "plr/rest.h"
 #include "support/fake_rest.h"
+#include "support/module_client.h"
 #include "support/runtime.h"
+#include "support/sanitized.h"
 #include "support/service_process.h"
 #include "support/waiting.h"
 
@@ -26,7 +22,6 @@ namespace {
 
 using namespace plr::test;
 using namespace std::chrono_literals;
-using plr::RestModule;
 using plr::rest::AssertionHandle;
 using plr::rest::AssertionProvider;
 using plr::rest::AssertionState;
@@ -37,11 +32,7 @@ constexpr const char* kAssertion = "/assertions/busy";
 constexpr plr::ReconnectPolicy kQuick{1ms, 4ms};
 constexpr std::size_t kProperties = 5;
 constexpr std::size_t kClients = 6;
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int kRestarts = 15;
-#else
-constexpr int kRestarts = 50;
-#endif
+constexpr int kRestarts = kSanitized ? 15 : 50;
 
 // ---- The service ------------------------------------------------------------------------
 
@@ -130,24 +121,10 @@ struct Board {
     }
 };
 
-// A module that connects by itself.
-class Client {
-  public:
-    explicit Client(const char* name) : module(queue, name) {}
-    ~Client() {
-        queue.sync([this] { module.disconnect(); });
-    }
-    Client(const Client&) = delete;
-    Client& operator=(const Client&) = delete;
-
-    const dispatch::queue queue = dispatch::queue::create("client");
-    const RestModule module;
-};
-
 // Watches every property and holds the assertion.
-class Watcher : Client {
+class Watcher : ModuleClient {
   public:
-    Watcher(Board& board, std::size_t index) : Client("watcher") {
+    Watcher(Board& board, std::size_t index) : ModuleClient("watcher") {
         Board::Told& told = board.clients.at(index);
         queue.sync([&, this] {
             for (std::size_t i = 0; i < kProperties; ++i)
@@ -174,9 +151,9 @@ class Watcher : Client {
 
 // Sets all properties to 1, 2, 3, … for ever, each when the one before has been
 // heard.
-class Setter : Client {
+class Setter : ModuleClient {
   public:
-    explicit Setter(Board& board) : Client("setter"), board_(board) {
+    explicit Setter(Board& board) : ModuleClient("setter"), board_(board) {
         queue.sync([this] {
             module.setConnectionHandler([this](bool isReached) {
                 if (isReached)
@@ -213,9 +190,9 @@ class Setter : Client {
 };
 
 // Grants the assertion whenever it is wanted.
-class Granter : Client {
+class Granter : ModuleClient {
   public:
-    Granter() : Client("granter") {
+    Granter() : ModuleClient("granter") {
         queue.sync([this] {
             provider_.emplace(module, kAssertion,
                               [this](const plr::rest::AssertionAcquireState& wanted) {
@@ -228,8 +205,6 @@ class Granter : Client {
     ~Granter() {
         queue.sync([this] { provider_.reset(); });
     }
-    Granter(const Granter&) = delete;
-    Granter& operator=(const Granter&) = delete;
 
   private:
     std::optional<AssertionProvider> provider_;

@@ -1,14 +1,11 @@
 #include "plr/rest/rest_server_example.h"
 
-#include <gtest/gtest.h>
-#include <unistd.h>
+#include <gmock/gmock.h>
 
 #include <functional>
-#include <memory>
 #include <stdexcept>
-#include <string>
-#include <vector>
 
+#include "support/module_client.h"
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
 
@@ -62,12 +59,9 @@ class RestServer : public testing::Test {
 };
 
 TEST_F(RestServer, RefusesToConnectToNothing) {
-    try {
-        rig.server().connect(vox::connection());
-        FAIL();
-    } catch (const std::invalid_argument& error) {
-        EXPECT_STREQ(error.what(), "RestServer::connect cannot be called with a null connection");
-    }
+    EXPECT_THAT([this] { rig.server().connect(vox::connection()); },
+                testing::ThrowsMessage<std::invalid_argument>(
+                    "RestServer::connect cannot be called with a null connection"));
 }
 
 TEST_F(RestServer, RegistersResourcesBelowTheirNodes) {
@@ -249,21 +243,20 @@ TEST_F(RestServer, ForwardsAGetAndItsAnswer) {
                                 return true;
                             }));
     start();
-    const auto moduleQueue = dispatch::queue::create("provider");
-    const plr::RestModule module(moduleQueue, "provider");
+    const ModuleClient other("provider");
     Event ready;
-    moduleQueue.sync([&] {
-        module.connect(rig.connect());
-        module.registerAsRequestSink(
+    other.on([&] {
+        other.module.connect(rig.connect());
+        other.module.registerAsRequestSink(
             "/forwarded", [](const vox::object& value, const std::shared_ptr<vox::object>& reply) {
                 *reply = vox::string("answer to %s", value.to_string().c_str());
             });
-        module.sendRawPush("/forward", nullptr);
-        module.getPropertyOnce("", [&ready](const vox::object&) { ready.signal(); });
+        other.module.sendRawPush("/forward", nullptr);
+        other.module.getPropertyOnce("", [&ready](const vox::object&) { ready.signal(); });
     });
     ASSERT_TRUE(ready.wait());
     EXPECT_EQ(oneLine(client->get("/forward", vox::int64(1))), R"("answer to 1")");
-    moduleQueue.sync([&] { module.disconnect(); });
+    other.on([&] { other.module.disconnect(); });
     ASSERT_TRUE(rig.waitForDrop());
     EXPECT_EQ(oneLine(client->get("/forward", vox::int64(2))), "null") << "nobody can answer";
 }

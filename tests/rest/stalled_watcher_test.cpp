@@ -1,16 +1,12 @@
-#include <gtest/gtest.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <atomic>
 #include <cstdint>
 #include <cstdlib>
 #include <fstream>
-#include <memory>
-#include <string>
-#include <vector>
 
+#include "support/module_client.h"
 #include "support/raw_rest_client.h"
+#include "support/sanitized.h"
 
 // One watcher stops reading while others go on: the service's memory stays
 // bounded, the others miss nothing, and the slow one gets what the listener's
@@ -19,12 +15,6 @@ namespace {
 
 using namespace plr::test;
 using plr::rest::Operation;
-
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kSanitized = true;
-#else
-constexpr bool kSanitized = false;
-#endif
 
 constexpr std::size_t kValueBytes = 1024;
 constexpr std::uint32_t kQueuedBytes = 4U << 20;
@@ -50,12 +40,12 @@ vox::object numbered(int number) {
 }
 
 // Sees that the numbers arrive in order, none missing.
-class GoodWatcher {
+class GoodWatcher : ModuleClient {
   public:
-    GoodWatcher(const RestServerRig& rig, const char* name) : module_(queue_, name) {
-        queue_.sync([&] {
-            module_.connect(rig.connect());
-            module_.observeProperty("/kept/x", [this](const vox::object& value) {
+    GoodWatcher(const RestServerRig& rig, const char* name) : ModuleClient(name) {
+        on([&] {
+            module.connect(rig.connect());
+            module.observeProperty("/kept/x", [this](const vox::object& value) {
                 if (!value)
                     return ready.signal();
                 wrong += std::atoi(std::string(value.text()).c_str()) != seen;
@@ -66,17 +56,13 @@ class GoodWatcher {
         EXPECT_TRUE(ready.wait());
     }
     ~GoodWatcher() {
-        queue_.sync([this] { module_.disconnect(); });
+        on([this] { module.disconnect(); });
     }
 
     Event ready;
     Event reached;  // once each kWindow values, and at the last
     std::atomic<int> wrong{0};
     std::atomic<int> seen{0};
-
-  private:
-    const dispatch::queue queue_ = dispatch::queue::create("good.watcher");
-    const plr::RestModule module_;
 };
 
 // Remembers the server's end of whoever pushes.
