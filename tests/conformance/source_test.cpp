@@ -1,10 +1,7 @@
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <poll.h>
 #include <sys/socket.h>
-#include <unistd.h>
 
-#include <array>
 #include <atomic>
 #include <cstdlib>
 #include <memory>
@@ -31,37 +28,6 @@ struct Pair {
     int ends[2];
 };
 
-TEST(TimerSource, PeriodsAddUpWithoutDrift) {
-    const auto serial = queue::create("serial");
-    const auto timer = source::timer(serial);
-    constexpr auto kPeriod = 1ms;
-    const auto start = dispatch::time::after(kPeriod);
-    // Periods that began until `now`.
-    const auto begun = [start] {
-        const auto passed = dispatch::time::now().nanoseconds() - start.nanoseconds();
-        return static_cast<std::uint64_t>(passed / 1'000'000) + 1;
-    };
-    std::uint64_t firings = 0;
-    std::array<std::uint64_t, 3> earlier{};  // what had begun at the last calls, oldest first
-    Event enough;
-    timer.set_event_handler(block<void()>([&] {
-        firings += timer.data();
-        // Never ahead of the clock; and what had begun three calls ago was counted
-        // since, which deadlines that move with each delay miss sooner or later.
-        EXPECT_LE(firings, begun());
-        EXPECT_GE(firings, earlier[0]);
-        earlier = {earlier[1], earlier[2], begun()};
-        if (firings >= 300) {
-            timer.cancel();
-            enough.signal();
-        }
-    }));
-    timer.set_timer(start, kPeriod);
-    timer.resume();
-    EXPECT_TRUE(enough.wait());
-    drain(serial);
-}
-
 TEST(TimerSource, RepeatsOnEveryClockUntilCancelled) {
     const auto serial = queue::create("serial");
     for (const auto on :
@@ -83,51 +49,6 @@ TEST(TimerSource, RepeatsOnEveryClockUntilCancelled) {
         EXPECT_TRUE(cancelled.wait());
         EXPECT_EQ(calls, 3);
     }
-}
-
-// Returns whether all timers were armed before the first was due; only then
-// does their order say something.
-bool manyFireInOrder(std::chrono::milliseconds lead) {
-    constexpr int kTimers = 2'000;
-    const auto serial = queue::create("serial");
-    int fired = 0;
-    std::int64_t last = 0;
-    bool ordered = true;
-    const dispatch::group all;
-    const auto start = dispatch::time::after(lead);
-    std::vector<source> timers;
-    for (int i = 0; i < kTimers; ++i) {
-        timers.push_back(source::timer(serial));
-        const auto due = start.plus(std::chrono::microseconds((i * 7919) % kTimers));
-        const bool withdrawn = i % 2 == 1;
-        if (!withdrawn)
-            all.enter();
-        timers.back().set_event_handler(block<void()>([&, due, withdrawn] {
-            ordered = ordered && !withdrawn && due.nanoseconds() >= last;
-            // Armed too late, it may have been on its way when it was withdrawn.
-            if (withdrawn)
-                return;
-            last = due.nanoseconds();
-            ++fired;
-            all.leave();
-        }));
-        timers.back().set_timer(due, dispatch::kOnce);
-        timers.back().resume();
-        if (withdrawn)
-            timers.back().cancel();
-    }
-    const bool in_time = dispatch::time::now().nanoseconds() < start.nanoseconds();
-    EXPECT_EQ(all.wait(dispatch::time::after(plr::test::kBound)), 0);
-    drain(serial);
-    EXPECT_EQ(fired, kTimers / 2);
-    EXPECT_TRUE(ordered || !in_time);
-    return in_time;
-}
-
-TEST(TimerSource, ManyFireInTheOrderOfTheirDeadlinesAndWithdrawnOnesNever) {
-    auto lead = 10ms;
-    while (!manyFireInOrder(lead))
-        lead *= 2;
 }
 
 TEST(TimerSource, CanBeSetAnewAndSuspended) {

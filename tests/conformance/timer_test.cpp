@@ -1,7 +1,5 @@
-#include <gtest/gtest.h>
-
-#include <atomic>
 #include <thread>
+#include <vector>
 
 #include "dispatch/dispatch.h"
 #include "support/manual_calendar.h"
@@ -68,11 +66,36 @@ TEST(WallClock, APeriodicTimerCountsThePeriodsOfAStep) {
     EXPECT_EQ(timer.count(), 0u);
     calendar.step(1h);
     EXPECT_EQ(timer.count(), 3600u);
-    // Its next deadline is a time of day: back by two hours, nothing for as long.
+    // Back by two hours, nothing for as long; and periods add up without drift, however
+    // late a call was.
     calendar.step(-2h);
     EXPECT_EQ(timer.count(), 3600u);
-    calendar.step(2h + 1s);
+    calendar.step(2h + 1ms);
     EXPECT_EQ(timer.count(), 3601u);
+}
+
+TEST(WallClock, ManyFireInTheOrderOfTheirDeadlinesAndWithdrawnOnesNever) {
+    constexpr int kTimers = 2'000;
+    ManualCalendar calendar;
+    const auto serial = queue::create("serial");
+    std::vector<int> fired;  // touched on the queue only
+    std::vector<int> expected;
+    std::vector<source> timers;
+    for (int i = 0; i < kTimers; ++i) {
+        const int due = i * 7919 % kTimers;
+        const source& timer = timers.emplace_back(source::timer(serial));
+        timer.set_event_handler(block<void()>([&fired, due] { fired.push_back(due); }));
+        timer.set_timer(dispatch::time::after(1s + due * 1us, dispatch::clock::wall),
+                        dispatch::kOnce);
+        timer.resume();
+        if (due % 2 == 1)
+            timer.cancel();
+        if (i % 2 == 0)
+            expected.push_back(i);
+    }
+    calendar.step(2s);
+    drain(serial);
+    EXPECT_EQ(fired, expected);
 }
 
 TEST(WallClock, TimersGoBackToTheKernelsClock) {
