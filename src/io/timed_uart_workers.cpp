@@ -17,7 +17,7 @@ namespace {
 
 constexpr std::uint32_t kChunk = 4096;
 // For our own frames, and a debug delegate that runs on them.
-constexpr std::size_t kStackBytes = 256 * 1024;
+constexpr std::size_t kStackBytes = std::size_t{256} * 1024;
 
 // With signals blocked: they are for the program's own threads. What a thread
 // brings on itself by a fault stays open. Returns 0 or an error number.

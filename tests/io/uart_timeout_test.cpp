@@ -104,7 +104,7 @@ TEST(TimedUart, ReadsReachTheirTargetOrTellSo) {
 }
 
 TEST(TimedUart, FullQueueHoldsTheLine) {
-    const SerialLine line;
+    SerialLine line;
     OpenTransport transport;
     create(transport, line, 16);
     std::string sent;
@@ -132,6 +132,13 @@ TEST(TimedUart, FullQueueHoldsTheLine) {
     EXPECT_EQ(transport.get(8, true), (Got{true, sent.substr(13, 8)}));
     ASSERT_TRUE(awaitUnread(1));  // three of eight bytes were kept, then five more came
     EXPECT_EQ(transport.get(17, true), (Got{true, sent.substr(21, 11) + sent.substr(37, 6)}));
+
+    line.send(sent.substr(0, 20));
+    ASSERT_TRUE(awaitUnread(4));
+    line.unplug();
+    EXPECT_TRUE(eventually([&] { return !transport.isValid(&transport); }));
+    EXPECT_EQ(transport.get(16, true), (Got{true, sent.substr(0, 16)}));
+    EXPECT_EQ(transport.get(1), (Got{false, ""}));
 }
 
 TEST(TimedUart, UnblockEndsAllReadsThatWait) {
