@@ -432,6 +432,17 @@ pelorin_component(timers LEVEL 5 LIBRARY pelorin
     src/concurrency/dispatch_timer_service.cpp
     src/concurrency/timer_service.cpp)
 
+pelorin_component(text LEVEL 5 LIBRARY pelorin
+  HEADERS
+    include/plr/text/octet_source_buffer.h
+    include/plr/text/text_converter.h
+    include/plr/text/text_transform.h
+  SOURCES
+    src/text/octet_source_buffer.cpp
+    src/text/octets.h
+    src/text/stage.h
+    src/text/text_transform.cpp)
+
 pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
   HEADERS
     include/plr/rest/access_guard.h
@@ -507,4 +518,5 @@ pelorin_component(umbrella LEVEL 9 LIBRARY pelorin
     include/plr/ipc.h
     include/plr/log.h
     include/plr/plr.h
-    include/plr/rest.h)
+    include/plr/rest.h
+    include/plr/text.h)

@@ -8,3 +8,4 @@
 #include "plr/log/vox_log_server.h"
 #include "plr/log/vox_logger.h"
 #include "plr/rest.h"
+#include "plr/text.h"

@@ -1,0 +1,53 @@
+#pragma once
+
+#include "plr/text/text_transform.h"
+
+namespace plr {
+
+// A stage that is written once, for any number of codes:
+//
+//   class ExampleTransform : public Stage<ExampleTransform> {
+//     public:
+//       std::size_t convert(std::uint32_t* out, std::size_t most);
+//   };
+//
+// convert() delivers up to `most` codes, at least one, with fewer at the end only. It need
+// not look at the count. So that single codes and runs of them read the source alike, it
+// pulls no more than what so many codes need at the least, by pull(), and keeps
+// between calls only what it had to pull.
+template <class Derived>
+class Stage : public TextTransform {
+  public:
+    std::uint32_t nextCode() final {
+        std::uint32_t code = kEnd;
+        nextCodes(&code, 1);
+        return code;
+    }
+    std::size_t nextCodes(std::uint32_t* out, std::size_t most) final { return deliver(out, most); }
+
+  protected:
+    template <class Out>
+    std::size_t deliver(Out* out, std::size_t most) {
+        most = permitted(most);
+        if (most == 0)
+            return 0;
+        const std::size_t codes = static_cast<Derived*>(this)->convert(out, most);
+        spend(codes);
+        return codes;
+    }
+
+    // Up to `most` codes of the source; fewer at its end.
+    std::size_t pull(std::uint32_t* codes, std::size_t most) {
+        return source == nullptr ? 0 : source->nextCodes(codes, most);
+    }
+};
+
+// A stage that delivers octets: convert() takes std::uint32_t* and char*, so that octets
+// need not pass as codes.
+template <class Derived>
+class OctetStage : public Stage<Derived> {
+  public:
+    std::size_t nextChars(char* out, std::size_t most) final { return this->deliver(out, most); }
+};
+
+}  // namespace plr

@@ -1,0 +1,47 @@
+#include "plr/text/text_transform.h"
+
+#include <array>
+
+#include "src/text/octets.h"
+
+namespace plr {
+
+TextTransform::~TextTransform() = default;
+
+void TextTransform::reset() {
+    exception = false;
+}
+
+std::size_t TextTransform::nextCodes(std::uint32_t* out, std::size_t most) {
+    std::size_t done = 0;
+    for (std::uint32_t code = 0; done < most && (code = nextCode()) != kEnd; ++done)
+        out[done] = code;
+    return done;
+}
+
+std::size_t TextTransform::nextChars(char* out, std::size_t most) {
+    std::array<std::uint32_t, 256> codes;
+    std::size_t done = 0;
+    while (done < most) {
+        const std::size_t wanted = std::min(most - done, codes.size());
+        const std::size_t got = nextCodes(codes.data(), wanted);
+        octets::narrow(out + done, codes.data(), got);
+        done += got;
+        if (got < wanted)
+            break;
+    }
+    return done;
+}
+
+OctetSourceBuffer* TextTransform::asOctetSource() noexcept {
+    return nullptr;
+}
+
+bool TextTransform::getExceptionStatus() const noexcept {
+    const TextTransform* stage = this;
+    while (stage != nullptr && !stage->exception)
+        stage = stage->source;
+    return stage != nullptr;
+}
+
+}  // namespace plr
