@@ -60,9 +60,14 @@ template <class Word>
 // call of memcpy, saved registers and all, they would take twice as long.
 [[gnu::always_inline]] inline std::uint32_t copyBytes(std::uint8_t* to, const std::uint8_t* from,
                                                       std::uint32_t length) {
-    if (length > 64)
+    if (length > 128)
         return copyMany(to, from, length);
-    if (length >= 32) {
+    if (length > 64) {
+        copyTwoWords<Sixteen>(to, from, 32);
+        copyTwoWords<Sixteen>(to + 32, from + 32, 32);
+        copyTwoWords<Sixteen>(to + length - 64, from + length - 64, 32);
+        copyTwoWords<Sixteen>(to + length - 32, from + length - 32, 32);
+    } else if (length >= 32) {
         copyTwoWords<Sixteen>(to, from, 32);
         copyTwoWords<Sixteen>(to + length - 32, from + length - 32, 32);
     } else if (length >= 16) {

@@ -315,15 +315,15 @@ TEST(RingBuffer, TakesPowersOfTwoOnly) {
     EXPECT_TRUE(PelorinRingBufferLinearize(&none));
 }
 
-// Copies of up to 64 bytes go by words.
+// Copies of up to 128 bytes go by words.
 TEST(RingBuffer, CopiesEveryLength) {
     std::array<std::uint8_t, 256> storage;
-    std::array<std::uint8_t, 100> in;
+    std::array<std::uint8_t, 150> in;
     std::iota(in.begin(), in.end(), std::uint8_t{1});
     PelorinRingBuffer ring;
     PelorinRingBufferInitialize(&ring, storage.data(), storage.size());
     for (std::uint32_t length = 0; length < in.size(); length++) {
-        std::array<std::uint8_t, 101> out{};
+        std::array<std::uint8_t, 151> out{};
         storage.fill(0);
         ASSERT_EQ(PelorinRingBufferInsertRaw(&ring, in.data(), length), length);
         EXPECT_EQ(storage[length], 0) << length;
