@@ -434,12 +434,21 @@ pelorin_component(timers LEVEL 5 LIBRARY pelorin
 
 pelorin_component(text LEVEL 5 LIBRARY pelorin
   HEADERS
+    include/plr/text/gsm7.h
     include/plr/text/octet_source_buffer.h
     include/plr/text/text_converter.h
     include/plr/text/text_transform.h
   SOURCES
+    src/text/gsm7.cpp
+    src/text/gsm7_alphabets.h
+    src/text/gsm7_stages.cpp
+    src/text/gsm7_stages.h
+    src/text/gsm7_tables.cpp
+    src/text/gsm7_tables.h
     src/text/octet_source_buffer.cpp
     src/text/octets.h
+    src/text/septet_stages.cpp
+    src/text/septet_stages.h
     src/text/stage.h
     src/text/text_transform.cpp)
 
