@@ -439,6 +439,12 @@ pelorin_component(text LEVEL 5 LIBRARY pelorin
     include/plr/text/text_converter.h
     include/plr/text/text_transform.h
   SOURCES
+    src/text/euc_kr.cpp
+    src/text/euc_kr.h
+    src/text/euc_kr_table.h
+    src/text/data_coding_scheme.cpp
+    src/text/hex_transforms.cpp
+    src/text/hex_transforms.h
     src/text/gsm7.cpp
     src/text/gsm7_alphabets.h
     src/text/gsm7_stages.cpp
@@ -446,11 +452,26 @@ pelorin_component(text LEVEL 5 LIBRARY pelorin
     src/text/gsm7_tables.cpp
     src/text/gsm7_tables.h
     src/text/octet_source_buffer.cpp
+    src/text/octet_transforms.cpp
+    src/text/octet_transforms.h
     src/text/octets.h
+    src/text/plain_transforms.h
+    src/text/read_chars.cpp
     src/text/septet_stages.cpp
     src/text/septet_stages.h
     src/text/stage.h
-    src/text/text_transform.cpp)
+    src/text/stage_factory.cpp
+    src/text/stage_factory.h
+    src/text/text_converter.cpp
+    src/text/text_counts.cpp
+    src/text/text_transform.cpp
+    src/text/ucs2_to_utf8_transform.cpp
+    src/text/ucs2_to_utf8_transform.h
+    src/text/utf16.h
+    src/text/utf8_decoder.cpp
+    src/text/utf8_decoder.h
+    src/text/utf8_to_ucs2_transform.cpp
+    src/text/utf8_to_ucs2_transform.h)
 
 pelorin_component(rest_tree LEVEL 5 LIBRARY pelorin
   HEADERS

@@ -1,0 +1,40 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+
+namespace plr {
+
+// Reads UTF-8 from memory, as units and pairs (utf16.h). What is well-formed is table 3-7
+// of the Unicode standard; each maximal subpart of what is not becomes one U+FFFD.
+class Utf8Decoder {
+  public:
+    explicit Utf8Decoder(std::span<const unsigned char> octets) noexcept
+        : begin_(octets.data()), next_(begin_), end_(begin_ + octets.size()) {}
+
+    // Delivers up to `most` codes; returns how many. `atEnd`: no octets follow; a sequence
+    // that is cut is ill-formed. Otherwise it is left alone.
+    std::size_t decode(std::uint32_t* out, std::size_t most, bool atEnd) noexcept;
+
+    // Octets that were read.
+    [[nodiscard]] std::size_t used() const noexcept {
+        return static_cast<std::size_t>(next_ - begin_);
+    }
+    // Whether any of it was ill-formed.
+    [[nodiscard]] bool isMarked() const noexcept { return marked_; }
+
+  private:
+    std::uint32_t* decodeRun(std::uint32_t* out, const std::uint32_t* outEnd) noexcept;
+    bool decodeOne(std::uint32_t& out, bool atEnd) noexcept;
+    [[nodiscard]] std::size_t left() const noexcept {
+        return static_cast<std::size_t>(end_ - next_);
+    }
+
+    const unsigned char* begin_;
+    const unsigned char* next_;
+    const unsigned char* end_;
+    bool marked_ = false;
+};
+
+}  // namespace plr

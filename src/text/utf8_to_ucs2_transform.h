@@ -1,0 +1,27 @@
+#pragma once
+
+#include <array>
+
+#include "src/text/stage.h"
+
+namespace plr {
+
+class Utf8ToUcs2Transform : public Stage<Utf8ToUcs2Transform> {
+  public:
+    void reset() override;
+    std::size_t convert(std::uint32_t* out, std::size_t most);
+
+  private:
+    std::size_t convertMemory(OctetSourceBuffer& memory, std::uint32_t* out, std::size_t most);
+    std::size_t convertPulled(std::uint32_t* out, std::size_t most);
+    std::size_t pullOctets(unsigned char* octets, std::size_t most);
+
+    static constexpr std::size_t kPulled = 256;  // octets at a time
+
+    // Octets that were pulled and not used: the beginning of a sequence, and what showed it
+    // to be ill-formed.
+    std::array<unsigned char, 4> held_{};
+    std::size_t heldLength_ = 0;
+};
+
+}  // namespace plr
