@@ -6,6 +6,7 @@ pelorin_component(base LEVEL 0 LIBRARY platform
     include/plr/base/assert.h
     include/plr/base/export.h
     include/plr/base/report.h
+    include/plr/base/ring_buffer_inline.h
     include/plr/base/thread_annotations.h
   SOURCES
     src/base/assert.cpp
@@ -434,11 +435,29 @@ pelorin_component(timers LEVEL 5 LIBRARY pelorin
 
 pelorin_component(text LEVEL 5 LIBRARY pelorin
   HEADERS
+    include/plr/text/alpha_identifier.h
     include/plr/text/gsm7.h
     include/plr/text/octet_source_buffer.h
+    include/plr/text/sms_encoding.h
+    include/plr/text/sms_user_data.h
     include/plr/text/text_converter.h
     include/plr/text/text_transform.h
+    include/plr/text/ussd_text.h
   SOURCES
+    src/text/alpha_identifier.cpp
+    src/text/combining_marks.h
+    src/text/conversion_chain.cpp
+    src/text/conversion_chain.h
+    src/text/grapheme_joins.cpp
+    src/text/grapheme_joins.h
+    src/text/sms_encoding.cpp
+    src/text/sms_header.cpp
+    src/text/sms_header.h
+    src/text/sms_layout.h
+    src/text/sms_text.cpp
+    src/text/sms_text.h
+    src/text/sms_user_data.cpp
+    src/text/ussd_text.cpp
     src/text/euc_kr.cpp
     src/text/euc_kr.h
     src/text/euc_kr_table.h

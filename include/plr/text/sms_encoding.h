@@ -41,10 +41,9 @@ enum class SmsReference { kNone, k8Bit, k16Bit };
 // UCS-2. Of equal ones the default tables; then a single shift table, a locking one, both;
 // then what takes the fewest septets; then by the order of `languages`, which are those
 // that the receiver knows, or by law must.
-[[nodiscard]] PLR_EXPORT SmsEncoding
-chooseSmsEncoding(std::string_view text,
-                  const std::vector<TextConverter::NationalLanguageId>& languages = {},
-                  SmsReference reference = SmsReference::k8Bit);
+[[nodiscard]] PLR_EXPORT SmsEncoding chooseSmsEncoding(
+    std::string_view text, const std::vector<TextConverter::NationalLanguageId>& languages = {},
+    SmsReference reference = SmsReference::k8Bit);
 
 // Units: septets, of which an escaped character takes two; UTF-16 code units in UCS-2.
 struct SmsSize {

@@ -65,9 +65,9 @@ struct SmsUserData {
     TextConverter::MessageClass messageClass = TextConverter::MessageClass::kClassNone;
     bool isCompressed = false;
     SmsHeader header;
-    std::string text;                 // UTF-8; empty if it is data
-    std::vector<std::uint8_t> data;   // what is no text: 8-bit and compressed
-    bool hasReplacements = false;     // in the text, see TextConverter::exceptionOccurred()
+    std::string text;                // UTF-8; empty if it is data
+    std::vector<std::uint8_t> data;  // what is no text: 8-bit and compressed
+    bool hasReplacements = false;    // in the text, see TextConverter::exceptionOccurred()
 };
 
 // `userData`: from outside, any octets; those behind the end are not looked at.

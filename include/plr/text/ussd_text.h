@@ -27,18 +27,19 @@ struct UssdText {
 };
 
 // `octets`: from outside. Of 7-bit text a CR that fills the last 7 bits (3GPP TS 23.038,
-// 6.1.2.3.1) is taken off. Nothing for a reserved scheme, for more than 160 octets, and for a
-// text that should begin with its language and is too short for it.
+// 6.1.2.3.1) is taken off, and so is the language that a text begins with, if the scheme says
+// that it does. Nothing for a reserved scheme, and for more than 160 octets.
 [[nodiscard]] PLR_EXPORT std::optional<UssdText> decodeUssd(std::span<const std::uint8_t> octets,
-                                                           std::uint8_t codingScheme);
+                                                            std::uint8_t codingScheme);
 
 struct UssdString {
     std::vector<std::uint8_t> octets;  // 160 at most
     std::uint8_t codingScheme = 0;
 };
 
-// In the default alphabet if it has every character, else in UCS-2. `language`: two letters to
-// go in front; empty for none. Nothing if the text is too long or the language none.
+// In the default alphabet if it has every character, else in UCS-2. `language`: to go in
+// front, two lower-case letters or none; a receiver sees a last CR twice where the
+// rule of CRs wants that. Nothing if the text is too long or the language is none.
 [[nodiscard]] PLR_EXPORT std::optional<UssdString> encodeUssd(std::string_view text,
                                                               std::string_view language = {});
 
