@@ -1,7 +1,4 @@
-#include <sys/types.h>
-
 #include <algorithm>
-#include <bit>
 #include <cstdint>
 #include <cstring>
 #include <limits>
@@ -35,65 +32,6 @@ struct Positions {
     std::uint32_t toStorageEnd;  // bytes from the read position
 };
 
-using Sixteen [[gnu::vector_size(16)]] = std::uint64_t;
-
-// For lengths from one word to two.
-template <class Word>
-[[gnu::always_inline]] inline void copyTwoWords(std::uint8_t* to, const std::uint8_t* from,
-                                                std::uint32_t length) {
-    Word head;
-    Word tail;
-    std::memcpy(&head, from, sizeof head);
-    std::memcpy(&tail, from + length - sizeof tail, sizeof tail);
-    std::memcpy(to, &head, sizeof head);
-    std::memcpy(to + length - sizeof tail, &tail, sizeof tail);
-}
-
-[[gnu::noinline]] std::uint32_t copyMany(std::uint8_t* to, const std::uint8_t* from,
-                                         std::uint32_t length) {
-    std::memcpy(to, from, length);
-    return length;
-}
-
-// Returns `length`, so that callers end with it.
-// Hot path: bench/bytes_pelorin.cpp. The few bytes of a command are copied here: with a
-// call of memcpy, saved registers and all, they would take twice as long.
-[[gnu::always_inline]] inline std::uint32_t copyBytes(std::uint8_t* to, const std::uint8_t* from,
-                                                      std::uint32_t length) {
-    if (length > 128)
-        return copyMany(to, from, length);
-    if (length > 64) {
-        copyTwoWords<Sixteen>(to, from, 32);
-        copyTwoWords<Sixteen>(to + 32, from + 32, 32);
-        copyTwoWords<Sixteen>(to + length - 64, from + length - 64, 32);
-        copyTwoWords<Sixteen>(to + length - 32, from + length - 32, 32);
-    } else if (length >= 32) {
-        copyTwoWords<Sixteen>(to, from, 32);
-        copyTwoWords<Sixteen>(to + length - 32, from + length - 32, 32);
-    } else if (length >= 16) {
-        copyTwoWords<Sixteen>(to, from, length);
-    } else if (length >= 8) {
-        copyTwoWords<std::uint64_t>(to, from, length);
-    } else if (length >= 4) {
-        copyTwoWords<std::uint32_t>(to, from, length);
-    } else if (length >= 2) {
-        copyTwoWords<std::uint16_t>(to, from, length);
-    } else if (length == 1) {
-        *to = *from;
-    }
-    return length;
-}
-
-// Hot path: bench/bytes_pelorin.cpp. Each call knows its count by a jump, not by a
-// conditional move: the next insert then need not wait for this one's arithmetic.
-[[gnu::always_inline]] inline std::uint32_t insertPiece(PelorinRingBuffer& ring,
-                                                        const Positions& at,
-                                                        const std::uint8_t* from,
-                                                        std::uint32_t count) {
-    ring.writeCount += count;
-    return copyBytes(ring.buffer + at.write, from, count);
-}
-
 void reset(PelorinRingBuffer& ring) {
     ring.writeCount = 0;
     ring.readCount = 0;
@@ -103,23 +41,6 @@ void remove(PelorinRingBuffer& ring, std::uint32_t count) {
     ring.readCount += count;
     if (ring.readCount == ring.writeCount)
         reset(ring);
-}
-
-[[gnu::noinline]] std::uint32_t copyWrapped(const PelorinRingBuffer& ring, std::uint8_t* to,
-                                            std::uint32_t tail, std::uint32_t count) {
-    std::memcpy(to, ring.buffer + (ring.capacity - tail), tail);
-    std::memcpy(to + tail, ring.buffer, count - tail);
-    return count;
-}
-
-// Hot path: as insertPiece.
-[[gnu::always_inline]] inline std::uint32_t extractPieces(PelorinRingBuffer& ring,
-                                                          const Positions& at, std::uint8_t* to,
-                                                          std::uint32_t count) {
-    remove(ring, count);
-    if (count <= at.toStorageEnd) [[likely]]
-        return copyBytes(to, ring.buffer + at.read, count);
-    return copyWrapped(ring, to, at.toStorageEnd, count);
 }
 
 // As a result that negative ones stay different from.
@@ -149,6 +70,11 @@ bool linearizeWrapped(PelorinRingBuffer& ring, const Positions& at) {
     ::operator delete(block);
     return true;
 }
+
+// The inline functions of the header, for callers that call them.
+[[gnu::used]] constexpr auto kInsertRaw = &PelorinRingBufferInsertRaw;
+[[gnu::used]] constexpr auto kExtractRaw = &PelorinRingBufferExtractRaw;
+[[gnu::used]] constexpr auto kCopyBytes = &PelorinCopyBytes;
 
 }  // namespace
 
@@ -197,17 +123,6 @@ std::uint32_t PelorinRingBufferGetLinearReadRemainingPrivate(const PelorinRingBu
     return at.firstPiece();
 }
 
-std::uint32_t PelorinRingBufferInsertRaw(PelorinRingBuffer* ring, const void* source,
-                                         std::uint32_t length) {
-    // Deliberate: one piece only, although there may be room at the front.
-    const Positions at(*ring);
-    const std::uint32_t room = at.room(ring->capacity);
-    const auto* const from = static_cast<const std::uint8_t*>(source);
-    if (length > room) [[unlikely]]
-        return insertPiece(*ring, at, from, room);
-    return insertPiece(*ring, at, from, length);
-}
-
 std::int32_t PelorinRingBufferInsertFDUnblockable(PelorinRingBuffer* ring, int fd, int unblockFd,
                                                   std::uint32_t most, std::uint32_t timeoutMs) {
     const Positions at(*ring);
@@ -231,15 +146,6 @@ std::uint32_t PelorinRingBufferInsertTransport(PelorinRingBuffer* ring, PelorinT
         return kFailed;
     ring->writeCount += count;
     return count;
-}
-
-std::uint32_t PelorinRingBufferExtractRaw(PelorinRingBuffer* ring, void* destination,
-                                          std::uint32_t most) {
-    const Positions at(*ring);
-    auto* const to = static_cast<std::uint8_t*>(destination);
-    if (most > at.size) [[unlikely]]
-        return extractPieces(*ring, at, to, at.size);
-    return extractPieces(*ring, at, to, most);
 }
 
 std::int32_t PelorinRingBufferExtractFD(PelorinRingBuffer* ring, int fd, std::uint32_t most) {

@@ -88,7 +88,7 @@ class TimedUart {
     static void* workerMain(void* self) noexcept;
     void runReadWorker();
     void runWriteWorker();
-    void store(const std::uint8_t* chunk, std::uint32_t length) PLR_REQUIRES(mutex_);
+    void announce() PLR_REQUIRES(mutex_);
     bool send(const WriteRequest& request) PLR_REQUIRES(mutex_);
     bool awaitRoomOnLine() PLR_REQUIRES(mutex_);
 

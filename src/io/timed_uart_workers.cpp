@@ -16,6 +16,7 @@ namespace plr::io {
 namespace {
 
 constexpr std::uint32_t kChunk = 4096;
+constexpr std::uint32_t kStreamed = 4 * kChunk;
 // For our own frames, and a debug delegate that runs on them.
 constexpr std::size_t kStackBytes = std::size_t{256} * 1024;
 
@@ -35,15 +36,6 @@ int start(pthread_t& thread, void* (*function)(void*), void* context) {
     ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
     ::pthread_attr_destroy(&attributes);
     return error;
-}
-
-// What has come, at most `room` bytes; 0 after a post, -1 when the line is gone.
-ssize_t receive(int port, int wake, std::uint8_t* chunk, std::uint32_t room) {
-    if (room == 0)
-        return serial_wait(port, wake, SERIAL_HUNG_UP);
-    // While bytes come in a stream there is nothing to wait for.
-    const ssize_t got = serial_read_now(port, chunk, room);
-    return got != 0 ? got : serial_read(port, wake, chunk, room);
 }
 
 }  // namespace
@@ -75,13 +67,15 @@ void* TimedUart::workerMain(void* self) noexcept {
     return nullptr;
 }
 
-// Hot path: bench/bytes_pelorin.cpp.
+// Hot path: bench/bytes_pelorin.cpp. While bytes come in a stream, readers are told
+// after several chunks: waking one costs more than reading a chunk.
 void TimedUart::runReadWorker() {
     ::pthread_setname_np(::pthread_self(), "plr-uart-read");
     std::array<std::uint8_t, kChunk> chunk;
     const WaitLock lock(mutex_);
     const int port = port_;
     const int wake = readWake_;
+    const std::uint32_t enough = std::min(queue_.capacity / 2, kStreamed);
     int error = 0;
     while (!stopping_ && error == 0) {
         const std::uint32_t room =
@@ -90,11 +84,19 @@ void TimedUart::runReadWorker() {
         ssize_t got = 0;
         {
             const WaitUnlock unlocked(mutex_);
-            got = receive(port, wake, chunk.data(), room);
+            got = serial_read_now(port, chunk.data(), room);
             error = got < 0 ? errno : 0;
         }
+        // Deliberate: what does not fit in front of the end of the storage is dropped.
         if (got > 0)
-            store(chunk.data(), static_cast<std::uint32_t>(got));
+            PelorinRingBufferInsertRaw(&queue_, chunk.data(), static_cast<std::uint32_t>(got));
+        if (got <= 0 || PelorinRingBufferGetSize(&queue_) >= enough)
+            announce();
+        if (got == 0) {
+            const WaitUnlock unlocked(mutex_);
+            if (serial_wait(port, wake, room == 0 ? SERIAL_HUNG_UP : SERIAL_READABLE) < 0)
+                error = errno;
+        }
     }
     if (!stopping_) {
         lose();
@@ -103,10 +105,8 @@ void TimedUart::runReadWorker() {
     }
 }
 
-void TimedUart::store(const std::uint8_t* chunk, std::uint32_t length) {
-    // Deliberate: what does not fit in front of the end of the storage is dropped.
-    PelorinRingBufferInsertRaw(&queue_, chunk, length);
-    if (waitingReaders_ > 0)
+void TimedUart::announce() {
+    if (waitingReaders_ > 0 && PelorinRingBufferGetSize(&queue_) > 0)
         dataAvailable_.notify_all();
 }
 
