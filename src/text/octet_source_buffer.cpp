@@ -47,6 +47,10 @@ OctetSourceBuffer* OctetSourceBuffer::asOctetSource() noexcept {
     return this;
 }
 
+bool OctetSourceBuffer::deliversOctets() const noexcept {
+    return true;
+}
+
 std::span<const unsigned char> OctetSourceBuffer::peek() const noexcept {
     if (offset == length)
         return {};

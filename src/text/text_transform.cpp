@@ -37,6 +37,10 @@ OctetSourceBuffer* TextTransform::asOctetSource() noexcept {
     return nullptr;
 }
 
+bool TextTransform::deliversOctets() const noexcept {
+    return false;
+}
+
 bool TextTransform::getExceptionStatus() const noexcept {
     const TextTransform* stage = this;
     while (stage != nullptr && !stage->exception)

@@ -25,6 +25,7 @@ class PLR_EXPORT OctetSourceBuffer : public TextTransform {
     std::size_t nextCodes(std::uint32_t* out, std::size_t most) override;
     std::size_t nextChars(char* out, std::size_t most) override;
     OctetSourceBuffer* asOctetSource() noexcept override;
+    [[nodiscard]] bool deliversOctets() const noexcept override;
 
     // Octets delivered since setSource() or reset().
     [[nodiscard]] std::uint64_t getCount() const noexcept { return offset; }

@@ -45,6 +45,8 @@ class PLR_EXPORT TextTransform {
     // This stage where it is the bottom one, whose octets lie in memory and need not be
     // copied; null elsewhere.
     virtual OctetSourceBuffer* asOctetSource() noexcept;
+    // Whether no code is above 0xFF, so that nextChars() loses nothing. By default false.
+    [[nodiscard]] virtual bool deliversOctets() const noexcept;
 
     // How many more codes it may deliver; any number if `codes` is negative.
     void setCount(int codes) noexcept { count = codes; }
