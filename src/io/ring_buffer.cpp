@@ -74,7 +74,6 @@ bool linearizeWrapped(PelorinRingBuffer& ring, const Positions& at) {
 // The inline functions of the header, for callers that call them.
 [[gnu::used]] constexpr auto kInsertRaw = &PelorinRingBufferInsertRaw;
 [[gnu::used]] constexpr auto kExtractRaw = &PelorinRingBufferExtractRaw;
-[[gnu::used]] constexpr auto kCopyBytes = &PelorinCopyBytes;
 
 }  // namespace
 

@@ -93,18 +93,6 @@ static int32_t countBytes(void* context, const void* piece, uint32_t length) {
     return piece ? (int32_t)length : -1;
 }
 
-// Of every length, the bytes and not one more.
-static void copies(void) {
-    uint8_t from[80];
-    for (uint8_t i = 0; i < sizeof from; ++i)
-        from[i] = i + 1;
-    for (uint32_t length = 0; length < sizeof from; ++length) {
-        uint8_t to[sizeof from] = {0};
-        PelorinCopyBytes(to, from, length);
-        CHECK(memcmp(to, from, length) == 0 && to[length] == 0);
-    }
-}
-
 static void ringBuffer(const int* ends) {
     uint8_t storage[8];
     uint8_t flag = 9;
@@ -190,7 +178,6 @@ int main(void) {
     hex();
     dump();
     descriptors(ends);
-    copies();
     ringBuffer(ends);
     fdAndFile(ends);
     serial();
