@@ -20,8 +20,8 @@ class Stage : public TextTransform {
   public:
     std::uint32_t nextCode() final {
         std::uint32_t code = kEnd;
-        nextCodes(&code, 1);
-        return code;
+        // What a stage wrote without delivering it is no code.
+        return nextCodes(&code, 1) == 1 ? code : kEnd;
     }
     std::size_t nextCodes(std::uint32_t* out, std::size_t most) final { return deliver(out, most); }
 
