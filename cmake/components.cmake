@@ -470,6 +470,7 @@ pelorin_component(text LEVEL 5 LIBRARY pelorin
     src/text/gsm7_stages.h
     src/text/gsm7_tables.cpp
     src/text/gsm7_tables.h
+    src/text/octet_pull.h
     src/text/octet_source_buffer.cpp
     src/text/octet_transforms.cpp
     src/text/octet_transforms.h
