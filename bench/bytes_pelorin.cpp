@@ -11,9 +11,9 @@ using namespace bench::bytes_cases;
 
 class Ring {
   public:
-    explicit Ring(std::size_t capacity) : storage_(capacity) {
-        expect(PelorinRingBufferInitialize(&ring_, storage_.data(),
-                                           static_cast<std::uint32_t>(capacity)));
+    explicit Ring(std::size_t capacity) {
+        expect(capacity == sizeof storage_ &&
+               PelorinRingBufferInitialize(&ring_, storage_, sizeof storage_));
     }
     void insert(const char* bytes, std::size_t count) {
         for (auto left = static_cast<std::uint32_t>(count); left > 0;) {
@@ -27,7 +27,7 @@ class Ring {
     }
 
   private:
-    std::vector<std::uint8_t> storage_;
+    alignas(64) std::uint8_t storage_[kRing];
     PelorinRingBuffer ring_{};
 };
 
