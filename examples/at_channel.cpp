@@ -5,6 +5,8 @@
 namespace radio {
 namespace {
 
+constexpr char kEndOfText = '\x1A';  // Ctrl-Z
+
 bool isFinal(const std::string& text) {
     return text == "OK" || text == "ERROR" || text.starts_with("+CME ERROR:") ||
            text.starts_with("+CMS ERROR:");
@@ -31,8 +33,9 @@ AtChannel::~AtChannel() {
         command.onAnswer({});
 }
 
-void AtChannel::send(std::string command, Handler onAnswer, std::chrono::milliseconds limit) {
-    commands_.push_back({std::move(command), std::move(onAnswer), limit});
+void AtChannel::send(std::string command, Handler onAnswer, std::chrono::milliseconds limit,
+                     std::string text) {
+    commands_.push_back({std::move(command), std::move(onAnswer), limit, std::move(text)});
     if (commands_.size() == 1)
         sendNext();
 }
@@ -40,16 +43,22 @@ void AtChannel::send(std::string command, Handler onAnswer, std::chrono::millise
 void AtChannel::sendNext() {
     const Command& next = commands_.front();
     limit_ = timers_->startTimer(next.limit, queue_, [this] { output_.onSilence(); });
-    if (!output_.write(next.text + '\r'))
+    write(next.line + '\r');
+}
+
+void AtChannel::write(const std::string& bytes) {
+    if (!output_.write(bytes))
         output_.onSilence();
 }
 
 void AtChannel::handleLine(const ModemLine& line) {
     if (commands_.empty())
         return output_.onUnsolicited(line);
-    const std::string& command = commands_.front().text;
+    const std::string& command = commands_.front().line;
     if (line.text == command)
         return;
+    if (line.text == LineSplitter::kPrompt && !commands_.front().text.empty())
+        return write(std::exchange(commands_.front().text, {}) + kEndOfText);
     if (isFinal(line.text))
         finish(line.text);
     else if (belongsTo(command, line.text) && answer_.lines.size() < kMostLines)

@@ -44,19 +44,22 @@ class AtChannel {
     // Commands without an answer get the empty one.
     ~AtChannel();
 
-    // `command`: without its CR; its name is all up to the first of "=?".
+    // `command`: without its CR; its name is all up to the first of "=?". `text`: goes out
+    // when the modem prompts for it, and Ctrl-Z behind it.
     void send(std::string command, Handler onAnswer,
-              std::chrono::milliseconds limit = std::chrono::seconds(5));
+              std::chrono::milliseconds limit = std::chrono::seconds(5), std::string text = {});
     void handleLine(const ModemLine& line);
 
   private:
     struct Command {
-        std::string text;
+        std::string line;
         Handler onAnswer;
         std::chrono::milliseconds limit;
+        std::string text;  // to be prompted for
     };
 
     void sendNext();
+    void write(const std::string& bytes);
     void finish(const std::string& result);
 
     const dispatch::queue queue_;

@@ -18,6 +18,12 @@ void LineSplitter::finish() {
 }
 
 void LineSplitter::append(std::string_view bytes) {
+    while (!bytes.empty() && line_.text.size() < kPrompt.size()) {
+        line_.text += bytes.front();
+        bytes.remove_prefix(1);
+        if (line_.text == kPrompt)
+            endLine();
+    }
     const auto fitting = std::min(bytes.size(), kLongestLine - line_.text.size());
     line_.text.append(bytes.substr(0, fitting));
     line_.cut = line_.cut || fitting < bytes.size();

@@ -14,10 +14,12 @@ struct ModemLine {
 };
 
 // Bytes in, lines out. Lines end with LF; CR beside it is dropped, and so are
-// empty lines. Not shared between threads.
+// empty lines. A prompt, "> " where a line begins, is a line of its own: modems ask for the
+// text of a message so (3GPP TS 27.005, 3.5.1). Not shared between threads.
 class LineSplitter {
   public:
     static constexpr std::size_t kLongestLine = 1024;  // bytes
+    static constexpr std::string_view kPrompt = "> ";
     using Handler = std::function<void(const ModemLine&)>;
 
     explicit LineSplitter(Handler handler) : handler_(std::move(handler)) {}

@@ -8,6 +8,7 @@
 #include "examples/at_line.h"
 #include "examples/logging.h"
 #include "examples/radio_reports.h"
+#include "plr/format/hex.h"
 #include "plr/rest/reconnect_policy.h"
 
 namespace radio {
@@ -15,9 +16,10 @@ namespace {
 
 using plr::LogLevel;
 
-// No echo, error numbers, registration told with its place (V.250, 6.2.4; TS 27.007, 9.1, 7.2).
-constexpr std::array kFirst = {"ATE0", "AT+CMEE=1", "AT+CREG=2"};
-constexpr std::array kQuestions = {"AT+CPIN?", "AT+CREG?", "AT+COPS?", "AT+CSQ"};
+// No echo, error numbers, registration told with its place (V.250, 6.2.4; TS 27.007, 9.1, 7.2);
+// messages as PDUs, told as they come (TS 27.005, 3.2.3, 3.4.1).
+constexpr std::array kFirst = {"ATE0", "AT+CMEE=1", "AT+CREG=2", "AT+CMGF=0", "AT+CNMI=2,2"};
+constexpr std::array kQuestions = {"AT+CPIN?", "AT+CREG?", "AT+COPS?", "AT+CMGL=4", "AT+CSQ"};
 
 std::chrono::nanoseconds pauseAfter(unsigned failures) {
     static thread_local std::minstd_rand random{std::random_device()()};
@@ -59,6 +61,18 @@ void ModemControl::send(std::string command, AtChannel::Handler onAnswer) {
     execute_wrapped([this, command = std::move(command), onAnswer = std::move(onAnswer)] {
         ownQueue_.assertCurrent();
         send_sync(command, onAnswer);
+    });
+}
+
+// TS 27.005, 4.3: the length is without the SMSC, whose own length is the first octet.
+void ModemControl::sendMessage(std::string pdu, AtChannel::Handler onAnswer) {
+    execute_wrapped([this, pdu = std::move(pdu), onAnswer = std::move(onAnswer)] {
+        ownQueue_.assertCurrent();
+        const auto octets = plr::parse_hex(pdu, plr::kHexWhitespaceNone);
+        if (octets.empty() || octets.size() < 2U + octets[0])
+            return onAnswer({"no PDU", {}});
+        send_sync("AT+CMGS=" + std::to_string(octets.size() - 1 - octets[0]), onAnswer,
+                  std::chrono::minutes(1), pdu);
     });
 }
 
@@ -111,6 +125,8 @@ ModemHandlers ModemControl::handlers() {
         ownQueue_.assertCurrent();
         channel_ ? channel_->handleLine(line) : handleLine_sync(line);
     };
+    handlers.onLine = [lines = std::make_shared<PduLines>(std::move(handlers.onLine))](
+                          const ModemLine& line) { lines->feed(line); };
     handlers.onEnd = [this] {
         ownQueue_.assertCurrent();
         handleEnd_sync();
@@ -169,18 +185,22 @@ void ModemControl::refresh_sync(const AtChannel::Handler& onAnswer) {
         send_sync(command, command == kQuestions.back() ? onAnswer : AtChannel::Handler());
 }
 
-void ModemControl::send_sync(const std::string& command, AtChannel::Handler onAnswer) {
+void ModemControl::send_sync(const std::string& command, AtChannel::Handler onAnswer,
+                             std::chrono::milliseconds limit, const std::string& text) {
     if (!channel_) {
         if (onAnswer)
             onAnswer({});
         return;
     }
-    channel_->send(command, [this, command, onAnswer = std::move(onAnswer)](const auto& answer) {
-        ownQueue_.assertCurrent();
-        handleAnswer_sync(command, answer);
-        if (onAnswer)
-            onAnswer(answer);
-    });
+    channel_->send(
+        command,
+        [this, command, onAnswer = std::move(onAnswer)](const auto& answer) {
+            ownQueue_.assertCurrent();
+            handleAnswer_sync(command, answer);
+            if (onAnswer)
+                onAnswer(answer);
+        },
+        limit, text);
 }
 
 void ModemControl::handleAnswer_sync(const std::string& command, const AtAnswer& answer) {
@@ -197,7 +217,9 @@ void ModemControl::handleAnswer_sync(const std::string& command, const AtAnswer&
 void ModemControl::handleLine_sync(const ModemLine& said) {
     log(logger(), LogLevel::Debug, "line ", said.number, ": ", said.text);
     const auto line = said.cut ? std::nullopt : parseAtLine(said.text);
-    const Reading reading = line ? readLine(*line) : Reading{{}, {}, "unreadable"};
+    const Reading reading = !line                    ? Reading{{}, {}, "unreadable"}
+                            : SmsInbox::isFor(*line) ? inbox_.read(*line)
+                                                     : readLine(*line);
     if (reading.complaint)
         log(logger(), LogLevel::Warn, "line ", said.number, " is ", reading.complaint,
             ", skipped: ", said.text);
@@ -206,7 +228,7 @@ void ModemControl::handleLine_sync(const ModemLine& said) {
 }
 
 void ModemControl::report_sync(const std::string& path, const vox::object& value) {
-    if (path.starts_with("/radio/"))
+    if (path.starts_with("/radio/") && !path.starts_with("/radio/sms/"))
         reported_.insert(path);
     onReport_(path, value);
 }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <functional>
 #include <memory>
 #include <set>
@@ -8,6 +9,7 @@
 
 #include "examples/at_channel.h"
 #include "examples/modem.h"
+#include "examples/sms_inbox.h"
 #include "plr/concurrency.h"
 #include "plr/ipc.h"
 #include "plr/log.h"
@@ -15,11 +17,11 @@
 namespace radio {
 
 // A ModemControl has the modem: it opens the line, asks, and makes reports of what the
-// modem answers and says on its own, a path and a value each (radio_reports.h).
+// modem answers and says on its own, a path and a value each (radio_reports.h, sms_inbox.h).
 //
 // A terminal that is not there, hangs up or does not answer is opened again, after
-// pauses that grow; what was reported of the radio is not known meanwhile: null. A
-// FIFO or a file is only read.
+// pauses that grow; what was reported of the radio is not known meanwhile: null, but for
+// messages, which stay. A FIFO or a file is only read.
 //
 // Owner:   the std::shared_ptr of create().
 // Queue:   its own, on which all handlers are called.
@@ -44,6 +46,8 @@ class ModemControl : public plr::SharedLoggable<ModemControl> {
     // Any thread. `onAnswer` gets an empty answer when there is no terminal, or its line
     // was lost.
     void send(std::string command, AtChannel::Handler onAnswer);
+    // `pdu`: of a message to send, with its SMSC; in hex. May take a minute.
+    void sendMessage(std::string pdu, AtChannel::Handler onAnswer);
     // Asks for what there is to report. `onAnswer` gets the last answer.
     void refresh(AtChannel::Handler onAnswer);
     // Resets the modem (AT+CFUN=1,1) and begins anew with it. Whether it is back.
@@ -59,7 +63,9 @@ class ModemControl : public plr::SharedLoggable<ModemControl> {
     void lose_sync(const char* why) PLR_ON(ownQueue_);
     void begin_sync(const AtChannel::Handler& onAnswer) PLR_ON(ownQueue_);
     void refresh_sync(const AtChannel::Handler& onAnswer) PLR_ON(ownQueue_);
-    void send_sync(const std::string& command, AtChannel::Handler onAnswer) PLR_ON(ownQueue_);
+    void send_sync(const std::string& command, AtChannel::Handler onAnswer,
+                   std::chrono::milliseconds limit = std::chrono::seconds(5),
+                   const std::string& text = {}) PLR_ON(ownQueue_);
     void handleAnswer_sync(const std::string& command, const AtAnswer& answer) PLR_ON(ownQueue_);
     void handleLine_sync(const ModemLine& said) PLR_ON(ownQueue_);
     void report_sync(const std::string& path, const vox::object& value) PLR_ON(ownQueue_);
@@ -74,6 +80,7 @@ class ModemControl : public plr::SharedLoggable<ModemControl> {
     = false;
     std::unique_ptr<Modem> modem_ PLR_CONFINED_TO(ownQueue_);
     std::unique_ptr<AtChannel> channel_ PLR_CONFINED_TO(ownQueue_);  // of a terminal
+    SmsInbox inbox_ PLR_CONFINED_TO(ownQueue_);
     unsigned failures_ PLR_CONFINED_TO(ownQueue_)
     = 0;  // attempts in a row without an answer
     std::set<std::string> reported_ PLR_CONFINED_TO(ownQueue_);  // paths below /radio

@@ -23,6 +23,20 @@ AtChannel::Handler answerWith(const std::shared_ptr<vox::object>& reply) {
     };
 }
 
+// One after the other, up to the first that is not sent.
+void sendFrom(const std::shared_ptr<ModemControl>& modem, std::vector<std::string> pdus,
+              std::size_t index, const AtChannel::Handler& onAnswer) {
+    if (index == pdus.size())
+        return onAnswer({index == 0 ? "no PDU" : "OK", {}});
+    const std::string pdu = pdus[index];
+    modem->sendMessage(pdu, [modem, pdus = std::move(pdus), index, onAnswer](const auto& answer) {
+        if (answer.isOk())
+            sendFrom(modem, pdus, index + 1, onAnswer);
+        else
+            onAnswer(answer);
+    });
+}
+
 }  // namespace
 
 std::shared_ptr<ModemRequests> ModemRequests::create(
@@ -50,6 +64,10 @@ void ModemRequests::init_sync(vox::connection service) {
         ownQueue_.assertCurrent();
         reset_sync(reply);
     });
+    rest_.registerAsRequestSink("/requests/send_sms", [this](const auto& pdus, const Reply& reply) {
+        ownQueue_.assertCurrent();
+        sendMessages_sync(pdus, reply);
+    });
     rest_.connect(std::move(service));
 }
 
@@ -60,6 +78,14 @@ void ModemRequests::enterPin_sync(const vox::object& pin, const Reply& reply) {
         modem_->send("AT+CPIN=\"" + digits + '"', answerWith(reply));
     else if (reply)
         *reply = vox::string("no PIN");
+}
+
+void ModemRequests::sendMessages_sync(const vox::object& pdus, const Reply& reply) {
+    const vox::array values(pdus);
+    std::vector<std::string> texts;
+    for (std::size_t i = 0; values && i < values.count(); ++i)
+        texts.emplace_back(vox::object(values[i]).text());
+    sendFrom(modem_, std::move(texts), 0, answerWith(reply));
 }
 
 void ModemRequests::reset_sync(const Reply& reply) {

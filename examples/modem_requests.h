@@ -16,6 +16,8 @@ namespace radio {
 //   /requests/enter_pin    "1234": OK, or why not: +CME ERROR: 16 is a wrong one
 //   /requests/refresh      asks the modem for all that it reports; OK
 //   /requests/reset_modem  resets it; how often that was done
+//   /requests/send_sms     PDUs in hex (sms_pdu.h), an array: OK when all are sent, or why
+//                          the first that was not is not
 //
 // The answer leaves when the modem has answered; "no answer" or "not reset" when it
 // does not.
@@ -38,6 +40,7 @@ class ModemRequests : public plr::SharedLoggable<ModemRequests> {
         : SharedLoggable("requests", "radio.requests", logServer), modem_(std::move(modem)) {}
     void init_sync(vox::connection service) PLR_ON(ownQueue_);
     void enterPin_sync(const vox::object& pin, const Reply& reply) PLR_ON(ownQueue_);
+    void sendMessages_sync(const vox::object& pdus, const Reply& reply) PLR_ON(ownQueue_);
     void reset_sync(const Reply& reply) PLR_ON(ownQueue_);
 
     const std::shared_ptr<ModemControl> modem_;

@@ -165,6 +165,7 @@ constexpr Code kCodes[] = {
     {"+CMTI", "/events/sms", storedMessage},
     {"+CDSI", "/events/delivery_report", storedMessage},
     {"+CUSD", "/events/ussd", ussd},
+    {"+CMGS", nullptr, nullptr},
     {"OK", nullptr, nullptr},
     {"ERROR", nullptr, nullptr},
     {"+CME ERROR", nullptr, nullptr},

@@ -13,6 +13,15 @@ namespace radio {
 using plr::LogLevel;
 using plr::rest::PropertyRestResource;
 
+namespace {
+
+// What people write to each other is not for logs.
+std::string shown(const std::string& path, const vox::object& value) {
+    return path.starts_with("/radio/sms/") ? "a message" : oneLine(value);
+}
+
+}  // namespace
+
 // Properties that clients set and the service acts on.
 class RadioService::Settings : public PropertyRestResource {
   public:
@@ -83,7 +92,7 @@ void RadioService::publish(const std::string& path, const vox::object& value) {
 void RadioService::publish_sync(const std::string& path, const vox::object& value) {
     published_++;
     if (enabled(LogLevel::Info))
-        forceLog(LogLevel::Info, plr::LogMessageBuffer() << path << " = " << oneLine(value));
+        forceLog(LogLevel::Info, plr::LogMessageBuffer() << path << " = " << shown(path, value));
     set_sync(path, value);
     if (path == "/events/sms")  // the modem keeps it
         set_sync("/messages/" + placeOf(value), value);

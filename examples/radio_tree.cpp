@@ -3,7 +3,9 @@
 #include <unistd.h>
 
 #include "examples/log_levels.h"
+#include "examples/radio_resource.h"
 #include "examples/remote_log.h"
+#include "examples/sms_inbox.h"
 
 namespace radio {
 namespace {
@@ -20,10 +22,12 @@ constexpr struct {
     {"/radio/registration", "dictionary", "Whether a network takes calls, and where."},
     {"/radio/signal", "int64", "Signal strength in dBm; null when it is not known."},
     {"/radio/sim", "string", "READY, or what the card waits for."},
+    {"/radio/sms", "map", "Messages that came, from 1 on: text, sender and time."},
     {"/assertions/keep_radio_on", "assertion", "Keeps the radio on while somebody holds it."},
     {"/requests/enter_pin", "request", "Gives the card its PIN, a string; answers the result."},
     {"/requests/refresh", "request", "Asks the modem for what it reports; answers the result."},
     {"/requests/reset_modem", "request", "Answers the number of resets when the modem is back."},
+    {"/requests/send_sms", "request", "Sends PDUs, hex strings; answers the result."},
     {"/settings/airplane_mode", "bool", "Kept for whom it concerns."},
     {"/settings/status_seconds", "int64", "Period of status lines in the log; 0 ends them."},
 };
@@ -40,6 +44,7 @@ void restrictAccess(RestServerExample& server) {
         only("/assertions/keep_radio_on/provider", Operation::kPush),
         only("/requests", Operation::kPush),
         only("/requests/enter_pin", Operation::kGet),
+        only("/requests/send_sms", Operation::kGet),
     });
 }
 
@@ -48,7 +53,7 @@ void restrictAccess(RestServerExample& server) {
 void installResources(RestServerExample& server, const std::shared_ptr<plr::Logger>& logger) {
     server.registerResource("/connections", std::make_shared<ConnectionRestResource>(),
                             {"array", "Who is connected."});
-    server.registerResource("/radio", std::make_shared<PropertyRestResource>(true),
+    server.registerResource("/radio", std::make_shared<RadioResource>(SmsInbox::kMostKept),
                             {"properties", "What the modem reported last."});
     server.registerResource("/events", std::make_shared<PropertyRestResource>(false),
                             {"events", "Calls and messages as they come."});

@@ -11,6 +11,7 @@ namespace radio {
 //
 //   /connections            who is connected
 //   /radio/...              the last value of everything that the modem reported
+//   /radio/sms/...          messages that came (sms_inbox.h)
 //   /events/...             calls and messages as they come; not kept
 //   /messages/KEY           what the modem keeps, SM-3 for instance, until a client removes it
 //   /assertions/...         what clients need: keep_radio_on (power.h)
@@ -19,8 +20,9 @@ namespace radio {
 //   /log_server             an endpoint for clients to log to (remote_log.h)
 //   /descriptions           all this, to read
 //
-// What the modem and the power component tell, and the card's PIN, come from this user
-// only, by access rules. `logger` has the log that the last ones are about. Any thread.
+// What the modem and the power component tell, the card's PIN, and messages to send come
+// from this user only, by access rules. `logger` has the log that the last ones are about. Any
+// thread.
 void installResources(plr::rest::RestServerExample& server,
                       const std::shared_ptr<plr::Logger>& logger);
 

@@ -182,6 +182,21 @@ class Terminal(Radiod):
             self.assertEqual({self.notified() for _ in range(3)}, {
                 ("/radio/signal", None), ("/radio/sim", None), ("/radio/operator", None)})
 
+    def test_receives_and_sends_messages_which_no_log_tells(self):
+        self.watch("/radio/sms/1")
+        self.assertEqual(self.notified(), ("/radio/sms/1", None))
+        self.start_modem("modem_script.txt")
+        self.assertEqual(self.notified(), ("/radio/sms/1", {
+            "from": "+919812345678", "time": "2026-11-21T18:00:00+05:30", "encoding": "kUCS2", "parts": 1,
+            "text": "नमस्ते"}))
+        pdu = "0001000581214305000178"
+        answers = [(None, "no PDU"), (["zz"], "no PDU"), ([pdu, "05"], "no PDU"), ([pdu, pdu], "OK")]
+        for pdus, answer in answers:
+            self.assertEqual(self.ask("send_sms", pdus), answer)
+        self.end(self.radiod)
+        self.assertIn("/radio/sms/1 = a message", self.log.read_text())
+        self.assertNotIn("नमस्ते", self.log.read_text())
+
     def test_carries_out_what_clients_ask_and_keeps_the_pin_out_of_the_log(self):
         self.client.send(message("set", "/log/radio.modem", "Trace"))
         self.watch("/radio/sim", "/radio/signal")

@@ -34,8 +34,9 @@ class Conversation {
         queue_.sync([this] { channel_.reset(); });
     }
 
-    void send(const char* command, std::chrono::milliseconds limit = plr::test::kBound) {
-        queue_.sync([&] { channel_->send(command, answer_, limit); });
+    void send(const char* command, std::chrono::milliseconds limit = plr::test::kBound,
+              const char* text = "") {
+        queue_.sync([&] { channel_->send(command, answer_, limit, text); });
     }
     void hear(const char* line) {
         queue_.sync([&] { channel_->handleLine({1, line, false}); });
@@ -82,6 +83,14 @@ TEST(AtChannel, TellsAnswersFromWhatTheModemSaysOnItsOwn) {
     EXPECT_EQ(modem.log(), "> AT+CPIN=\"1234\"\r= ERROR\r");
     modem.hear("+CME ERROR: 16");
     EXPECT_EQ(modem.log(), "= +CME ERROR: 16\r");
+}
+
+TEST(AtChannel, SaysTheTextOfACommandOnceItIsPrompted) {
+    Conversation modem;
+    modem.send("AT+CMGS=1", plr::test::kBound, "0011");
+    for (const char* line : {"> ", "> ", "+CMGS: 7", "OK", "> "})
+        modem.hear(line);
+    EXPECT_EQ(modem.log(), "> AT+CMGS=1\r> 0011\x1A! > \r= +CMGS: 7 OK\r! > \r");
 }
 
 TEST(AtChannel, SaysThatTheModemIsSilentAndAnswersAllAtItsEnd) {

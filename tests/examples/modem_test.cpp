@@ -35,6 +35,7 @@ TEST(LineSplitter, FindsTheSameLinesHoweverTheBytesArrive) {
         {"RING\nRING\n", {"1:RING", "2:RING"}},
         {"\r\nRING\r\n\r\n+CSQ: 1,99\r\n", {"2:RING", "4:+CSQ: 1,99"}},
         {"AT\r\r\nOK\r\n", {"1:AT", "2:OK"}},
+        {"\r\n> \r\n+CMGS: 1\r\n> x\n", {"2:> ", "4:+CMGS: 1", "5:> ", "6:x"}},
         {"RING\nlast", {"1:RING", "2:last"}},
         {"", {}},
         {"\n\r\n\n", {}},

@@ -18,7 +18,8 @@
 // A line that starts at the margin is a command, in either case; one with "*" at its
 // end stands for all commands that start so. The indented lines below are sent when
 // that command comes: the information text, the final result, and what the modem
-// says on its own afterwards. A command without any stays unanswered.
+// says on its own afterwards. A command without any stays unanswered. The line ">" is sent
+// as a prompt; what the client then says up to Ctrl-Z is a command, too.
 //
 // Plain data; any thread.
 namespace plr::test {

@@ -19,6 +19,8 @@
 namespace plr::test {
 namespace {
 
+constexpr char kEndOfText = '\x1A';  // Ctrl-Z, of what was prompted for
+
 [[noreturn]] void throwErrno(const char* what) {
     throw std::system_error(errno, std::generic_category(), what);
 }
@@ -185,7 +187,7 @@ bool ScriptedModem::isPieceUnread() const {
 void ScriptedModem::take(char byte) {
     if (echo_)
         unsent_ += byte;
-    if (byte == '\r')
+    if (byte == '\r' || byte == kEndOfText)
         finishCommand();
     else if (command_.size() == kLongestCommand)
         isTooLong_ = true;
@@ -224,7 +226,7 @@ void ScriptedModem::answer(const std::string& command) {
 }
 
 void ScriptedModem::queueLine(std::string_view text) {
-    unsent_.append("\r\n").append(text).append("\r\n");
+    unsent_.append("\r\n").append(text).append(text == ">" ? " " : "\r\n");
 }
 
 }  // namespace plr::test

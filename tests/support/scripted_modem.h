@@ -15,7 +15,7 @@
 // A modem behind a pseudo terminal that speaks AT from a script, for tests of what
 // talks to one. Clients open, close and open path() as they like.
 //
-// Protocol: ITU-T V.250. A command ends with CR; one that the script does not know
+// Protocol: ITU-T V.250. A command ends with CR, or Ctrl-Z; one that the script does not know
 //           gets ERROR, but AT, ATE0 and ATE1 get OK. Lines go out as CR LF text
 //           CR LF. What comes is echoed until ATE0 (section 6.2.4). Neither several
 //           commands in one line nor "A/".

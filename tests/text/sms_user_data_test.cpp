@@ -123,6 +123,8 @@ TEST(SmsUserData, IsWrittenAsAnotherCodecDoes) {
     } rows[] = {
         {"septets", encodeSms("[€] a@", {}), "1bdea6bcf181c200", 9, 0x00},
         {"tables", encodeSms("ağ€Ş", turkish), "0624010125010161068103", 12, 0x00},
+        {"a table, no text", encodeSms("", {MessageEncoding::kGSM7, {}, Language::kSpanish}),
+         "0324010200", 5, 0x00},
         {"UCS-2", encodeSms("Ж😀é", ucs2), "0416d83dde0000e9", 8, 0x08},
         {"parts", encodeSms(two, ucs2, SmsReference::k8Bit, 0x1234), "050003340202", 14, 0x08},
         {"wide", encodeSms(two, ucs2, SmsReference::k16Bit, 0x1234), "06080412340202", 17, 0x08},
