@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <string>
 
-#include "plr/text/octet_source_buffer.h"
 #include "src/text/utf16.h"
 #include "tests/text/stage_run.h"
 
@@ -70,25 +69,14 @@ Codes modelOf(const std::string& octets) {
     return codes;
 }
 
-Codes decodeMemory(const std::string& octets, std::size_t run) {
-    plr::OctetSourceBuffer source;
-    source.setSource(octets.data(), static_cast<int>(octets.size()));
-    const auto stage = plr::makeStage(kUtf8ToUcs2, 0, 0);
-    stage->setSource(&source);
-    stage->setCount(-1);
-    return drain(*stage, run);
-}
-
 // From memory and from another stage, in short runs and long ones.
 void expectDecodes(const std::string& octets, const Codes& expected) {
     const bool isMarked = std::count(expected.begin(), expected.end(), kReplacement) != 0;
-    const Codes codes(reinterpret_cast<const unsigned char*>(octets.data()),
-                      reinterpret_cast<const unsigned char*>(octets.data()) + octets.size());
+    const Codes codes = codesOf(octets);
+    const Made made{expected, isMarked, octets.size()};
     for (const std::size_t run : {1U, 7U, 1000U}) {
-        ASSERT_EQ(decodeMemory(octets, run), expected) << run;
-        const Made made = make({kUtf8ToUcs2}, codes, run);
-        ASSERT_EQ(made.codes, expected) << run;
-        ASSERT_EQ(made.isMarked, isMarked) << run;
+        ASSERT_EQ(makeFromMemory({kUtf8ToUcs2}, octets, run), made) << run;
+        ASSERT_EQ(make({kUtf8ToUcs2}, codes, run), made) << run;
     }
 }
 
@@ -102,11 +90,10 @@ TEST(Utf8, EveryCodePoint) {
             octets += octetsOf(point);
             codes.push_back(codeOf(point));
         }
-        const Codes decoded = decodeMemory(octets, 100);
-        ASSERT_EQ(decoded, codes) << std::hex << first;
-        const Made back = make({kUcs2ToUtf8}, codes, 100);
-        ASSERT_EQ(std::string(back.codes.begin(), back.codes.end()), octets) << std::hex << first;
-        ASSERT_FALSE(back.isMarked);
+        const Made there{codes, false, octets.size()};
+        ASSERT_EQ(makeFromMemory({kUtf8ToUcs2}, octets, 100), there) << std::hex << first;
+        const Made back{codesOf(octets), false, codes.size()};
+        ASSERT_EQ(make({kUcs2ToUtf8}, codes, 100), back) << std::hex << first;
     }
 }
 
@@ -151,9 +138,8 @@ TEST(Utf8, SurrogatesThatAreTwoUnits) {
     };
     for (const auto& row : rows) {
         for (const std::size_t run : {1U, 3U, 100U}) {
-            const Made made = make({kUcs2ToUtf8}, row.codes, run);
-            EXPECT_EQ(std::string(made.codes.begin(), made.codes.end()), row.octets) << row.name;
-            EXPECT_EQ(made.isMarked, row.isMarked) << row.name;
+            const Made expected{codesOf(row.octets), row.isMarked, row.codes.size()};
+            EXPECT_EQ(make({kUcs2ToUtf8}, row.codes, run), expected) << row.name;
         }
     }
 }
