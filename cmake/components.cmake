@@ -488,8 +488,13 @@ pelorin_component(text LEVEL 5 LIBRARY pelorin
     src/text/ucs2_to_utf8_transform.cpp
     src/text/ucs2_to_utf8_transform.h
     src/text/utf16.h
+    src/text/utf8_avx2.cpp
     src/text/utf8_decoder.cpp
     src/text/utf8_decoder.h
+    src/text/utf8_kernel.cpp
+    src/text/utf8_kernel.h
+    src/text/utf8_plain.cpp
+    src/text/utf8_plain.h
     src/text/utf8_to_ucs2_transform.cpp
     src/text/utf8_to_ucs2_transform.h)
 

@@ -19,21 +19,20 @@ void BinaryToHexTransform::reset() {
     low_ = 0;
 }
 
-template <class Out>
-std::size_t BinaryToHexTransform::convert(Out* out, std::size_t most) {
+std::size_t BinaryToHexTransform::convert(char* out, std::size_t most) {
     std::array<std::uint32_t, kBlock> codes;
     std::size_t done = 0;
     if (low_ != 0)
-        out[done++] = static_cast<Out>(std::exchange(low_, '\0'));
+        out[done++] = std::exchange(low_, '\0');
     while (done < most) {
         const std::size_t wanted = std::min((most - done + 1) / 2, kBlock);
         const std::size_t got = pull(codes.data(), wanted);
         for (std::size_t i = 0; i < got; ++i) {
-            out[done++] = static_cast<Out>(digit(codes[i] >> 4));
+            out[done++] = digit(codes[i] >> 4);
             if (done == most)
                 low_ = digit(codes[i]);
             else
-                out[done++] = static_cast<Out>(digit(codes[i]));
+                out[done++] = digit(codes[i]);
         }
         if (got < wanted)
             break;
@@ -41,8 +40,7 @@ std::size_t BinaryToHexTransform::convert(Out* out, std::size_t most) {
     return done;
 }
 
-template <class Out>
-std::size_t HexToBinaryTransform::convert(Out* out, std::size_t most) {
+std::size_t HexToBinaryTransform::convert(char* out, std::size_t most) {
     std::array<std::uint32_t, 2 * kBlock> digits;
     std::size_t done = 0;
     while (done < most) {
@@ -50,16 +48,11 @@ std::size_t HexToBinaryTransform::convert(Out* out, std::size_t most) {
         const std::size_t got = pull(digits.data(), wanted);
         for (std::size_t i = 0; i + 1 < got; i += 2)
             out[done++] =
-                static_cast<Out>(hexDigitValue(digits[i]) << 4 | hexDigitValue(digits[i + 1]));
+                static_cast<char>(hexDigitValue(digits[i]) << 4 | hexDigitValue(digits[i + 1]));
         if (got < wanted)
             break;
     }
     return done;
 }
-
-template std::size_t BinaryToHexTransform::convert(char*, std::size_t);
-template std::size_t BinaryToHexTransform::convert(std::uint32_t*, std::size_t);
-template std::size_t HexToBinaryTransform::convert(char*, std::size_t);
-template std::size_t HexToBinaryTransform::convert(std::uint32_t*, std::size_t);
 
 }  // namespace plr

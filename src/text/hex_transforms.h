@@ -15,8 +15,8 @@ constexpr std::uint32_t hexDigitValue(std::uint32_t digit) noexcept {
 class BinaryToHexTransform : public OctetStage<BinaryToHexTransform> {
   public:
     void reset() override;
-    template <class Out>
-    std::size_t convert(Out* out, std::size_t most);
+    using OctetStage::convert;
+    std::size_t convert(char* out, std::size_t most);
 
   private:
     char low_ = 0;  // the digit of the last octet that is still to come; 0 for none
@@ -24,8 +24,8 @@ class BinaryToHexTransform : public OctetStage<BinaryToHexTransform> {
 
 class HexToBinaryTransform : public OctetStage<HexToBinaryTransform> {
   public:
-    template <class Out>
-    std::size_t convert(Out* out, std::size_t most);
+    using OctetStage::convert;
+    std::size_t convert(char* out, std::size_t most);
 };
 
 }  // namespace plr

@@ -1,7 +1,6 @@
 #include "src/text/octet_transforms.h"
 
 #include <array>
-#include <type_traits>
 
 #include "plr/text/octet_source_buffer.h"
 #include "src/text/utf16.h"
@@ -9,27 +8,43 @@
 namespace plr {
 namespace {
 
+using octets::kBlock;
+
 constexpr std::size_t kCodes = 256;  // at a time
 
 void widenBlock(std::uint32_t* out, const unsigned char* units) {
-    std::array<std::uint16_t, octets::kBlock> block;
+    std::array<std::uint16_t, kBlock> block;
     std::memcpy(block.data(), units, sizeof(block));
-    for (std::size_t k = 0; k < octets::kBlock; ++k)
+    for (std::size_t k = 0; k < kBlock; ++k)
         out[k] = octets::bigEndian(block[k]);
 }
 
-template <class Out>
-void narrowBlock(Out* out, const std::uint32_t* codes) {
-    std::array<std::uint16_t, octets::kBlock> block;
-    for (std::size_t k = 0; k < octets::kBlock; ++k)
-        block[k] = octets::bigEndian(static_cast<std::uint16_t>(codes[k]));
-    if constexpr (sizeof(Out) == 1) {
-        std::memcpy(out, block.data(), sizeof(block));
-    } else {
-        std::array<unsigned char, sizeof(block)> bytes;
-        std::memcpy(bytes.data(), block.data(), sizeof(block));
-        octets::widen(out, bytes.data(), bytes.size());
+void narrowBlock(char* out, const std::uint32_t* codes) {
+    std::array<std::uint16_t, kBlock> block;
+    for (std::size_t k = 0; k < kBlock; ++k)
+        block[k] = static_cast<std::uint16_t>(codes[k]);
+    for (std::size_t k = 0; k < kBlock; ++k)
+        block[k] = octets::bigEndian(block[k]);
+    std::memcpy(out, block.data(), sizeof(block));
+}
+
+// Of a block, for which there is room; 0 where a code is neither unit nor pair.
+std::size_t convertBlock(const std::uint32_t* codes, char* out) {
+    if (octets::blockFits(codes, 0xFFFF)) {
+        narrowBlock(out, codes);
+        return 2 * kBlock;
     }
+    // Without a branch for each: texts mix units and pairs.
+    std::size_t done = 0;
+    bool allGood = true;
+    for (std::size_t i = 0; i < kBlock; ++i) {
+        const unsigned pair = utf16::isPair(codes[i]) ? 1 : 0;
+        allGood &= pair == (codes[i] > 0xFFFF ? 1U : 0U);
+        const std::uint32_t bits = octets::firstHighest(codes[i] << (16 - 16 * pair));
+        std::memcpy(out + done, &bits, sizeof(bits));
+        done += 2 + 2 * pair;
+    }
+    return allGood ? done : 0;
 }
 
 }  // namespace
@@ -57,7 +72,7 @@ std::size_t OctetToUcs2Transform::convertMemory(OctetSourceBuffer& memory, std::
     const auto octets = memory.peek();
     const std::size_t units = std::min(most, octets.size() / 2);
     std::size_t i = 0;
-    for (; i + octets::kBlock <= units; i += octets::kBlock)
+    for (; i + kBlock <= units; i += kBlock)
         widenBlock(out + i, octets.data() + 2 * i);
     for (; i < units; ++i)
         out[i] = static_cast<std::uint32_t>(octets[2 * i] << 8 | octets[2 * i + 1]);
@@ -81,32 +96,32 @@ void Ucs2ToOctetTransform::reset() {
     rest_ = {};
 }
 
-template <class Out>
-std::size_t Ucs2ToOctetTransform::convert(Out* out, std::size_t most) {
+std::size_t Ucs2ToOctetTransform::convert(char* out, std::size_t most) {
     std::array<std::uint32_t, kCodes> codes;
     std::size_t done = rest_.take(out, most);
     while (done < most) {
         const std::size_t wanted = std::min((most - done + 3) / 4, kCodes);
         const std::size_t got = pull(codes.data(), wanted);
-        done += convertBlock(codes.data(), got, out + done, most - done);
+        done += convertCodes(codes.data(), got, out + done, most - done);
         if (got < wanted)
             break;
     }
     return done;
 }
 
-template <class Out>
-std::size_t Ucs2ToOctetTransform::convertBlock(const std::uint32_t* codes, std::size_t length,
-                                               Out* out, std::size_t most) {
+std::size_t Ucs2ToOctetTransform::convertCodes(const std::uint32_t* codes, std::size_t length,
+                                               char* out, std::size_t most) {
     std::size_t done = 0;
     for (std::size_t i = 0; i < length;) {
-        if (length - i >= octets::kBlock && most - done >= 2 * octets::kBlock &&
-            octets::blockFits(codes + i, 0xFFFF)) {
-            narrowBlock(out + done, codes + i);
-            i += octets::kBlock;
-            done += 2 * octets::kBlock;
-        } else {
-            rest_ = encode(codes[i++]);
+        while (length - i >= kBlock && most - done >= 4 * kBlock) {
+            const std::size_t converted = convertBlock(codes + i, out + done);
+            if (converted == 0)
+                break;
+            i += kBlock;
+            done += converted;
+        }
+        for (const std::size_t stop = std::min(length, i + kBlock); i < stop; ++i) {
+            rest_ = encode(codes[i]);
             done += rest_.take(out + done, most - done);
         }
     }
@@ -122,8 +137,5 @@ octets::Few Ucs2ToOctetTransform::encode(std::uint32_t code) {
     }
     return {code << 16, 2};
 }
-
-template std::size_t Ucs2ToOctetTransform::convert(char*, std::size_t);
-template std::size_t Ucs2ToOctetTransform::convert(std::uint32_t*, std::size_t);
 
 }  // namespace plr

@@ -17,12 +17,11 @@ class OctetToUcs2Transform : public Stage<OctetToUcs2Transform> {
 class Ucs2ToOctetTransform : public OctetStage<Ucs2ToOctetTransform> {
   public:
     void reset() override;
-    template <class Out>
-    std::size_t convert(Out* out, std::size_t most);
+    using OctetStage::convert;
+    std::size_t convert(char* out, std::size_t most);
 
   private:
-    template <class Out>
-    std::size_t convertBlock(const std::uint32_t* codes, std::size_t length, Out* out,
+    std::size_t convertCodes(const std::uint32_t* codes, std::size_t length, char* out,
                              std::size_t most);
     octets::Few encode(std::uint32_t code);
 

@@ -1,35 +1,50 @@
 #pragma once
 
 #include <algorithm>
+#include <array>
 #include <bit>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
 
-// Octets as codes, and codes as octets. In blocks of a fixed size, which compilers
-// turn into vector instructions.
+// Octets as codes, and codes as octets, a block at a time: of a fixed size and between
+// local arrays, so that compilers make vector instructions of it.
 namespace plr::octets {
 
 inline constexpr std::size_t kBlock = 16;
+using Block = std::array<unsigned char, kBlock>;
 
-// Of each code the low 8 bits.
-template <class Out>
-void narrow(Out* out, const std::uint32_t* codes, std::size_t length) noexcept {
-    std::size_t i = 0;
-    for (; i + kBlock <= length; i += kBlock)
-        for (std::size_t k = 0; k < kBlock; ++k)
-            out[i + k] = static_cast<Out>(codes[i + k] & 0xFF);
-    for (; i < length; ++i)
-        out[i] = static_cast<Out>(codes[i] & 0xFF);
+inline void widenBlock(std::uint32_t* out, const void* octets) noexcept {
+    Block block;
+    std::memcpy(block.data(), octets, kBlock);
+    for (std::size_t k = 0; k < kBlock; ++k)
+        out[k] = block[k];
 }
 
-inline void widen(std::uint32_t* out, const unsigned char* octets, std::size_t length) noexcept {
+// Of each code the low 8 bits.
+inline void narrowBlock(char* out, const std::uint32_t* codes) noexcept {
+    Block block;
+    for (std::size_t k = 0; k < kBlock; ++k)
+        block[k] = static_cast<unsigned char>(codes[k]);
+    std::memcpy(out, block.data(), kBlock);
+}
+
+template <class Octet>
+void widen(std::uint32_t* out, const Octet* octets, std::size_t length) noexcept {
+    static_assert(sizeof(Octet) == 1);
     std::size_t i = 0;
     for (; i + kBlock <= length; i += kBlock)
-        for (std::size_t k = 0; k < kBlock; ++k)
-            out[i + k] = octets[i + k];
+        widenBlock(out + i, octets + i);
     for (; i < length; ++i)
-        out[i] = octets[i];
+        out[i] = static_cast<unsigned char>(octets[i]);
+}
+
+inline void narrow(char* out, const std::uint32_t* codes, std::size_t length) noexcept {
+    std::size_t i = 0;
+    for (; i + kBlock <= length; i += kBlock)
+        narrowBlock(out + i, codes + i);
+    for (; i < length; ++i)
+        out[i] = static_cast<char>(codes[i]);
 }
 
 // Whether none of a block of codes has a bit that is not in `mask`.
@@ -40,10 +55,20 @@ inline bool blockFits(const std::uint32_t* codes, std::uint32_t mask) noexcept {
     return (all & ~mask) == 0;
 }
 
+// A sum and no "or": the latter becomes a rotation, which compilers leave scalar.
 constexpr std::uint16_t bigEndian(std::uint16_t number) noexcept {
     return std::endian::native == std::endian::big
                ? number
-               : static_cast<std::uint16_t>(number << 8 | number >> 8);
+               : static_cast<std::uint16_t>(static_cast<std::uint16_t>(number << 8) +
+                                            static_cast<std::uint16_t>(number >> 8));
+}
+
+// For memory: four octets of which the first is in the highest bits, or in the lowest.
+constexpr std::uint32_t firstHighest(std::uint32_t octets) noexcept {
+    return std::endian::native == std::endian::big ? octets : __builtin_bswap32(octets);
+}
+constexpr std::uint32_t firstLowest(std::uint32_t octets) noexcept {
+    return std::endian::native == std::endian::big ? __builtin_bswap32(octets) : octets;
 }
 
 // Up to four octets that one character became.
@@ -52,11 +77,10 @@ struct Few {
     std::size_t length = 0;
 
     // Delivers up to `most` of them, which are gone then; returns how many.
-    template <class Out>
-    std::size_t take(Out* out, std::size_t most) noexcept {
+    std::size_t take(char* out, std::size_t most) noexcept {
         const std::size_t taken = std::min(length, most);
         for (std::size_t i = 0; i < taken; ++i, bits <<= 8)
-            out[i] = static_cast<Out>(bits >> 24);
+            out[i] = static_cast<char>(bits >> 24);
         length -= taken;
         return taken;
     }

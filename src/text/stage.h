@@ -1,6 +1,9 @@
 #pragma once
 
+#include <array>
+
 #include "plr/text/text_transform.h"
+#include "src/text/octets.h"
 
 namespace plr {
 
@@ -42,12 +45,26 @@ class Stage : public TextTransform {
     }
 };
 
-// A stage that delivers octets: convert() takes std::uint32_t* and char*, so that octets
-// need not pass as codes.
+// A stage that delivers octets, by a convert() to characters, so that they need not pass as
+// codes. It may have one to codes, too, or take this one by `using OctetStage::convert;`.
 template <class Derived>
 class OctetStage : public Stage<Derived> {
   public:
     std::size_t nextChars(char* out, std::size_t most) final { return this->deliver(out, most); }
+    [[nodiscard]] bool deliversOctets() const noexcept final { return true; }
+
+    std::size_t convert(std::uint32_t* out, std::size_t most) {
+        std::array<char, 256> chars;
+        std::size_t done = 0;
+        for (bool more = true; more && done < most;) {
+            const std::size_t wanted = std::min(most - done, chars.size());
+            const std::size_t got = static_cast<Derived*>(this)->convert(chars.data(), wanted);
+            octets::widen(out + done, chars.data(), got);
+            done += got;
+            more = got == wanted;
+        }
+        return done;
+    }
 };
 
 }  // namespace plr

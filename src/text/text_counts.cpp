@@ -1,6 +1,7 @@
 #include <array>
 #include <span>
 
+#include "plr/text/gsm7.h"
 #include "plr/text/text_converter.h"
 #include "plr/text/text_transform.h"
 #include "src/text/hex_transforms.h"
@@ -35,6 +36,11 @@ std::uint32_t TextConverter::decodeHexString(const char* text, unsigned long len
     for (unsigned long i = 0; i < length; ++i)
         value = value << 4 | hexDigitValue(static_cast<unsigned char>(text[i]));
     return value;
+}
+
+int TextConverter::getGsm7EncodedSize(int code, Ucs2ToGsm7Tables tables) noexcept {
+    // What the tables have not becomes '?', one septet.
+    return ucs2ToGsm7(static_cast<std::uint32_t>(code), tables) > 0x7F ? 14 : 7;
 }
 
 std::size_t TextConverter::countCharactersInUtf8Message(const char* text, unsigned long length) {

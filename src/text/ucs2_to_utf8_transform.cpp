@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "src/text/utf16.h"
+#include "src/text/utf8_kernel.h"
 
 namespace plr {
 namespace {
@@ -36,8 +37,7 @@ void Ucs2ToUtf8Transform::reset() {
     held_ = kEnd;
 }
 
-template <class Out>
-std::size_t Ucs2ToUtf8Transform::convert(Out* out, std::size_t most) {
+std::size_t Ucs2ToUtf8Transform::convert(char* out, std::size_t most) {
     std::array<std::uint32_t, kCodes> codes;
     std::size_t done = rest_.take(out, most);
     for (bool more = true; done < most && (more || held_ != kEnd);) {
@@ -48,24 +48,22 @@ std::size_t Ucs2ToUtf8Transform::convert(Out* out, std::size_t most) {
         }
         const std::size_t wanted = std::min((most - done + 3) / 4, kCodes);
         const std::size_t got = pull(codes.data(), wanted);
-        done += convertBlock(codes.data(), got, out + done, most - done);
+        done += convertCodes(codes.data(), got, out + done, most - done);
         more = got == wanted;
     }
     return done;
 }
 
-template <class Out>
-std::size_t Ucs2ToUtf8Transform::convertBlock(const std::uint32_t* codes, std::size_t length,
-                                              Out* out, std::size_t most) {
+std::size_t Ucs2ToUtf8Transform::convertCodes(const std::uint32_t* codes, std::size_t length,
+                                              char* out, std::size_t most) {
     std::size_t done = 0;
     for (std::size_t i = 0; i < length;) {
-        if (length - i >= octets::kBlock && most - done >= octets::kBlock &&
-            octets::blockFits(codes + i, 0x7F)) {
-            octets::narrow(out + done, codes + i, octets::kBlock);
-            i += octets::kBlock;
-            done += octets::kBlock;
-            continue;
-        }
+        utf8kernel::Encoding run{codes + i, codes + length, out + done, out + most};
+        utf8kernel::kernel().encode(run);
+        i = static_cast<std::size_t>(run.in - codes);
+        done = static_cast<std::size_t>(run.out - out);
+        if (i == length)
+            break;
         std::uint32_t code = codes[i++];
         if (utf16::isHighSurrogate(code)) {
             if (i == length) {
@@ -96,8 +94,5 @@ octets::Few Ucs2ToUtf8Transform::encode(std::uint32_t code) {
     markExceptionOccurred();
     return kReplacement;
 }
-
-template std::size_t Ucs2ToUtf8Transform::convert(char*, std::size_t);
-template std::size_t Ucs2ToUtf8Transform::convert(std::uint32_t*, std::size_t);
 
 }  // namespace plr

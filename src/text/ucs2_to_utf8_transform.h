@@ -8,12 +8,11 @@ namespace plr {
 class Ucs2ToUtf8Transform : public OctetStage<Ucs2ToUtf8Transform> {
   public:
     void reset() override;
-    template <class Out>
-    std::size_t convert(Out* out, std::size_t most);
+    using OctetStage::convert;
+    std::size_t convert(char* out, std::size_t most);
 
   private:
-    template <class Out>
-    std::size_t convertBlock(const std::uint32_t* codes, std::size_t length, Out* out,
+    std::size_t convertCodes(const std::uint32_t* codes, std::size_t length, char* out,
                              std::size_t most);
     // One character, from held_ on, goes to rest_.
     void convertHeld();

@@ -15,7 +15,7 @@ constexpr bool isLowSurrogate(std::uint32_t code) noexcept {
     return code >> 10 == 0xDC00 >> 10;
 }
 constexpr bool isPair(std::uint32_t code) noexcept {
-    return isHighSurrogate(code >> 16) && isLowSurrogate(code & 0xFFFF);
+    return (code & 0xFC00FC00) == 0xD800DC00;
 }
 constexpr std::uint32_t pairOf(std::uint32_t high, std::uint32_t low) noexcept {
     return high << 16 | low;

@@ -4,14 +4,17 @@
 #include <cstdint>
 #include <span>
 
+#include "src/text/utf8_kernel.h"
+
 namespace plr {
 
 // Reads UTF-8 from memory, as units and pairs (utf16.h). What is well-formed is table 3-7
 // of the Unicode standard; each maximal subpart of what is not becomes one U+FFFD.
 class Utf8Decoder {
   public:
-    explicit Utf8Decoder(std::span<const unsigned char> octets) noexcept
-        : begin_(octets.data()), next_(begin_), end_(begin_ + octets.size()) {}
+    explicit Utf8Decoder(std::span<const unsigned char> octets,
+                         const utf8kernel::Kernel& kernel = utf8kernel::kernel()) noexcept
+        : kernel_(kernel), begin_(octets.data()), next_(begin_), end_(begin_ + octets.size()) {}
 
     // Delivers up to `most` codes; returns how many. `atEnd`: no octets follow; a sequence
     // that is cut is ill-formed. Otherwise it is left alone.
@@ -25,12 +28,12 @@ class Utf8Decoder {
     [[nodiscard]] bool isMarked() const noexcept { return marked_; }
 
   private:
-    std::uint32_t* decodeRun(std::uint32_t* out, const std::uint32_t* outEnd) noexcept;
     bool decodeOne(std::uint32_t& out, bool atEnd) noexcept;
     [[nodiscard]] std::size_t left() const noexcept {
         return static_cast<std::size_t>(end_ - next_);
     }
 
+    const utf8kernel::Kernel& kernel_;
     const unsigned char* begin_;
     const unsigned char* next_;
     const unsigned char* end_;
