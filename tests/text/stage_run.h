@@ -16,8 +16,12 @@ using Codes = std::vector<std::uint32_t>;
 // A source of any codes, one by one.
 class CodeSource final : public TextTransform {
   public:
-    explicit CodeSource(Codes codes) : codes_(std::move(codes)) {}
+    explicit CodeSource(Codes codes = {}) : codes_(std::move(codes)) {}
 
+    void setCodes(Codes codes) {
+        codes_ = std::move(codes);
+        pulled_ = 0;
+    }
     [[nodiscard]] std::size_t pulled() const { return pulled_; }
     std::uint32_t nextCode() override {
         return pulled_ == codes_.size() ? kEnd : codes_[pulled_++];
@@ -30,7 +34,7 @@ class CodeSource final : public TextTransform {
 
 // All codes of a stage, read in runs of `run`; of one that never ends, many.
 inline Codes drain(TextTransform& stage, std::size_t run = 1) {
-    constexpr std::size_t kMany = 100'000;
+    constexpr std::size_t kMany = 1'000'000;
     Codes all;
     Codes codes(run);
     for (std::size_t got = 1; got != 0 && all.size() < kMany;) {
