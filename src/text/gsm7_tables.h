@@ -25,13 +25,15 @@ using Characters = std::array<char16_t, 256>;
 
 // What senders write: the code of a UTF-16 unit, with kEscaped if it goes behind the
 // escape; kUnknown is that of a unit without one. Units with a code stand in
-// few pages of 64, which all tables number alike; page 0 has none.
+// few pages of 64, which all tables number alike; page 0 has none, and the next four are
+// those of Latin-1.
 inline constexpr std::uint16_t kEscaped = kEscape << 8;
-inline constexpr std::uint16_t kUnknown = 0x8000 | kReplacement;
+inline constexpr std::uint16_t kUnknownBit = 0x8000;
+inline constexpr std::uint16_t kUnknown = kUnknownBit | kReplacement;
 
 struct PageNumbers {
-    std::array<std::uint8_t, 0x10000 / 64> of{};  // by unit / 64
-    std::uint8_t count = 1;
+    std::array<std::uint8_t, 0x10000 / 64> of{1, 2, 3, 4};  // by unit / 64
+    std::uint8_t count = 5;
 
     constexpr PageNumbers() {
         for (const auto& tables : {kAlphabets, kExtensions})
@@ -52,6 +54,11 @@ using Codes = std::array<std::uint16_t, kPages.count * std::size_t{64}>;
 [[nodiscard]] inline std::uint16_t codeOf(const Codes& codes, std::uint32_t character) noexcept {
     const std::uint32_t unit = std::min<std::uint32_t>(character, 0xFFFF);
     return codes[kPages.of[unit / 64] * std::size_t{64} + unit % 64];
+}
+
+// The same for a character below 0x100.
+[[nodiscard]] inline std::uint16_t latinCodeOf(const Codes& codes, std::uint32_t unit) noexcept {
+    return codes[kPages.of[0] * std::size_t{64} + unit];
 }
 
 }  // namespace plr::gsm7

@@ -1,8 +1,9 @@
 #pragma once
 
 #include <algorithm>
+#include <span>
 
-#include "plr/text/octet_source_buffer.h"
+#include "src/text/octet_pull.h"
 #include "src/text/stage.h"
 
 // The stages that pack septets into octets and unpack them, see TextConverter::Conversion.
@@ -11,77 +12,46 @@
 // bits, 8 septets or 7 octets. Hot paths: bench/text_pelorin.cpp.
 namespace plr {
 
-// Bits that were read and are still to be delivered, at most 7 between two calls. A length
-// below zero: so many of the next bits are dropped.
-struct HeldBits {
-    std::uint64_t bits = 0;
-    int length = 0;
-};
-
-// 3GPP TS 23.038, 6.1.2: the first bit is the lowest.
-struct LowBitFirst {
-    static void add(HeldBits& held, std::uint64_t value, int width) noexcept {
-        held.bits |= held.length < 0 ? value >> -held.length : value << held.length;
-        held.length += width;
-    }
-    static std::uint32_t take(HeldBits& held, int width) noexcept {
-        const std::uint64_t taken = held.bits & ((std::uint64_t{1} << width) - 1);
-        held.bits >>= width;
-        held.length -= width;
-        return static_cast<std::uint32_t>(taken);
-    }
-    // Where the `width` bits of part `i` of a block stand in it.
-    static constexpr int shiftOf(int i, int width) noexcept { return i * width; }
-};
-
-// 3GPP2 C.S0015: the first bit is the highest. What was taken stays above those held.
-struct HighBitFirst {
-    static void add(HeldBits& held, std::uint64_t value, int width) noexcept {
-        held.bits = held.bits << width | value;
-        held.length += width;
-    }
-    static std::uint32_t take(HeldBits& held, int width) noexcept {
-        held.length -= width;
-        const std::uint64_t mask = (std::uint64_t{1} << width) - 1;
-        return static_cast<std::uint32_t>(held.bits >> held.length & mask);
-    }
-    static constexpr int shiftOf(int i, int width) noexcept { return 56 - (i + 1) * width; }
-};
-
 // Takes codes of `kIn` bits and delivers codes of `kOut` bits, septets and octets.
+// `Order`: of the bits in an octet, see septet_stages.cpp.
 template <class Derived, class Order, int kIn, int kOut>
 class BitStage : public OctetStage<Derived> {
   public:
-    std::size_t convert(std::uint32_t* out, std::size_t most) { return convertTo(out, most); }
-    std::size_t convert(char* out, std::size_t most) { return convertTo(out, most); }
+    using OctetStage<Derived>::convert;
+    std::size_t convert(char* out, std::size_t most);
     void reset() final;
 
-    // At the end, before what is held is filled up to an octet.
+    // At the end, before what is held is filled up to an octet: may add to it.
     void addPadding() noexcept {}
 
   protected:
+    // Bits that were read and are still to be delivered, at most 7 between two calls. A
+    // length below zero: so many of the next bits are dropped.
+    struct Held {
+        std::uint64_t bits = 0;
+        int length = 0;
+    };
+
     // `offset`: of the first bit that is delivered, from the first of the source.
     explicit BitStage(int offset) noexcept : start_{0, -offset}, held_(start_) {}
 
-    [[nodiscard]] HeldBits& held() noexcept { return held_; }
+    [[nodiscard]] Held& held() noexcept { return held_; }
     // The last code that was taken; 0 before the first.
     [[nodiscard]] std::uint32_t last() const noexcept { return last_; }
 
   private:
     [[nodiscard]] std::size_t neededFor(std::size_t codes) const noexcept;
-    template <class Out>
-    std::size_t convertTo(Out* out, std::size_t most);
-    template <class Out>
-    std::size_t convertOctets(OctetSourceBuffer& octets, Out* out, std::size_t most);
-    template <class In, class Out>
-    std::size_t regroup(const In* in, std::size_t length, Out* out, std::size_t most);
-    template <class Out>
-    std::size_t finish(Out* out);
+    std::span<const unsigned char> take(std::size_t most, OctetBuffer& buffer);
+    std::size_t regroup(std::span<const unsigned char> in, char* out, std::size_t most);
+    std::size_t finish(char* out);
 
-    const HeldBits start_;
-    HeldBits held_;
+    const Held start_;
+    Held held_;
     std::uint32_t last_ = 0;
 };
+
+struct LowBitFirst;
+struct HighBitFirst;
 
 class SmsUnpacker final : public BitStage<SmsUnpacker, LowBitFirst, 8, 7> {
   public:

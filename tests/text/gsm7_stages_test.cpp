@@ -44,38 +44,19 @@ Codes codesOf(std::int32_t code) {
     return septet > 0xFF ? Codes{kEscape, septet & 0x7F} : Codes{septet};
 }
 
-// One stage over many short inputs.
-class Converter {
-  public:
-    explicit Converter(const StageOf& of) : stage_(makeStage(of.conversion, of.p, of.q)) {
-        stage_->setSource(&source_);
-        stage_->setCount(-1);
-    }
-    Made operator()(Codes input) {
-        stage_->reset();
-        source_.setCodes(std::move(input));
-        Codes codes = drain(*stage_);
-        return {std::move(codes), stage_->getExceptionStatus(), source_.pulled()};
-    }
-
-  private:
-    CodeSource source_;
-    std::unique_ptr<TextTransform> stage_;
-};
-
 void checkEveryUnit(int tables, int locking, int single) {
-    Converter encode({kUcs2ToGsm7, tables});
-    Converter decode({kGsm7ToUcs2, locking, single});
+    const StageOf encoder{kUcs2ToGsm7, tables};
+    const StageOf decoder{kGsm7ToUcs2, locking, single};
     for (std::uint32_t unit = 0; unit <= 0xFFFF; ++unit) {
         const std::int32_t code = find(static_cast<char16_t>(unit), locking, single);
         const Codes codes = codesOf(code);
         ASSERT_EQ(ucs2ToGsm7(unit, static_cast<Tables>(tables)), code) << unit;
-        ASSERT_EQ(encode({unit}), (Made{codes, code < 0, 1})) << unit;
+        ASSERT_EQ(make(encoder, {unit}), (Made{codes, code < 0, 1})) << unit;
         if (code >= 0) {
-            ASSERT_EQ(decode(codes), (Made{{unit}, false, codes.size()})) << unit;
+            ASSERT_EQ(make(decoder, codes), (Made{{unit}, false, codes.size()})) << unit;
         }
     }
-    EXPECT_EQ(encode({kGrin, 'a'}), (Made{{'?', 'a'}, true, 2}));
+    EXPECT_EQ(make(encoder, {kGrin, 'a'}), (Made{{'?', 'a'}, true, 2}));
     EXPECT_EQ(ucs2ToGsm7(kGrin, static_cast<Tables>(tables)), -1);
 }
 
@@ -94,14 +75,14 @@ TEST(Gsm7Stages, EveryUnitInEveryPairOfTables) {
 TEST(Gsm7Stages, EverySeptetInEveryPairOfTables) {
     for (int locking = -1; locking <= 4; ++locking)
         for (int single = -1; single <= 4; ++single) {
-            Converter decode({kGsm7ToUcs2, locking, single});
+            const StageOf decoder{kGsm7ToUcs2, locking, single};
             for (std::uint32_t septet = 0; septet < 0x80; ++septet) {
                 if (septet == kEscape)
                     continue;
                 const std::uint32_t plain = alphabetOf(locking)[septet];
                 const std::uint32_t shifted = extensionOf(single)[septet];
-                ASSERT_EQ(decode({septet}), (Made{{plain}, false, 1})) << septet;
-                ASSERT_EQ(decode({kEscape, septet, septet}),
+                ASSERT_EQ(make(decoder, {septet}), (Made{{plain}, false, 1})) << septet;
+                ASSERT_EQ(make(decoder, {kEscape, septet, septet}),
                           (Made{{shifted == ' ' ? plain : shifted, plain}, false, 3}))
                     << septet;
             }
@@ -191,18 +172,18 @@ Codes adn8Of(char16_t unit, int base) {
 
 TEST(AlphaIdentifierStages, EveryUnitWithSeveralBases) {
     for (const int base : {0, 0x0380, 0x0400, 0x0530, 0x2080, 0xFFC0, 0x1'0400, -0x40}) {
-        Converter encode({kUcs2ToAdn8, base});
-        Converter decode({kAdn8ToUcs2, base});
+        const StageOf encoder{kUcs2ToAdn8, base};
+        const StageOf decoder{kAdn8ToUcs2, base};
         for (std::uint32_t unit = 0; unit <= 0xFFFF; ++unit) {
             const Codes codes = adn8Of(static_cast<char16_t>(unit), base);
             const bool isLost = codes == Codes{'?'} && unit != '?';
-            ASSERT_EQ(encode({unit}), (Made{codes, isLost, 1})) << unit << " at " << base;
+            ASSERT_EQ(make(encoder, {unit}), (Made{codes, isLost, 1})) << unit << " at " << base;
             if (!isLost) {
-                ASSERT_EQ(decode(codes), (Made{{unit}, false, codes.size()}))
+                ASSERT_EQ(make(decoder, codes), (Made{{unit}, false, codes.size()}))
                     << unit << " at " << base;
             }
         }
-        EXPECT_EQ(encode({kGrin}), (Made{{'?'}, true, 1}));
+        EXPECT_EQ(make(encoder, {kGrin}), (Made{{'?'}, true, 1}));
     }
 }
 
