@@ -1,6 +1,6 @@
 // What a modem says, from its bytes to values: the same lines come out however
 // the bytes arrive, none is longer than promised, and whatever a line says is
-// read or refused.
+// read or refused, also a short message in two lines.
 
 #include <cstddef>
 #include <cstdint>
@@ -10,6 +10,7 @@
 
 #include "examples/line_splitter.h"
 #include "examples/radio_reports.h"
+#include "examples/sms_inbox.h"
 #include "plr/base/assert.h"
 
 namespace {
@@ -22,6 +23,22 @@ std::vector<radio::ModemLine> split(std::string_view input, std::size_t piece) {
     splitter.feed(input);
     splitter.finish();
     return lines;
+}
+
+void checkReading(const radio::Reading& reading) {
+    PLR_ASSERT(!reading.complaint || reading.path.empty(), "a complaint has a path");
+    PLR_ASSERT(!reading.value.to_string().empty(), "a value has no rendering");
+}
+
+void readMessages(const std::vector<radio::ModemLine>& lines) {
+    radio::SmsInbox inbox;
+    radio::PduLines joined([&inbox](const radio::ModemLine& line) {
+        const auto parsed = radio::parseAtLine(line.text);
+        if (parsed && radio::SmsInbox::isFor(*parsed))
+            checkReading(inbox.read(*parsed));
+    });
+    for (const auto& line : lines)
+        joined.feed(line);
 }
 
 }  // namespace
@@ -37,11 +54,9 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* bytes, std::size_t siz
                        line.cut == again[i].cut,
                    "the pieces change a line");
         PLR_ASSERT(line.text.size() <= radio::LineSplitter::kLongestLine, "a line is too long");
-        if (const auto parsed = radio::parseAtLine(line.text)) {
-            const auto reading = radio::readLine(*parsed);
-            PLR_ASSERT(!reading.complaint || reading.path.empty(), "a complaint has a path");
-            PLR_ASSERT(!reading.value.to_string().empty(), "a value has no rendering");
-        }
+        if (const auto parsed = radio::parseAtLine(line.text))
+            checkReading(radio::readLine(*parsed));
     }
+    readMessages(lines);
     return 0;
 }
