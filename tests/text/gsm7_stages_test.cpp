@@ -109,17 +109,22 @@ TEST(Gsm7Stages, WhatIsNoTextIsReplaced) {
     EXPECT_EQ(make({kAdn8ToUcs2, 0x400}, {kEscape, 0x81}), (Made{{0x401}, false, 2}));
 }
 
-// Runs of every length give the same, and read as far.
+// Runs of every length give the same, and read as far; also from memory.
 TEST(Gsm7Stages, RunsAreAsSingleCodes) {
     Codes units;
     for (std::uint32_t i = 0; i < 400; ++i)
         units.push_back(i % 7 == 0 ? 0x20AC : i % 50 == 0 ? 0x4E00 : 'a' + i % 26);
-    const Codes septets = make({kUcs2ToGsm7}, units).codes;
+    Codes codes = make({kUcs2ToGsm7}, units).codes;
+    codes.insert(codes.begin() + 100, {kEscape, kEscape, 0x90, kEscape, 0xFF, 'a'});
+    const std::string octets(codes.begin(), codes.end());
     for (const int limit : {0, 1, 2, 3, 17, 256, -1})
-        for (const std::size_t run : {2U, 3U, 5U, 64U, 1000U}) {
+        for (const std::size_t run : {1U, 2U, 3U, 5U, 64U, 1000U}) {
             EXPECT_EQ(make({kUcs2ToGsm7}, units, run, limit), make({kUcs2ToGsm7}, units, 1, limit));
-            EXPECT_EQ(make({kGsm7ToUcs2}, septets, run, limit),
-                      make({kGsm7ToUcs2}, septets, 1, limit));
+            for (const StageOf& decoder : {StageOf{kGsm7ToUcs2}, StageOf{kAdn8ToUcs2, 0x400}}) {
+                const Made expected = make(decoder, codes, 1, limit);
+                EXPECT_EQ(make(decoder, codes, run, limit), expected);
+                EXPECT_EQ(makeFromMemory(decoder, octets, run, limit), expected);
+            }
         }
 }
 
