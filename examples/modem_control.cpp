@@ -21,6 +21,8 @@ using plr::LogLevel;
 constexpr std::array kFirst = {"ATE0", "AT+CMEE=1", "AT+CREG=2", "AT+CMGF=0", "AT+CNMI=2,2"};
 constexpr std::array kQuestions = {"AT+CPIN?", "AT+CREG?", "AT+COPS?", "AT+CMGL=4", "AT+CSQ"};
 
+constexpr std::size_t kMostPduOctets = 12 + 164;  // SMSC and message (TS 24.011, 8.2.5)
+
 std::chrono::nanoseconds pauseAfter(unsigned failures) {
     static thread_local std::minstd_rand random{std::random_device()()};
     return plr::rest::pauseAfter(failures, {}, std::uniform_real_distribution<>()(random));
@@ -69,7 +71,7 @@ void ModemControl::sendMessage(std::string pdu, AtChannel::Handler onAnswer) {
     execute_wrapped([this, pdu = std::move(pdu), onAnswer = std::move(onAnswer)] {
         ownQueue_.assertCurrent();
         const auto octets = plr::parse_hex(pdu, plr::kHexWhitespaceNone);
-        if (octets.empty() || octets.size() < 2U + octets[0])
+        if (octets.empty() || octets.size() < 2U + octets[0] || octets.size() > kMostPduOctets)
             return onAnswer({"no PDU", {}});
         send_sync("AT+CMGS=" + std::to_string(octets.size() - 1 - octets[0]), onAnswer,
                   std::chrono::minutes(1), pdu);

@@ -10,6 +10,8 @@ namespace {
 
 using plr::LogLevel;
 
+constexpr std::size_t kMostParts = 255;  // of a message
+
 // TS 27.007, 8.3 and TS 31.101, 9.5.1: 4 to 8 digits.
 bool isPin(std::string_view text) {
     return text.size() >= 4 && text.size() <= 8 &&
@@ -83,7 +85,7 @@ void ModemRequests::enterPin_sync(const vox::object& pin, const Reply& reply) {
 void ModemRequests::sendMessages_sync(const vox::object& pdus, const Reply& reply) {
     const vox::array values(pdus);
     std::vector<std::string> texts;
-    for (std::size_t i = 0; values && i < values.count(); ++i)
+    for (std::size_t i = 0; values && values.count() <= kMostParts && i < values.count(); ++i)
         texts.emplace_back(vox::object(values[i]).text());
     sendFrom(modem_, std::move(texts), 0, answerWith(reply));
 }
