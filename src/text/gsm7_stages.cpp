@@ -111,11 +111,11 @@ std::size_t Gsm7Encoder<Lookup>::encode(char* out, std::span<const std::uint32_t
 template <class Lookup>
 std::size_t Gsm7Encoder<Lookup>::encodeOne(char* out) {
     std::uint32_t character = 0;
-    char codes[2];
+    char codes[2] = {};
     if (this->pull(&character, 1) == 0)
         return 0;
     if (encode(codes, {&character, 1}) == 2)
-        held_ = codes[1];
+        held_ = static_cast<unsigned char>(codes[1]);
     *out = codes[0];
     return 1;
 }

@@ -113,9 +113,10 @@ TEST(Gsm7Stages, WhatIsNoTextIsReplaced) {
 TEST(Gsm7Stages, RunsAreAsSingleCodes) {
     Codes units;
     for (std::uint32_t i = 0; i < 400; ++i)
-        units.push_back(i % 7 == 0 ? 0x20AC : i % 50 == 0 ? 0x4E00 : 'a' + i % 26);
+        units.push_back(i % 7 < 3 && i < 200 ? 0x20AC : i % 50 == 0 ? 0x4E00 : 'a' + i % 26);
     Codes codes = make({kUcs2ToGsm7}, units).codes;
     codes.insert(codes.begin() + 100, {kEscape, kEscape, 0x90, kEscape, 0xFF, 'a'});
+    codes.insert(codes.end() - 100, 0x80 + kEscape);
     const std::string octets(codes.begin(), codes.end());
     for (const int limit : {0, 1, 2, 3, 17, 256, -1})
         for (const std::size_t run : {1U, 2U, 3U, 5U, 64U, 1000U}) {
