@@ -131,22 +131,28 @@ PLR_AVX2_INLINE unsigned atLeast(__m128i octets, char least) {
 // the next block. False, with nothing converted, where it is not well-formed.
 PLR_AVX2_INLINE bool decodeWide(Decoding& run, unsigned& trails) {
     const __m128i octets = load(run.in);
-    if (maskOf(octets) == 0 && trails == 0) {
+    const unsigned above = maskOf(octets);  // 0x7F
+    if ((above | trails) == 0) {
         storeCodes(run.out, octetsAsUnits(octets));
         storeCodes(run.out + 8, octetsAsUnits(_mm_srli_si128(octets, 8)));
         run.in += kBlock;
         run.out += kBlock;
         return true;
     }
-    const unsigned leads = atLeast(octets, '\xC0');
+    const unsigned leads = atLeast(octets, '\xC2');
     const unsigned leadsOf4 = atLeast(octets, '\xF0');
-    const unsigned areTrails = maskOf(octets) & ~leads;
+    const unsigned areTrails = maskOf(_mm_cmpgt_epi8(_mm_set1_epi8('\xC0'), octets));
     const unsigned expected = trails | leads << 1 | atLeast(octets, '\xE0') << 2 | leadsOf4 << 3;
-    const unsigned neverLead = (leads & ~atLeast(octets, '\xC2')) | atLeast(octets, '\xF8');
+    if ((expected & 0xFFFF) != areTrails || (leads | areTrails) != above)
+        return false;
     Candidates low = unitsAt(run.in);
-    const __m256i high = leadsOf4 == 0 ? _mm256_setzero_si256() : pairsAt(run.in, low);
-    if ((expected & 0xFFFF) != areTrails || neverLead != 0 ||
-        _mm256_testz_si256(low.wrong, low.wrong) == 0)
+    __m256i high = _mm256_setzero_si256();
+    if (leadsOf4 != 0) {
+        if (atLeast(octets, '\xF8') != 0)
+            return false;
+        high = pairsAt(run.in, low);
+    }
+    if (_mm256_testz_si256(low.wrong, low.wrong) == 0)
         return false;
 
     const unsigned chosen = ~areTrails;
