@@ -71,6 +71,8 @@ CIRCULAR = "boost::circular_buffer"
 SPSC = "boost::lockfree::spsc_queue"
 SNPRINTF = "snprintf, in a loop"
 READ = "read, in a loop"
+ICU = "ICU"
+ICONV = "glibc iconv"
 
 
 def dispatch():
@@ -217,4 +219,31 @@ def bytes_():
                           (Bar((READ,), 1.0, "ahead"),), big_is_good=True)
 
 
-SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log, "timers": timers, "bytes": bytes_}
+def text():
+    def cells(case, letters, size, *peers):
+        programs = {OURS: "text_pelorin", ICU: "text_icu", ICONV: "text_iconv", TABLE: "text_loops"}
+        return {peer: Cell(programs[peer], (case, letters, size), "ns") for peer in (OURS, *peers)}
+
+    def measurement(what, letters, size, measured, bars=()):
+        named = {"message": "a message of 160", "mebibyte": "1 MiB"}[size]
+        return Measurement("text", f"{what}, {letters}, {named}", "ns a character", measured, bars)
+
+    for case, what, times in (("to_septets", "UTF-8 to septets", 3.0), ("from_septets", "septets to UTF-8", 2.0)):
+        for letters in ("ascii", "european", "extension"):
+            for size in ("message", "mebibyte"):
+                yield measurement(what, letters, size, cells(case, letters, size, ICU, TABLE),
+                                  (Bar((ICU,), times, f"at most {times:g} times"),))
+        yield measurement(f"{what}, a converter each", "european", "message",
+                          cells(f"{case}_built", "european", "message"))
+    for case, what in (("to_ucs2", "UTF-8 to UCS-2"), ("from_ucs2", "UCS-2 to UTF-8")):
+        for letters in ("ascii", "european", "korean", "emoji"):
+            for size, bar in (("message", Bar((ICONV,), 1.0, "ahead")),
+                              ("mebibyte", Bar((ICONV,), 1 / 3, "3 times faster"))):
+                yield measurement(what, letters, size, cells(case, letters, size, ICU, ICONV, TABLE), (bar,))
+    for size in ("message", "mebibyte"):
+        yield measurement("EUC-KR to UCS-2", "korean", size, cells("from_euc_kr", "korean", size, ICU, ICONV, TABLE),
+                          (Bar((ICU, ICONV), 1.0, "ahead of each"),))
+
+
+SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log, "timers": timers, "bytes": bytes_,
+          "text": text}
