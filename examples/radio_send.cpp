@@ -41,24 +41,22 @@ std::optional<Language> languageOf(const std::string& name) {
     return std::nullopt;
 }
 
-std::optional<Options> parse(std::vector<std::string> words) {
+std::optional<Options> parse(const std::vector<std::string>& words) {
     Options options;
-    while (!words.empty() && words[0].starts_with("--")) {
-        std::size_t used = 1;
-        if (words[0] == "--print") {
+    std::size_t i = 0;
+    for (; i < words.size() && words[i].starts_with("--"); ++i) {
+        const bool takesName = words[i] == "--language" && i + 1 < words.size();
+        if (words[i] == "--print")
             options.print = true;
-        } else if (words[0] == "--language" && words.size() > 1 && languageOf(words[1])) {
-            options.languages.push_back(*languageOf(words[1]));
-            used = 2;
-        } else {
+        else if (const auto language = takesName ? languageOf(words[++i]) : std::nullopt)
+            options.languages.push_back(*language);
+        else
             return std::nullopt;
-        }
-        words.erase(words.begin(), words.begin() + static_cast<std::ptrdiff_t>(used));
     }
-    if (words.size() != 2)
+    if (words.size() != i + 2)
         return std::nullopt;
-    options.number = words[0];
-    options.text = words[1];
+    options.number = words[i];
+    options.text = words[i + 1];
     return options;
 }
 
@@ -117,8 +115,7 @@ int main(int argc, char** argv) {
     if (pdus.empty())
         return fail("no number, or a text of too many parts");
     if (options->print) {
-        for (const std::string& pdu : pdus)
-            radio::say(pdu);
+        std::ranges::for_each(pdus, radio::say);
         return 0;
     }
     const auto answer = request(pdus);

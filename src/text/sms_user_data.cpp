@@ -90,8 +90,6 @@ void appendText(std::string_view text, const SmsEncoding& encoding, SmsPart& par
         length = header + octets.size();
     }
     part.userData.insert(part.userData.end(), octets.begin(), octets.end());
-    if (encoding.encoding == MessageEncoding::kGSM7)
-        part.userData.resize(octetsOver(length));  // of no text there are no fill bits
     part.length = static_cast<std::uint8_t>(length);
 }
 

@@ -26,6 +26,7 @@ TEST(Ussd, IsReadByCodingScheme) {
     } rows[] = {
         {"septets", "aa180c3602", 0x0F, "*100#", ""},
         {"CR in the last octet", "31d98c56b3dd1a", 0x01, "1234567", "en"},
+        {"no CR in the last octet", "611a", 0x0F, "a4", ""},
         {"@ in the last octet", "31d98c56b3dd00", 0x01, "1234567@", "en"},
         {"CR behind the last octet", "31d98c56b3dd1a0d", 0x20, "1234567\r\r", "cs"},
         {"nothing", "", 0x0F, "", ""},

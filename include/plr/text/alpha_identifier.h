@@ -22,7 +22,7 @@
 namespace plr {
 
 // The name, in UTF-8; nothing where the length goes beyond the octets. `octets`: from outside.
-// What cannot be converted is replaced, see TextConverter::Conversion.
+// What cannot be converted is replaced, see TextConverter::Conversion; U+FFFF ends a name.
 [[nodiscard]] PLR_EXPORT std::optional<std::string> decodeAlphaIdentifier(
     std::span<const std::uint8_t> octets);
 
