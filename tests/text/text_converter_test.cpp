@@ -41,7 +41,7 @@ TEST(TextConverter, ReadsUpToTheEndOfItsSource) {
 
 TEST(TextConverter, LongTextsComeWholeAndInMemoryOfTheirSize) {
     std::string octets;
-    for (int i = 0; i < 300000; ++i)
+    for (unsigned i = 0; i < 300000; ++i)
         octets += static_cast<char>(i * i / 7);
     for (const std::size_t length : {1023U, 1024U, 1025U, 300000U}) {
         const std::string part = octets.substr(0, length);

@@ -22,6 +22,9 @@ inline PLR_EXPORT uint32_t PelorinRingBufferInsertRaw(PelorinRingBuffer* ring, c
     const uint32_t toStorageEnd = ring->capacity - write;
     if (__builtin_expect(length > room, 0))
         length = room;
+    // memcpy may not be given null, which an empty storage is.
+    if (__builtin_expect(length == 0, 0))
+        return 0;
     // Deliberate: one piece only, although there may be room at the front.
     if (__builtin_expect(length > toStorageEnd, 0))
         length = toStorageEnd;
@@ -41,6 +44,8 @@ inline PLR_EXPORT uint32_t PelorinRingBufferExtractRaw(PelorinRingBuffer* ring, 
     } else {
         ring->readCount += most;
     }
+    if (__builtin_expect(most == 0, 0))
+        return 0;
     if (__builtin_expect(most <= toStorageEnd, 1)) {
         memcpy(destination, ring->buffer + read, most);
     } else {
