@@ -10,7 +10,7 @@
 // bench/bytes_pelorin.cpp. The usual case is left to the branch predictor, so that one
 // call's arithmetic does not wait for that of the call before.
 #ifdef __cplusplus
-#define PELORIN_BYTES_AT(pointer) static_cast<uint8_t*>(pointer)
+#define PELORIN_BYTES_AT(pointer) (static_cast<uint8_t*>(pointer))
 #else
 #define PELORIN_BYTES_AT(pointer) ((uint8_t*)(pointer))
 #endif
