@@ -148,7 +148,16 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
 
 pelorin_component(qf_core LEVEL 1 LIBRARY platform
   HEADERS
+    platform/include/qf/base.h
+    platform/include/qf/collection.h
+    platform/include/qf/data.h
+    platform/include/qf/date.h
+    platform/include/qf/error.h
+    platform/include/qf/preferences.h
     platform/include/qf/qf.h
+    platform/include/qf/scalar.h
+    platform/include/qf/string.h
+    platform/include/qf/vox_bridge.h
   SOURCES
     platform/linux/qf/value.cpp
     platform/linux/qf/value.h)
