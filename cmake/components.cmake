@@ -21,6 +21,8 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/include/dispatch/calendar.h
     platform/include/dispatch/dispatch.h
     platform/include/dispatch/group.h
+    platform/include/dispatch/main_queue.h
+    platform/include/dispatch/pump.h
     platform/include/dispatch/queue.h
     platform/include/dispatch/source.h
     platform/include/dispatch/time.h
@@ -37,6 +39,9 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/poller.h
     platform/linux/dispatch/pool.cpp
     platform/linux/dispatch/pool.h
+    platform/linux/dispatch/pump.cpp
+    platform/linux/dispatch/pump_core.cpp
+    platform/linux/dispatch/pump_core.h
     platform/linux/dispatch/queue.cpp
     platform/linux/dispatch/queue_core.cpp
     platform/linux/dispatch/queue_core.h
@@ -259,6 +264,8 @@ pelorin_component(concurrency_core LEVEL 2 LIBRARY pelorin
   HEADERS
     include/plr/concurrency/async_dispatch_callback.h
     include/plr/concurrency/clock.h
+    include/plr/concurrency/monitor.h
+    include/plr/concurrency/priority_queue.h
     include/plr/concurrency/qf_shared_ref.h
     include/plr/concurrency/queue_role.h
     include/plr/concurrency/shared_ref.h
@@ -266,7 +273,9 @@ pelorin_component(concurrency_core LEVEL 2 LIBRARY pelorin
     include/plr/concurrency/while_alive.h
   SOURCES
     src/concurrency/async_dispatch_callback.cpp
-    src/concurrency/clock.cpp)
+    src/concurrency/clock.cpp
+    src/concurrency/monitor.cpp
+    src/concurrency/priority_queue.cpp)
 
 pelorin_component(log_values LEVEL 2 LIBRARY pelorin
   HEADERS
@@ -281,12 +290,15 @@ pelorin_component(log_values LEVEL 2 LIBRARY pelorin
     src/log/log_tag.cpp)
 
 pelorin_component(io LEVEL 2 LIBRARY pelorin
+  HEADERS
+    include/plr/io/memory_mapped_file.h
   SOURCES
     src/io/descriptor.cpp
     src/io/descriptor_transport.cpp
     src/io/descriptor_transport.h
     src/io/fd_transport.cpp
     src/io/file_transport.cpp
+    src/io/memory_mapped_file.cpp
     src/io/ring_buffer.cpp
     src/io/secret_mask.cpp
     src/io/secret_mask.h
@@ -378,6 +390,27 @@ pelorin_component(ipc_assertion LEVEL 3 LIBRARY pelorin
   SOURCES
     src/ipc/result_errors.cpp
     src/ipc/vox_drosk_assertion.cpp)
+
+pelorin_component(qf_adapters LEVEL 3 LIBRARY pelorin
+  HEADERS
+    include/plr/ob/auto_pool.h
+    include/plr/qf/assign.h
+    include/plr/qf/assign_loosely.h
+    include/plr/qf/convert_copy.h
+    include/plr/qf/dict_adapter.h
+    include/plr/qf/make_qf_string.h
+    include/plr/qf/map_adapter.h
+    include/plr/qf/plist_adapter.h
+    include/plr/qf/show.h
+  SOURCES
+    src/ob/auto_pool.cpp
+    src/qf/assign.cpp
+    src/qf/assign_loosely.cpp
+    src/qf/convert_copy.cpp
+    src/qf/dict_adapter.cpp
+    src/qf/map_adapter.cpp
+    src/qf/plist_adapter.cpp
+    src/qf/show.cpp)
 
 pelorin_component(format_log LEVEL 4 LIBRARY pelorin
   HEADERS
@@ -582,5 +615,6 @@ pelorin_component(umbrella LEVEL 9 LIBRARY pelorin
     include/plr/ipc.h
     include/plr/log.h
     include/plr/plr.h
+    include/plr/qf.h
     include/plr/rest.h
     include/plr/text.h)

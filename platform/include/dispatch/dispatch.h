@@ -4,6 +4,8 @@
 #include "dispatch/block.h"
 #include "dispatch/calendar.h"
 #include "dispatch/group.h"
+#include "dispatch/main_queue.h"
+#include "dispatch/pump.h"
 #include "dispatch/queue.h"
 #include "dispatch/source.h"
 #include "dispatch/time.h"

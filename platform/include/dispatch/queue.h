@@ -28,7 +28,8 @@
 //
 // A queue may have a target: its work then runs as part of the target's, so
 // that all queues with one target exclude each other, and suspending the target
-// suspends them. Queues without a target run on the pool at normal priority.
+// suspends them. Queues without a target run on the pool at normal priority, but
+// for those of pumps (pump.h), which a thread of the program runs.
 //
 // Work that blocks: a worker that waits in sync() or group::wait() tells the
 // pool, which replaces it; a pool whose workers all block elsewhere (in read(),
@@ -160,7 +161,8 @@ class queue {
     // Runs `work` on the calling thread when its turn has come, and returns its
     // result (move-only ones too): at once when the queue is idle, else after
     // everything queued before. Calling it from work of the same queue, or of
-    // one that targets it, stops the process with a message that names it.
+    // one that targets it, stops the process with a message that names it. On the
+    // queue of a pump (pump.h), or one that targets it, the pump's thread runs it.
     template <class Callable>
     auto sync(Callable&& work) const -> std::invoke_result_t<Callable&> {
         using Result = std::invoke_result_t<Callable&>;

@@ -186,19 +186,9 @@ item* pool::take(priority& level) noexcept {
 
 void pool::execute(item* work, priority level) noexcept {
     if (work->run == &queue_tag) {
-        queue_core* queue = queue_core::of(work);
         unsigned budget = kBatch;
-        switch (queue->drain(budget)) {
-            case queue_core::outcome::idle:
-                queue->release_reference();
-                return;
-            case queue_core::outcome::more:
-                queue->activate();
-                return;
-            case queue_core::outcome::parked:
-            case queue_core::outcome::handed:
-                return;
-        }
+        queue_core::of(work)->run_owned(budget);
+        return;
     }
     frame here(queue_core::global(level));
     if (work->run == &embedded_tag) {

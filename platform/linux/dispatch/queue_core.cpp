@@ -86,10 +86,12 @@ void waiter::grant() noexcept {
 
 // ---- Life -------------------------------------------------------------------------
 
-queue_core* queue_core::create(std::string_view label, queue_core* target) {
+queue_core* queue_core::create(std::string_view label, queue_core* target,
+                               std::unique_ptr<pump_core> served) {
     void* memory = ::operator new(sizeof(queue_core) + label.size() + 1);
     const bool on_pool = !target || target->is_global();
-    auto* made = ::new (memory) queue_core(label, on_pool ? nullptr : target,
+    pump_core* const pump = on_pool ? served.release() : target->pump_;
+    auto* made = ::new (memory) queue_core(label, on_pool ? nullptr : target, pump,
                                            target ? target->level() : priority::normal, false);
     if (!on_pool)
         target->retain();
@@ -102,17 +104,17 @@ queue_core* queue_core::global(priority level) noexcept {
         auto* made = new queue_core*[3];
         for (unsigned i = 0; i < 3; ++i) {
             void* memory = ::operator new(sizeof(queue_core) + kLabels[i].size() + 1);
-            made[i] =
-                ::new (memory) queue_core(kLabels[i], nullptr, static_cast<priority>(i), true);
+            made[i] = ::new (memory)
+                queue_core(kLabels[i], nullptr, nullptr, static_cast<priority>(i), true);
         }
         return made;
     }();
     return queues[static_cast<unsigned>(level)];
 }
 
-queue_core::queue_core(std::string_view label, queue_core* target, priority level,
+queue_core::queue_core(std::string_view label, queue_core* target, pump_core* pump, priority level,
                        bool global) noexcept
-    : target_(target), priority_(level), global_(global) {
+    : target_(target), pump_(pump), priority_(level), global_(global) {
     place_.run = &queue_tag;
     place_.owner = this;
     char* text = reinterpret_cast<char*>(this + 1);
@@ -130,6 +132,8 @@ queue_core::~queue_core() {
     }
     if (target_)
         target_->release();
+    else
+        delete pump_;
 }
 
 void queue_core::release() noexcept {
@@ -174,7 +178,7 @@ void queue_core::activate() noexcept {
         return;
     if (target_)
         target_->push(&place_);
-    else
+    else if (!pump_ || !pump_->announce())
         pool::shared().submit(&place_, priority_);
 }
 
@@ -213,7 +217,7 @@ queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
                 return outcome::parked;
         }
         if (budget == 0) [[unlikely]] {
-            if (pool::shared().has_waiting_work()) {
+            if (pump_ || pool::shared().has_waiting_work()) {
                 head_ = work;
                 return outcome::more;
             }
@@ -261,15 +265,18 @@ bool queue_core::run_nested(item* work, unsigned& budget) noexcept {
         embedded->function(embedded);
         return true;
     }
-    queue_core* nested = of(work);
-    switch (nested->drain(budget)) {
+    return of(work)->run_owned(budget);
+}
+
+bool queue_core::run_owned(unsigned& budget) noexcept {
+    switch (drain(budget)) {
         case outcome::idle:
-            nested->release_reference();
+            release_reference();
             return true;
         case outcome::parked:
             return true;
         case outcome::more:
-            nested->activate();
+            activate();
             return true;
         case outcome::handed:
             return false;
@@ -294,6 +301,10 @@ bool queue_core::try_lock() noexcept {
 // Hot path when idle: one compare-exchange to enter and one to leave;
 // bench/dispatch_cases.h.
 void queue_core::run_sync(void (*function)(void*) noexcept, void* context) {
+    if (pump_) [[unlikely]] {
+        hand_over(function, context);
+        return;
+    }
     frame here(this);
     if (global_) {
         function(context);

@@ -2,10 +2,12 @@
 
 #include <atomic>
 #include <cstdint>
+#include <memory>
 #include <string_view>
 
 #include "dispatch/queue.h"
 #include "platform/linux/dispatch/io_watch.h"
+#include "platform/linux/dispatch/pump_core.h"
 #include "platform/linux/dispatch/spin_lock.h"
 
 // The state of one queue.
@@ -32,6 +34,10 @@
 // from it.
 //
 // A drainer owns the queue and all its targets; a sync() too.
+//
+// A queue whose last target is a pump's (dispatch/pump.h) is activated there instead
+// of in the pool. Only the thread that serves the pump ever owns it for running: a
+// sync() from another thread hands its work over, so no waiter stands in such lists.
 namespace dispatch::detail {
 
 // What `item::run` holds for items that are not closures. Never called.
@@ -44,6 +50,9 @@ struct waiter : item {
     waiter() noexcept { run = &waiter_tag; }
     void wait() noexcept;
     void grant() noexcept;
+    [[nodiscard]] bool is_granted() const noexcept {
+        return granted.load(std::memory_order_acquire) != 0;
+    }
 
     std::atomic<std::uint32_t> granted{0};
 };
@@ -72,7 +81,9 @@ class queue_core {
         handed,  // a waiter owns the queue and its targets now
     };
 
-    static queue_core* create(std::string_view label, queue_core* target);
+    // `served`: what runs the queue instead of the pool; for one without target.
+    static queue_core* create(std::string_view label, queue_core* target,
+                              std::unique_ptr<pump_core> served = nullptr);
     static queue_core* global(priority level) noexcept;
 
     // Global queues live for ever, and everybody shares them: they are not counted.
@@ -88,12 +99,17 @@ class queue_core {
     void resume() noexcept;
     // For the owner: runs items until one of the outcomes. `budget` counts down.
     outcome drain(unsigned& budget) noexcept;
-    // For the owner: on to the target or the pool.
+    // For the owner: drains, and passes on or gives up the ownership. Returns false
+    // when a waiter has taken over the targets' as well.
+    bool run_owned(unsigned& budget) noexcept;
+    // For the owner: on to the target, the pump or the pool.
     void activate() noexcept;
     // For whoever got outcome::idle.
     void release_reference() noexcept;
 
     [[nodiscard]] bool is_global() const noexcept { return global_; }
+    // Null for queues that end in the pool.
+    [[nodiscard]] pump_core* pump() const noexcept { return pump_; }
     [[nodiscard]] bool is_current() const noexcept;
     [[nodiscard]] const char* label() const noexcept {
         return reinterpret_cast<const char*>(this + 1);
@@ -101,6 +117,8 @@ class queue_core {
     [[nodiscard]] priority level() const noexcept { return priority_; }
     void set_specific(const void* key, void* value, void (*destructor)(void*));
     [[nodiscard]] void* get_specific(const void* key) const noexcept;
+    // Ends the process with a message that names the queue.
+    [[noreturn]] void stop(const char* why) const noexcept;
 
     // Whether something waits behind `running`.
     [[nodiscard]] bool has_behind(const item* running) const noexcept {
@@ -124,10 +142,12 @@ class queue_core {
         specific* next;
     };
 
-    queue_core(std::string_view label, queue_core* target, priority level, bool global) noexcept;
+    queue_core(std::string_view label, queue_core* target, pump_core* pump, priority level,
+               bool global) noexcept;
     ~queue_core();
 
     [[nodiscard]] bool try_lock() noexcept;
+    void hand_over(void (*function)(void*) noexcept, void* context) noexcept;
     void lock_from_here() noexcept;
     void wait_for_ownership() noexcept;
     void unlock_chain() noexcept;
@@ -136,11 +156,11 @@ class queue_core {
     [[nodiscard]] item* detach(item* first) noexcept;
     [[nodiscard]] item* take_after_stub() noexcept;
     [[nodiscard]] bool run_nested(item* work, unsigned& budget) noexcept;
-    [[noreturn]] void stop(const char* why) const noexcept;
 
     // Producers' line.
     std::atomic<item*> tail_{nullptr};
     queue_core* target_;
+    pump_core* pump_;                           // the last target's, which owns it
     place place_;                               // in the target's list, or the pool's
     std::atomic<std::uint32_t> references_{1};  // one for all handles, one while owned
     std::atomic<std::uint32_t> handles_{1};
