@@ -113,10 +113,17 @@ TEST(ObAutorelease, PoolsReleaseInnermostFirst) {
     ob_autorelease_pool_pop(inner);
     EXPECT_EQ(ob_get_reference_count(value), 1);
     EXPECT_EQ(ob_get_reference_count(number), 2);
-    static_cast<void>(ob_autorelease_pool_push());  // popped by the outer one
+    void* const left = ob_autorelease_pool_push();  // popped by the outer one
     ob_autorelease(ob_retain(number));
+    EXPECT_TRUE(ob_autorelease_pool_is_open(left));
     ob_autorelease_pool_pop(outer);
     EXPECT_EQ(ob_get_reference_count(number), 1);
+    void* const later = ob_autorelease_pool_push();
+    ob_autorelease(ob_retain(number));
+    EXPECT_FALSE(ob_autorelease_pool_is_open(left));
+    ob_autorelease_pool_pop(left);
+    EXPECT_EQ(ob_get_reference_count(number), 2) << "popped once already";
+    ob_autorelease_pool_pop(later);
     ob_release(value);
     std::jthread([number] { ob_autorelease(ob_retain(number)); }).join();
     EXPECT_EQ(ob_get_reference_count(number), 1) << "the thread's end releases";
@@ -129,6 +136,7 @@ TEST(ObObject, NullIsIgnoredButIsNoPool) {
     ob_release(nullptr);
     EXPECT_EQ(ob_get_reference_count(nullptr), 0);
     EXPECT_DEATH(ob_autorelease_pool_pop(nullptr), "autorelease pool");
+    EXPECT_DEATH(ob_autorelease_pool_pop(reinterpret_cast<void*>(1000)), "autorelease pool");
 }
 
 }  // namespace

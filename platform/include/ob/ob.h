@@ -32,10 +32,13 @@ PLR_EXPORT long ob_get_reference_count(const void* object);
 // Releases `object` once the innermost pool of this thread is popped; without a
 // pool, when the thread ends.
 PLR_EXPORT void* ob_autorelease(void* object);
-// Pools nest. Popping one pops those pushed after it, too. What is popped must
-// have been pushed by the same thread, which is checked as far as possible.
+// Pools nest. Popping one pops those pushed after it, too; popping one of these
+// later does nothing. What is popped must have been pushed by the same thread,
+// which is checked as far as possible.
 PLR_EXPORT void* ob_autorelease_pool_push(void);
 PLR_EXPORT void ob_autorelease_pool_pop(void* pool);
+// Whether a pool of this thread has not been popped yet.
+PLR_EXPORT bool ob_autorelease_pool_is_open(const void* pool);
 
 // Text in UTF-8, which is not checked, kept with its length and a NUL behind it.
 PLR_EXPORT ObString* ob_string_create(const char* utf8);

@@ -1,5 +1,6 @@
 #include "platform/linux/ob/object.h"
 
+#include <algorithm>
 #include <charconv>
 #include <vector>
 
@@ -25,12 +26,43 @@ std::string toText(Number value) {
     return {text, end};
 }
 
-// What this thread's pools have to release; a pool is its first index.
+// This thread's pools, which are numbered from 1 as they are pushed, and what
+// they have to release.
 class pools {
   public:
     ~pools() { release_from(0); }
     void add(void* object) { objects_.push_back(object); }
-    [[nodiscard]] std::size_t size() const noexcept { return objects_.size(); }
+
+    std::size_t push() {
+        open_.push_back({++last_, objects_.size()});
+        return last_;
+    }
+    [[nodiscard]] bool was_pushed(std::size_t number) const noexcept { return number - 1 < last_; }
+    [[nodiscard]] bool is_open(std::size_t number) const noexcept {
+        const auto at = find(number);
+        return at != open_.end() && at->number == number;
+    }
+    void pop(std::size_t number) noexcept {
+        if (!is_open(number))
+            return;
+        const auto at = find(number);
+        const std::size_t first = at->first;
+        open_.erase(at, open_.end());
+        release_from(first);
+    }
+
+  private:
+    struct pool {
+        std::size_t number;
+        std::size_t first;  // index of its first object
+    };
+
+    // The first one not older than `number`.
+    [[nodiscard]] std::vector<pool>::const_iterator find(std::size_t number) const noexcept {
+        return std::lower_bound(
+            open_.begin(), open_.end(), number,
+            [](const pool& one, std::size_t than) { return one.number < than; });
+    }
     void release_from(std::size_t first) noexcept {
         while (objects_.size() > first) {
             void* const last = objects_.back();
@@ -39,8 +71,9 @@ class pools {
         }
     }
 
-  private:
+    std::vector<pool> open_;  // in the order of their numbers
     std::vector<void*> objects_;
+    std::size_t last_ = 0;  // number of the pool pushed last
 };
 
 pools& threadsPools() {
@@ -98,15 +131,19 @@ void* ob_autorelease(void* object) {
     return object;
 }
 
-// The pool is its index plus one, so that no pool is null.
+// A pool is its number.
 void* ob_autorelease_pool_push() {
-    return reinterpret_cast<void*>(threadsPools().size() + 1);
+    return reinterpret_cast<void*>(threadsPools().push());
 }
 
 void ob_autorelease_pool_pop(void* pool) {
-    const auto first = reinterpret_cast<std::size_t>(pool) - 1;
-    PLR_ASSERT(first <= threadsPools().size(), "an autorelease pool that this thread has not");
-    threadsPools().release_from(first);
+    const auto number = reinterpret_cast<std::size_t>(pool);
+    PLR_ASSERT(threadsPools().was_pushed(number), "an autorelease pool that this thread has not");
+    threadsPools().pop(number);
+}
+
+bool ob_autorelease_pool_is_open(const void* pool) {
+    return threadsPools().is_open(reinterpret_cast<std::size_t>(pool));
 }
 
 ObString* ob_string_create(const char* utf8) {
