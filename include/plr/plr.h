@@ -7,5 +7,6 @@
 #include "plr/log.h"
 #include "plr/log/vox_log_server.h"
 #include "plr/log/vox_logger.h"
+#include "plr/qf.h"
 #include "plr/rest.h"
 #include "plr/text.h"

@@ -51,6 +51,8 @@ class SharedRef {
     // A loan; null allowed.
     [[nodiscard]] T* get() const noexcept { return reference_; }
     explicit operator bool() const noexcept { return reference_ != nullptr; }
+    // Gives the reference to the caller, who releases it; null afterwards.
+    [[nodiscard]] T* detach() noexcept { return std::exchange(reference_, nullptr); }
 
   private:
     static T* retained(T* reference) {
