@@ -203,7 +203,9 @@ TEST_F(VoxPolicyOfRealClients, DecidesByUserAndByEveryGroup) {
     EXPECT_EQ(byEndpoint({kStranger}, endpoint), kRefused);
     EXPECT_EQ(service.counts().refused_by_policy, 2u);
     EXPECT_EQ(service.counts().clients_accepted, 6u);
-    EXPECT_EQ(reports.count("(uid 12346): the policy does not let it in"), 2u);
+    // A client sees that it is refused before the listener reports it.
+    EXPECT_TRUE(eventually(
+        [&] { return reports.count("(uid 12346): the policy does not let it in") == 2; }));
 }
 
 TEST_F(VoxPolicyOfRealClients, WithoutOneNamesAreForThisUserAndEndpointsForTheirHolders) {
