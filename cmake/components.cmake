@@ -57,6 +57,19 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/timer_wheel.cpp
     platform/linux/dispatch/timer_wheel.h)
 
+# Need GLib and libsystemd, which their users bring; no other header includes them.
+pelorin_component(dispatch_loops LEVEL 1 LIBRARY platform
+  HEADERS
+    platform/include/dispatch/glib.h
+    platform/include/dispatch/sd_event.h)
+
+pelorin_component(platform_common LEVEL 1 LIBRARY platform
+  SOURCES
+    platform/linux/common/description.cpp
+    platform/linux/common/description.h
+    platform/linux/common/key_index.cpp
+    platform/linux/common/key_index.h)
+
 pelorin_component(vox_values LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/vox/value.h

@@ -5,8 +5,9 @@ A C++ header must be a whole translation unit for g++ and clang++ with the
 project's warnings; one that C programs may include must be one for C11 too.
 
 usage: check_headers.py PROJECT [--cxx COMPILER]... [--cc COMPILER]...
-                        [--c-header FILE]... HEADER...
-HEADER and --c-header are paths inside PROJECT. Exit status 1 on any finding.
+                        [--include FOLDER]... [--c-header FILE]... HEADER...
+HEADER and --c-header are paths inside PROJECT; --include adds a folder of another
+library. Exit status 1 on any finding.
 """
 
 import argparse
@@ -19,11 +20,11 @@ WARNINGS = ["-Wall", "-Wextra", "-Wpedantic", "-Wshadow", "-Wconversion", "-Werr
 FOLDERS = ["include", "platform/include", "."]
 
 
-def command(compiler, language, header):
+def command(compiler, language, header, libraries):
     standard = {"c": ["-std=c11"], "c++": ["-std=c++20", "-Wold-style-cast"]}[language]
     # The header comes in by -include, so that "#pragma once" stands in no main file.
     return [compiler, *standard, *WARNINGS, "-fsyntax-only", *(f"-I{f}" for f in FOLDERS),
-            "-x", language, "-include", header, os.devnull]
+            *(part for folder in libraries for part in ("-isystem", folder)), "-x", language, "-include", header, os.devnull]
 
 
 def compile_alone(project, arguments):
@@ -37,11 +38,12 @@ def main():
     parser.add_argument("--cxx", action="append", default=[])
     parser.add_argument("--cc", action="append", default=[])
     parser.add_argument("--c-header", action="append", default=[])
+    parser.add_argument("--include", action="append", default=[])
     parser.add_argument("headers", nargs="*")
     options = parser.parse_intermixed_args()
 
-    commands = [command(cxx, "c++", h) for h in options.headers for cxx in options.cxx]
-    commands += [command(cc, "c", h) for h in options.c_header for cc in options.cc]
+    commands = [command(cxx, "c++", h, options.include) for h in options.headers for cxx in options.cxx]
+    commands += [command(cc, "c", h, []) for h in options.c_header for cc in options.cc]
     with concurrent.futures.ThreadPoolExecutor(os.cpu_count()) as pool:
         failures = [f for f in pool.map(lambda c: compile_alone(options.project, c), commands) if f]
     print(*failures, f"{len(commands) - len(failures)} of {len(commands)} compile alone", sep="\n")

@@ -25,8 +25,10 @@ LISTED_FOLDERS = ("include", "src", "platform")
 # Folders of the system's own headers; any other name with a slash is a library.
 SYSTEM_FOLDERS = ("sys/", "linux/", "arpa/", "net/", "netinet/", "bits/")
 
-# Optional headers for users of another library, and the folder that one has.
-FRONTS = {"include/plr/log/fmt.h": "fmt/"}
+# Optional headers for users of another library, and how the names of its headers start.
+FRONTS = {"include/plr/log/fmt.h": "fmt/",
+          "platform/include/dispatch/glib.h": "glib",
+          "platform/include/dispatch/sd_event.h": "systemd/"}
 
 
 class Entry(NamedTuple):
