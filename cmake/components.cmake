@@ -70,6 +70,13 @@ pelorin_component(platform_common LEVEL 1 LIBRARY platform
     platform/linux/common/key_index.cpp
     platform/linux/common/key_index.h)
 
+pelorin_component(platform_common LEVEL 1 LIBRARY platform
+  SOURCES
+    platform/linux/common/description.cpp
+    platform/linux/common/description.h
+    platform/linux/common/key_index.cpp
+    platform/linux/common/key_index.h)
+
 pelorin_component(vox_values LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/vox/value.h
@@ -87,8 +94,6 @@ pelorin_component(vox_values LEVEL 1 LIBRARY platform
     platform/linux/vox/encode.cpp
     platform/linux/vox/equal.cpp
     platform/linux/vox/error.cpp
-    platform/linux/vox/key_index.cpp
-    platform/linux/vox/key_index.h
     platform/linux/vox/utf8.cpp
     platform/linux/vox/value.cpp
     platform/linux/vox/value_layout.h)
@@ -177,8 +182,25 @@ pelorin_component(qf_core LEVEL 1 LIBRARY platform
     platform/include/qf/string.h
     platform/include/qf/vox_bridge.h
   SOURCES
+    platform/linux/qf/array.cpp
+    platform/linux/qf/data.cpp
+    platform/linux/qf/date.cpp
+    platform/linux/qf/date_formatter.cpp
+    platform/linux/qf/description.cpp
+    platform/linux/qf/destroy.cpp
+    platform/linux/qf/dictionary.cpp
+    platform/linux/qf/equal.cpp
+    platform/linux/qf/error.cpp
+    platform/linux/qf/number.cpp
+    platform/linux/qf/string.cpp
+    platform/linux/qf/string_encoding.cpp
+    platform/linux/qf/string_number.cpp
+    platform/linux/qf/url.cpp
     platform/linux/qf/value.cpp
     platform/linux/qf/value.h)
+if(PELORIN_CHECKS)
+  target_compile_definitions(component_qf_core PRIVATE PELORIN_CHECKS=1)  # counts values alive
+endif()
 
 pelorin_component(trel LEVEL 1 LIBRARY platform
   HEADERS

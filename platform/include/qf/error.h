@@ -14,8 +14,8 @@ PLR_EXPORT QfStringRef qf_error_get_domain(QfErrorRef error);
 PLR_EXPORT int64_t qf_error_get_code(QfErrorRef error);
 PLR_EXPORT QfStringRef qf_error_copy_description(QfErrorRef error);
 
-// A URI (RFC 3986), kept as given. Null when `text` is none: a character
-// outside of the RFC's set, a bad percent escape, or an ill-formed scheme.
+// A URI (RFC 3986), kept as given. Null when `text` is none: no well-formed
+// scheme, a character outside of the RFC's set, or a bad percent escape.
 PLR_EXPORT QfURLRef qf_url_create(QfStringRef text);
 PLR_EXPORT QfStringRef qf_url_get_string(QfURLRef url);
 

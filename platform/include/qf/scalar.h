@@ -34,13 +34,12 @@ PLR_EXPORT QfNumberRef qf_number_create_uint64(uint64_t value);
 PLR_EXPORT QfNumberRef qf_number_create_double(double value);
 PLR_EXPORT QfNumberType qf_number_get_type(QfNumberRef number);  // as created
 PLR_EXPORT bool qf_number_is_float(QfNumberRef number);
-PLR_EXPORT int64_t qf_number_get_int64(QfNumberRef number);
 
 // Writes the number to `value` as a C value of `type`. Returns whether nothing
-// was lost: reading the written value back as the number's own type gives the
-// number. What does not fit is still written: integers keep their low bits, a
-// fraction is cut off, a float or double beyond the integer's range gives the
-// nearest end of the range (NaN gives 0), a double becomes the nearest float.
+// was lost: the written value equals the number (a NaN equals a NaN). What does
+// not fit is still written: integers keep their low bits, a fraction is cut off,
+// a float or double beyond the integer's range gives the nearest end of the range
+// (NaN gives 0), an integer or a double becomes the nearest float.
 PLR_EXPORT bool qf_number_get_value(QfNumberRef number, QfNumberType type, void* value);
 
 #ifdef __cplusplus

@@ -1,7 +1,7 @@
 #include <cstring>
 #include <new>
 
-#include "platform/linux/vox/key_index.h"
+#include "platform/linux/common/key_index.h"
 #include "platform/linux/vox/value_layout.h"
 #include "plr/base/assert.h"
 
@@ -22,10 +22,22 @@ void store_key(vox_dictionary_entry& entry, std::string_view key) noexcept {
     text[key.size()] = '\0';
 }
 
+void rebuild_index(vox_dictionary_object& dictionary) noexcept {
+    key_index::rebuild(dictionary.index, dictionary.entries, dictionary.count, dictionary.capacity);
+}
+
 void start_index(vox_dictionary_object& dictionary) noexcept {
     for (std::uint32_t i = 0; i < dictionary.count; i++)
-        dictionary.entries[i].hash = hash_key(dictionary.entries[i].key_view());
+        dictionary.entries[i].hash = key_index::hash_of(dictionary.entries[i].key_view());
     rebuild_index(dictionary);
+}
+
+vox_dictionary_entry* find_in_index(const vox_dictionary_object& dictionary,
+                                    std::string_view key) noexcept {
+    const std::uint32_t position = key_index::find(
+        dictionary.index, dictionary.entries, key_index::hash_of(key),
+        [key](const vox_dictionary_entry& entry) { return entry.key_view() == key; });
+    return position == key_index::kNowhere ? nullptr : dictionary.entries + position;
 }
 
 void remove(vox_dictionary_object& dictionary, vox_dictionary_entry* entry) noexcept {
@@ -85,9 +97,9 @@ void append(vox_dictionary_object& dictionary, std::string_view key, vox_object*
     entry.value = value;
     store_key(entry, key);
     if (dictionary.index) {
-        entry.hash = hash_key(key);
-        add_to_index(dictionary, dictionary.count - 1);
-    } else if (dictionary.count > kUnindexedEntries) {
+        entry.hash = key_index::hash_of(key);
+        key_index::add(dictionary.index, entry.hash, dictionary.count - 1);
+    } else if (dictionary.count > key_index::kUnindexedEntries) {
         start_index(dictionary);
     }
 }
