@@ -33,18 +33,22 @@ TEST(Suspend, HoldsWorkAndSyncCallersBackUntilEveryResumeCame) {
 }
 
 TEST(Suspend, FromItsOwnWorkTakesEffectBeforeTheNextPiece) {
-    const auto serial = queue::create("serial");
-    Event suspended;
-    int ran = 0;
-    serial.async([&] {
-        serial.suspend();
-        suspended.signal();
-    });
-    serial.async([&] { ++ran; });
-    EXPECT_TRUE(suspended.wait());
-    serial.resume();
-    drain(serial);
-    EXPECT_EQ(ran, 1);
+    const auto target = queue::create("target");
+    const auto child = queue::create("child", target);
+    for (const queue& held : {child, target}) {
+        Event ran;
+        std::atomic<bool> resumed{false};
+        child.async([&] {
+            held.suspend();
+            ran.signal();
+        });
+        child.async([&] { EXPECT_TRUE(resumed); });
+        queue::create("beside").async([&] { ran.signal(); });
+        EXPECT_TRUE(ran.wait() && ran.wait());
+        resumed = true;
+        held.resume();
+        drain(child);
+    }
 }
 
 // Suspensions come and go on several threads while work is pushed: nothing is

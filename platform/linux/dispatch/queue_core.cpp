@@ -139,7 +139,7 @@ queue_core::~queue_core() {
 void queue_core::release() noexcept {
     if (global_ || handles_.fetch_sub(1, std::memory_order_acq_rel) != 1)
         return;
-    if (suspension_.load(std::memory_order_acquire) >= kSuspension)
+    if (is_suspended())
         stop("the last handle of a suspended queue went");
     release_reference();
 }
@@ -174,7 +174,7 @@ void queue_core::push(item* work) noexcept {
 }
 
 void queue_core::activate() noexcept {
-    if (suspension_.load(std::memory_order_acquire) >= kSuspension && park())
+    if (is_suspended() && park())
         return;
     if (target_)
         target_->push(&place_);
@@ -193,6 +193,22 @@ item* queue_core::detach(item* first) noexcept {
     return wait_for_next(first);
 }
 
+// The reverse: `first` runs before everything that waits.
+void queue_core::attach(item* first) noexcept {
+    item* next = head_;
+    if (!next) {
+        item* expected = &stub_;
+        if (tail_.compare_exchange_strong(expected, first, std::memory_order_acq_rel)) {
+            head_ = first;
+            return;
+        }
+        next = wait_for_next(&stub_);
+        stub_.next.store(nullptr, std::memory_order_relaxed);
+    }
+    first->next.store(next, std::memory_order_relaxed);
+    head_ = first;
+}
+
 // The item behind the stub; null after ownership was given up because there is
 // none.
 item* queue_core::take_after_stub() noexcept {
@@ -207,14 +223,24 @@ item* queue_core::take_after_stub() noexcept {
     return next;
 }
 
+void queue_core::count_ownership() noexcept {
+    if (std::exchange(counted_, true))
+        return;
+    references_.fetch_add(1, std::memory_order_relaxed);
+}
+
 queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
     frame here(this);
     item* work = head_;
     for (unsigned ran = 0;; ++ran) {
-        if (suspension_.load(std::memory_order_acquire) >= kSuspension) [[unlikely]] {
+        if (is_suspended()) [[unlikely]] {
             head_ = work;
             if (park())
                 return outcome::parked;
+        }
+        if (target_ && target_->is_held_back()) [[unlikely]] {
+            head_ = work;
+            return outcome::more;
         }
         if (budget == 0) [[unlikely]] {
             if (pump_ || pool::shared().has_waiting_work()) {
@@ -286,10 +312,8 @@ bool queue_core::run_owned(unsigned& budget) noexcept {
 
 // ---- sync ---------------------------------------------------------------------------
 
-// Takes an idle queue that is not suspended.
+// Takes an idle queue, suspended or not.
 bool queue_core::try_lock() noexcept {
-    if (suspension_.load(std::memory_order_acquire) >= kSuspension)
-        return false;
     item* expected = nullptr;
     if (!tail_.compare_exchange_strong(expected, &stub_, std::memory_order_acq_rel))
         return false;
@@ -315,24 +339,47 @@ void queue_core::run_sync(void (*function)(void*) noexcept, void* context) {
     unlock_chain();
 }
 
-// Owns this queue and all its targets when it returns.
+// Owns this queue and all its targets, none of them suspended, when it returns.
 void queue_core::lock_from_here() noexcept {
-    for (queue_core* level = this; level; level = level->target_) {
-        if (!level->try_lock()) [[unlikely]] {
-            level->wait_for_ownership();  // comes with the targets'
-            return;
+    queue_core* level = this;
+    while (level && level->try_lock())
+        level = level->target_;
+    if (level) [[unlikely]]
+        level->wait_for_ownership();
+    // `level` and its targets were looked at when they were handed over, the others
+    // not since they are ours.
+    for (queue_core* below = this; below != level;) {
+        if (!below->is_suspended()) [[likely]] {
+            below = below->target_;
+            continue;
         }
+        below->wait_for_resume();
+        level = std::exchange(below, this);
     }
 }
 
+// Comes with the ownership of the targets.
 void queue_core::wait_for_ownership() noexcept {
-    // The innermost frame is the sync() that waits here.
-    for (const frame* held = top_frame->up; held; held = held->up)
-        for (const queue_core* level = held->queue; level; level = level->target_)
-            if (level == this)
+    // The innermost frame is the sync() that waits here. What one of our targets
+    // runs keeps us from running.
+    for (const queue_core* level = this; level; level = level->target_)
+        for (const frame* held = top_frame->up; held; held = held->up)
+            if (level->is_target_of(held->queue))
                 stop("sync() from its own work would wait for ever");
     waiter self;
     push(&self);
+    self.wait();
+}
+
+// For the owner of a suspended queue and its targets: lets others have the
+// targets, and is the first to run when the queue goes on.
+void queue_core::wait_for_resume() noexcept {
+    waiter self;
+    attach(&self);
+    count_ownership();
+    if (target_)
+        target_->unlock_chain();
+    activate();
     self.wait();
 }
 
@@ -353,12 +400,8 @@ void queue_core::unlock() noexcept {
         return;
     }
     head_ = next;
-    if (!counted) {
-        counted_ = true;
-        references_.fetch_add(1, std::memory_order_relaxed);
-    }
-    const bool suspended = suspension_.load(std::memory_order_acquire) >= kSuspension;
-    if (next->run == &waiter_tag && !target_ && !suspended) {
+    count_ownership();
+    if (next->run == &waiter_tag && !target_ && !is_suspended()) {
         head_ = detach(next);
         static_cast<waiter*>(next)->grant();
         return;
@@ -366,15 +409,27 @@ void queue_core::unlock() noexcept {
     activate();
 }
 
+bool queue_core::is_target_of(const queue_core* level) const noexcept {
+    while (level && level != this)
+        level = level->target_;
+    return level != nullptr;
+}
+
 bool queue_core::is_current() const noexcept {
     for (const frame* held = top_frame; held; held = held->up)
-        for (const queue_core* level = held->queue; level; level = level->target_)
-            if (level == this)
-                return true;
+        if (is_target_of(held->queue))
+            return true;
     return false;
 }
 
 // ---- Suspension ------------------------------------------------------------------------
+
+bool queue_core::is_held_back() const noexcept {
+    for (const queue_core* level = this; level; level = level->target_)
+        if (level->is_suspended())
+            return true;
+    return false;
+}
 
 bool queue_core::park() noexcept {
     std::uint32_t seen = suspension_.load(std::memory_order_acquire);

@@ -31,7 +31,8 @@
 //
 // Suspension is a second word: a count and the bit kParked, which the owner sets
 // instead of going on; the resume() that brings the count to 0 takes ownership
-// from it.
+// from it. Before each piece of work its runner, who owns the queue and its targets
+// by then, looks at the suspensions of all of them.
 //
 // A drainer owns the queue and all its targets; a sync() too.
 //
@@ -146,14 +147,24 @@ class queue_core {
                bool global) noexcept;
     ~queue_core();
 
+    [[nodiscard]] bool is_suspended() const noexcept {
+        return suspension_.load(std::memory_order_acquire) >= kSuspension;
+    }
+    // By itself or by a target.
+    [[nodiscard]] bool is_held_back() const noexcept;
+    // Whether it is `level`, or a target of it.
+    [[nodiscard]] bool is_target_of(const queue_core* level) const noexcept;
     [[nodiscard]] bool try_lock() noexcept;
     void hand_over(void (*function)(void*) noexcept, void* context) noexcept;
     void lock_from_here() noexcept;
     void wait_for_ownership() noexcept;
+    void wait_for_resume() noexcept;
     void unlock_chain() noexcept;
     void unlock() noexcept;
     [[nodiscard]] bool park() noexcept;
     [[nodiscard]] item* detach(item* first) noexcept;
+    void attach(item* first) noexcept;
+    void count_ownership() noexcept;
     [[nodiscard]] item* take_after_stub() noexcept;
     [[nodiscard]] bool run_nested(item* work, unsigned& budget) noexcept;
 
