@@ -4,6 +4,8 @@
 #include "plr/concurrency/async_dispatch_callback.h"
 #include "plr/concurrency/clock.h"
 #include "plr/concurrency/dispatch_timer_service.h"
+#include "plr/concurrency/monitor.h"
+#include "plr/concurrency/priority_queue.h"
 #include "plr/concurrency/qf_shared_ref.h"
 #include "plr/concurrency/queue_role.h"
 #include "plr/concurrency/shared_ref.h"

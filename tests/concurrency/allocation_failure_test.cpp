@@ -2,7 +2,10 @@
 
 #include <memory>
 #include <new>
+#include <string>
+#include <thread>
 
+#include "plr/concurrency/priority_queue.h"
 #include "plr/concurrency/shared_synchronizable.h"
 #include "support/failing_allocations.h"
 #include "support/waiting.h"
@@ -28,6 +31,31 @@ TEST(SharedSynchronizable, IsDestroyedOnItsQueueWhenItCannotBeOwned) {
     plr::test::succeedingAllocations = 0;
     EXPECT_THROW(static_cast<void>(own()), std::bad_alloc);
     EXPECT_TRUE(end.wait());
+}
+
+TEST(PriorityQueue, SaysWhichQueueCouldNotBeMade) {
+    const auto makeAfter = [](int succeeding) {
+        const std::string name = "q";  // labels need no memory of their own
+        plr::test::succeedingAllocations = succeeding;
+        const plr::concurrency::PriorityQueue made(name);
+    };
+    EXPECT_THROW(makeAfter(0), std::bad_alloc);
+    EXPECT_DEATH(makeAfter(1), ": fNormalQueue");
+    EXPECT_DEATH(makeAfter(2), ": fHighestQueue");
+    makeAfter(3);
+    plr::test::succeedingAllocations = -1;
+}
+
+TEST(PriorityQueue, GoesOnAfterASubmissionThatFoundNoMemory) {
+    using enum plr::concurrency::PriorityQueue::Priority;
+    const plr::concurrency::PriorityQueue queue("lanes");
+    const dispatch::block<void()> nothing([] {});
+    // A thread of its own: nodes are recycled by thread.
+    std::thread([&] {
+        plr::test::succeedingAllocations = 0;
+        EXPECT_THROW(queue.addBlock(nothing, Highest), std::bad_alloc);
+    }).join();
+    queue.addBlockSync(nothing, Normal);
 }
 
 }  // namespace
