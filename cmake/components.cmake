@@ -26,7 +26,9 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/include/dispatch/queue.h
     platform/include/dispatch/source.h
     platform/include/dispatch/time.h
+    platform/include/dispatch/uptime.h
   SOURCES
+    platform/linux/dispatch/activity.h
     platform/linux/dispatch/calendar.cpp
     platform/linux/dispatch/deputy.cpp
     platform/linux/dispatch/deputy.h
@@ -55,7 +57,8 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/timer_queue.cpp
     platform/linux/dispatch/timer_queue.h
     platform/linux/dispatch/timer_wheel.cpp
-    platform/linux/dispatch/timer_wheel.h)
+    platform/linux/dispatch/timer_wheel.h
+    platform/linux/dispatch/uptime.cpp)
 
 # Need GLib and libsystemd, which their users bring; no other header includes them.
 pelorin_component(dispatch_loops LEVEL 1 LIBRARY platform

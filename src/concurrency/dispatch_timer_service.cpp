@@ -70,7 +70,8 @@ DispatchTimerService::DispatchTimerService(std::shared_ptr<LogServer> server)
 DispatchTimerService::~DispatchTimerService() = default;
 
 std::chrono::steady_clock::time_point DispatchTimerService::now() {
-    return std::chrono::steady_clock::now();
+    return std::chrono::steady_clock::time_point(
+        nanoseconds(dispatch::time::now(dispatch::clock::monotonic).nanoseconds()));
 }
 
 void DispatchTimerService::flush() const {

@@ -9,3 +9,4 @@
 #include "dispatch/queue.h"
 #include "dispatch/source.h"
 #include "dispatch/time.h"
+#include "dispatch/uptime.h"

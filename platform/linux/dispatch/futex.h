@@ -4,6 +4,7 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <climits>
@@ -11,9 +12,23 @@
 #include <ctime>
 
 #include "dispatch/time.h"
+#include "dispatch/uptime.h"
 
 // futex(2), process-private.
 namespace dispatch::detail {
+
+// When `until` will have come, on a clock that the kernel has futexes for.
+inline timespec futex_deadline(time until) noexcept {
+    std::int64_t nanoseconds = until.nanoseconds();
+    if (until.on() == clock::boot || (until.on() == clock::monotonic && uptime::stand_in())) {
+        timespec now{};
+        ::clock_gettime(CLOCK_MONOTONIC, &now);
+        nanoseconds += now.tv_sec * std::int64_t{1'000'000'000} + now.tv_nsec -
+                       time::now(until.on()).nanoseconds();
+    }
+    nanoseconds = std::max<std::int64_t>(nanoseconds, 0);
+    return {nanoseconds / 1'000'000'000, nanoseconds % 1'000'000'000};
+}
 
 // Sleeps while `word` holds `expected`, at most until `until`. Returns false on
 // time-out; true otherwise, also without a reason.
@@ -25,11 +40,7 @@ inline bool futex_wait(std::atomic<std::uint32_t>& word, std::uint32_t expected,
     if (!until.is_forever()) {
         if (until.on() == clock::wall)
             operation |= FUTEX_CLOCK_REALTIME;
-        else if (until.on() == clock::boot)  // the kernel offers no futex on this clock
-            until = time::after(std::chrono::nanoseconds(until.nanoseconds() -
-                                                         time::now(clock::boot).nanoseconds()));
-        deadline.tv_sec = until.nanoseconds() / 1'000'000'000;
-        deadline.tv_nsec = until.nanoseconds() % 1'000'000'000;
+        deadline = futex_deadline(until);
         limit = &deadline;
     }
     const long result =

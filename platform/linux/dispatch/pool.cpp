@@ -296,4 +296,15 @@ unsigned pool::runnable_workers() noexcept {
     }));
 }
 
+// A worker that was woken is runnable from then on, though it may still be listed as
+// asleep; one that did something in between the two looks has changed their counts.
+bool pool::is_quiet() noexcept {
+    const progress before = look();
+    const unsigned blocked = blocked_.load(std::memory_order_seq_cst);
+    if (before.waiting || searching_.load(std::memory_order_seq_cst) > 0 ||
+        before.sleeping + blocked != workers_.load(std::memory_order_seq_cst))
+        return false;
+    return runnable_workers() == 0 && look() == before;
+}
+
 }  // namespace dispatch::detail

@@ -78,6 +78,20 @@ class pool {
     // Workers that the system has on a processor or in its run queue.
     [[nodiscard]] unsigned runnable_workers() noexcept;
 
+    // For those who look on: a picture of each worker, into `seen`, which has room
+    // for kMaximumWorkers.
+    struct view {
+        pid_t thread;
+        const queue_core* queue;  // to look up; null when it runs nothing
+        std::uint64_t steps;
+        std::int64_t since;  // see activity
+        bool polling;
+    };
+    void look_at_workers(std::vector<view>& seen) noexcept;
+    // Nothing waits, and no worker is at anything but waiting. For threads that are no
+    // workers.
+    [[nodiscard]] bool is_quiet() noexcept;
+
   private:
     pool() noexcept;
     static pool& make() noexcept;

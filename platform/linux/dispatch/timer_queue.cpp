@@ -9,6 +9,7 @@
 #include <cstring>
 
 #include "dispatch/calendar.h"
+#include "dispatch/uptime.h"
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
 
@@ -24,6 +25,10 @@ constexpr unsigned kTurn = 1024;
 
 // Of deadlines; what a period takes past it never comes.
 constexpr std::int64_t kLatest = (std::int64_t{1} << 62) - 1;
+
+bool is_kernels(clock which) noexcept {
+    return which == clock::wall ? calendar::shared().is_kernels() : !uptime::stand_in();
+}
 
 }  // namespace
 
@@ -49,14 +54,13 @@ void timer_queue::set_descriptor(per_clock& clock, dispatch::clock which) noexce
     if (clock.armed <= wanted)
         return;
     int flags = TFD_TIMER_ABSTIME;
-    if (which == dispatch::clock::wall) {
+    if (which == dispatch::clock::wall)
         flags |= TFD_TIMER_CANCEL_ON_SET;
-        // A stand-in moves by hand only; what it says is due must wake the poller.
-        if (!calendar::shared().is_kernels()) {
-            if (wanted > time::now(which).nanoseconds())
-                return;
-            wanted = 1;
-        }
+    // A stand-in moves by hand only; what it says is due must wake the poller.
+    if (!is_kernels(which)) {
+        if (wanted > time::now(which).nanoseconds())
+            return;
+        wanted = 1;
     }
     itimerspec setting{};
     setting.it_value.tv_sec = wanted / 1'000'000'000;
@@ -73,14 +77,24 @@ void timer_queue::arm(timer_entry& entry, time deadline, std::int64_t interval) 
     per_clock& clock = of(deadline.on());
     entry.clock_ = deadline.on();
     entry.interval_ = interval;
+    ++clock.pending;
     clock.wheel.insert(entry, deadline.nanoseconds());
     if (clock.armed > deadline.nanoseconds()) [[unlikely]]
         set_descriptor(clock, deadline.on());
 }
 
 void timer_queue::disarm(timer_entry& entry) noexcept {
-    if (entry.is_pending())
-        of(entry.clock_).wheel.remove(entry);
+    if (!entry.is_pending())
+        return;
+    per_clock& clock = of(entry.clock_);
+    --clock.pending;
+    clock.wheel.remove(entry);
+}
+
+time timer_queue::earliest(clock on) noexcept {
+    scoped_lock guard(lock_);
+    const std::int64_t deadline = of(on).wheel.earliest();
+    return deadline == timer_wheel::kNever ? forever : time::at(on, deadline);
 }
 
 // At most kTurn at a time: their handlers then run while they are in the caches,
@@ -120,12 +134,15 @@ bool timer_queue::fire_some(per_clock& clock, std::int64_t now) noexcept {
 // The entry may be gone when its function returns.
 void timer_queue::fire(per_clock& clock, timer_entry& due, std::int64_t now) noexcept {
     std::uint64_t firings = 1;
+    --clock.pending;
     if (due.interval_ > 0) {
         const std::int64_t missed = (now - due.deadline()) / due.interval_;
         const std::int64_t last = due.deadline() + missed * due.interval_;
         firings += static_cast<std::uint64_t>(missed);
-        if (due.interval_ <= kLatest - last)
+        if (due.interval_ <= kLatest - last) {
+            ++clock.pending;
             clock.wheel.insert(due, last + due.interval_);
+        }
     }
     due.fire_(&due, firings);
 }

@@ -45,15 +45,30 @@ class timer_queue {
     // The timer does not fire any more. Never a system call.
     void disarm(timer_entry& entry) noexcept PLR_REQUIRES(lock_);
 
+    // No deadline on `on` is before this.
+    [[nodiscard]] time earliest(clock on) noexcept PLR_EXCLUDES(lock_);
+
     // Fires what is due: when the clock's descriptor is readable, or the clock
     // was set. Returns whether more may be due, for which the descriptor stays
     // readable. Any thread.
     bool expire(clock on) noexcept PLR_EXCLUDES(lock_);
 
+    // How many are pending, and the earliest deadline, which a withdrawn timer may
+    // have left.
+    struct view {
+        std::size_t pending;
+        std::int64_t earliest;  // nanoseconds
+    };
+    [[nodiscard]] view look(clock on) noexcept PLR_EXCLUDES(lock_) {
+        scoped_lock guard(lock_);
+        return {of(on).pending, of(on).wheel.earliest()};
+    }
+
   private:
     struct per_clock {
         int descriptor = -1;
         std::int64_t armed = timer_wheel::kNever;  // what the descriptor is set to
+        std::size_t pending = 0;
         timer_wheel wheel;
     };
 
