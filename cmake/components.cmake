@@ -205,6 +205,34 @@ if(PELORIN_CHECKS)
   target_compile_definitions(component_qf_core PRIVATE PELORIN_CHECKS=1)  # counts values alive
 endif()
 
+pelorin_component(qf_preferences LEVEL 1 LIBRARY platform
+  SOURCES
+    platform/linux/qf/preferences.cpp
+    platform/linux/qf/preferences_base64.cpp
+    platform/linux/qf/preferences_base64.h
+    platform/linux/qf/preferences_cache.cpp
+    platform/linux/qf/preferences_cache.h
+    platform/linux/qf/preferences_edit.cpp
+    platform/linux/qf/preferences_edit.h
+    platform/linux/qf/preferences_file.cpp
+    platform/linux/qf/preferences_file.h
+    platform/linux/qf/preferences_names.cpp
+    platform/linux/qf/preferences_names.h
+    platform/linux/qf/preferences_parse.cpp
+    platform/linux/qf/preferences_parse.h
+    platform/linux/qf/preferences_save.cpp
+    platform/linux/qf/preferences_save.h
+    platform/linux/qf/preferences_scan.cpp
+    platform/linux/qf/preferences_scan.h
+    platform/linux/qf/preferences_store.cpp
+    platform/linux/qf/preferences_store.h
+    platform/linux/qf/preferences_values.cpp
+    platform/linux/qf/preferences_values.h
+    platform/linux/qf/preferences_watch.cpp
+    platform/linux/qf/preferences_watch.h
+    platform/linux/qf/preferences_write.cpp
+    platform/linux/qf/preferences_write.h)
+
 pelorin_component(trel LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/trel/trel.h

@@ -15,9 +15,9 @@ del sys.argv[1:]
 LIBRARIES = ("libpelorin-platform", "libpelorin")
 # What the libraries may offer: names of C functions and data, of C++ after demangling.
 OFFERED = re.compile(
-    r"(Pelorin|vox_|VOX_|qf_|trel_|kel_|ob_|serial_)\w*$|__PLAssertTrigger$|"
+    r"(Pelorin|vox_|VOX_|qf_|kQf|trel_|kel_|ob_|serial_)\w*$|__PLAssertTrigger$|"
     r"((typeinfo|typeinfo name|vtable|VTT|(non-)?virtual thunk) (for|to) |guard variable for )?"
-    r"((plr|vox|dispatch)::|PelorinAsync)")
+    r"((plr|vox|dispatch|qf)::|PelorinAsync)")
 # What they may need from the system.
 NEEDED = {"libstdc++.so.6", "libm.so.6", "libgcc_s.so.1", "libc.so.6", "libpelorin-platform.so.0",
           "ld-linux-x86-64.so.2", "ld-linux-aarch64.so.1"}

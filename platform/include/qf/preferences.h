@@ -5,7 +5,8 @@
 #include "qf/base.h"
 
 // Preferences: settings of an application, which an administrator edits in TOML
-// files (toml.io, 1.0) and a program reads and writes here.
+// files (toml.io, 1.0) and a program reads and writes here. docs/preferences.md
+// is the guide.
 //
 // A key is looked up in layers, the later winning: vendor, system, user; in
 // each the file for any host, then that for this host.
@@ -16,16 +17,37 @@
 //            APPLICATION.toml                    any host
 //            APPLICATION@HOST.toml               this host, by gethostname()
 //
-// The environment may name other folders: PELORIN_PREFERENCES_VENDOR,
-// PELORIN_PREFERENCES_SYSTEM, PELORIN_PREFERENCES_USER (secure_getenv: not in
-// set-user-id programs). Tables merge key by key; any other value replaces.
+// A user by name is one of the system's, whose files are in .config of the home
+// folder. The environment may name other folders: PELORIN_PREFERENCES_VENDOR,
+// PELORIN_PREFERENCES_SYSTEM, PELORIN_PREFERENCES_USER (absolute; secure_getenv(3):
+// not in set-user-id programs). Names and folders are looked up when an application
+// is first read. Tables merge key by key; any other value replaces.
 //
-// Threads: everything on any thread. Reading what was read before takes no
-//          lock and no system call.
+// | TOML                  | Qf                                                      |
+// |-----------------------|---------------------------------------------------------|
+// | string                | string                                                  |
+// | integer               | number, SInt64 (any integer is written as one)          |
+// | float                 | number, Double (Float is written as one)                |
+// | boolean               | boolean                                                 |
+// | date-time with offset | date (written in UTC)                                   |
+// | local date-time       | date, in the local time zone                            |
+// | local date, time      | string: 2024-12-31, 07:30:00                            |
+// | { base64 = "SGk=" }   | data: an inline table of this one key (RFC 4648)        |
+// | array, table          | array, dictionary                                       |
+//
+// Files have at most 1 MiB, and values at most 64 levels.
+//
+// Threads: everything on any thread. Reading what the thread has read before
+//          takes no lock and no system call.
 // Changes: files are watched (inotify) once they were read; a change is seen
-//          by readers, and told to observers, without a restart.
+//          by readers, and told to observers, without a restart. Where the
+//          system has no more watches to give, that is one of the errors, and files
+//          are looked at once a second. In a child after fork() reading
+//          and writing work, other processes' changes are not noticed.
+// Memory:  what was read stays for the life of the process.
 // Errors:  a file that cannot be read or is malformed is left out, its layer
-//          keeps the values last read, and the error names file, line and column.
+//          keeps the values last read, and the error names file, line and
+//          column ("FILE:LINE:COLUMN: text").
 #ifdef __cplusplus
 extern "C" {
 #endif
@@ -33,10 +55,16 @@ extern "C" {
 // Arguments of special meaning. An application, user or host by name is a
 // string of letters, digits, '.', '_' and '-', at most 128 bytes, not beginning
 // with a '.'; any other one has no preferences.
-PLR_EXPORT extern const QfStringRef kQfPreferencesCurrentUser;
-PLR_EXPORT extern const QfStringRef kQfPreferencesAnyUser;  // vendor and system layers only
+PLR_EXPORT extern const QfStringRef kQfPreferencesCurrentUser;  // the effective one
+PLR_EXPORT extern const QfStringRef kQfPreferencesAnyUser;      // vendor and system layers only
 PLR_EXPORT extern const QfStringRef kQfPreferencesCurrentHost;
 PLR_EXPORT extern const QfStringRef kQfPreferencesAnyHost;  // leaves the host's files out
+
+// Errors are of domain "errno", with its numbers, or of "preferences":
+typedef enum QfPreferencesError {
+    kQfPreferencesErrorMalformed = 1,  // a file that is not TOML, or has a value out of range
+    kQfPreferencesErrorValue = 2,  // a value that no file can hold; the text says which, and why
+} QfPreferencesError;
 
 // The value of `key` (a key of the file's root; a table is a dictionary) in the
 // layers that `user` and `host` see; null when none has it, or no such user.
@@ -47,13 +75,15 @@ PLR_EXPORT QfDictionaryRef qf_preferences_copy_all(QfStringRef application, QfSt
                                                    QfStringRef host);
 
 // Sets `key` in the one file of `user` (kQfPreferencesAnyUser: the system
-// layer) and `host`; a null value removes it. The file holds the old content or
-// the new one at any time, whatever happens to this process or the machine, and
-// what other processes set is kept (a lock file; written to a temporary file,
-// fsync, rename, fsync of the folder). Comments and the order of the file stay.
-// Blocks for the disk. Returns null, or an error (domain "errno", or
-// "preferences" for a value that TOML cannot hold: null, URL, error, NaN keys,
-// unsigned numbers past 2^63 - 1), after which the old content stands.
+// layer; another user's: EPERM) and `host`; a null value removes it. The file
+// holds the old content or the new one at any time, whatever happens to this process
+// or the machine, and what other processes set is kept (a lock file; written to a
+// temporary file, fsync, rename, fsync of the folder). Comments and order of what
+// stays the same are kept; a malformed file is not touched. Waits for the disk and
+// for other writers. This process reads the new value when it returns. Returns null,
+// or an error, after which the old content stands; the caller releases it. No file
+// can hold null, a URL, an error, a locale or formatter, an unsigned number past
+// 2^63 - 1, text that is not UTF-8, or a dictionary whose only key is "base64".
 [[nodiscard]] PLR_EXPORT QfErrorRef qf_preferences_set_value(QfStringRef key, QfTypeRef value,
                                                              QfStringRef application,
                                                              QfStringRef user, QfStringRef host);
