@@ -595,6 +595,7 @@ pelorin_component(text LEVEL 5 LIBRARY pelorin
     src/text/text_transform.cpp
     src/text/ucs2_to_utf8_transform.cpp
     src/text/ucs2_to_utf8_transform.h
+    src/text/unit_pull.h
     src/text/utf16.h
     src/text/utf8_avx2.cpp
     src/text/utf8_decoder.cpp

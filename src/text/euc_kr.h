@@ -6,9 +6,10 @@
 // 0xA1 to 0xFE.
 namespace plr {
 
-class EucKRToUcs2Transform : public Stage<EucKRToUcs2Transform> {
+class EucKRToUcs2Transform : public UnitStage<EucKRToUcs2Transform> {
   public:
     void reset() override;
+    using UnitStage::convert;
     std::size_t convert(std::uint32_t* out, std::size_t most);
 
   private:

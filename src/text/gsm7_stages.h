@@ -31,10 +31,11 @@ class Gsm7Encoder final : public OctetStage<Gsm7Encoder<Lookup>> {
 // Codes to characters. `Lookup`: characters(), and characterAbove7F(code), which gives kNone
 // if there is none.
 template <class Lookup>
-class Gsm7Decoder final : public Stage<Gsm7Decoder<Lookup>> {
+class Gsm7Decoder final : public UnitStage<Gsm7Decoder<Lookup>> {
   public:
     explicit Gsm7Decoder(int p, int q = 0) : lookup_(p, q) {}
 
+    using UnitStage<Gsm7Decoder>::convert;
     std::size_t convert(std::uint32_t* out, std::size_t most);
 
   private:

@@ -3,6 +3,7 @@
 #include <array>
 
 #include "plr/text/octet_source_buffer.h"
+#include "src/text/unit_pull.h"
 #include "src/text/utf16.h"
 
 namespace plr {
@@ -12,45 +13,40 @@ using octets::kBlock;
 
 constexpr std::size_t kCodes = 256;  // at a time
 
-void widenBlock(std::uint32_t* out, const unsigned char* units) {
+template <class Code>
+void widenBlock(Code* out, const unsigned char* units) {
     std::array<std::uint16_t, kBlock> block;
     std::memcpy(block.data(), units, sizeof(block));
     for (std::size_t k = 0; k < kBlock; ++k)
         out[k] = octets::bigEndian(block[k]);
 }
 
-void narrowBlock(char* out, const std::uint32_t* codes) {
-    std::array<std::uint16_t, kBlock> block;
-    for (std::size_t k = 0; k < kBlock; ++k)
-        block[k] = static_cast<std::uint16_t>(codes[k]);
-    for (std::size_t k = 0; k < kBlock; ++k)
-        block[k] = octets::bigEndian(block[k]);
-    std::memcpy(out, block.data(), sizeof(block));
-}
-
-// Of a block, for which there is room; 0 where a code is neither unit nor pair.
-std::size_t convertBlock(const std::uint32_t* codes, char* out) {
-    if (octets::blockFits(codes, 0xFFFF)) {
-        narrowBlock(out, codes);
-        return 2 * kBlock;
+void narrow(char* out, const char16_t* units, std::size_t length) {
+    std::size_t i = 0;
+    for (; i + kBlock <= length; i += kBlock) {
+        std::array<std::uint16_t, kBlock> block;
+        for (std::size_t k = 0; k < kBlock; ++k)
+            block[k] = octets::bigEndian(units[i + k]);
+        std::memcpy(out + 2 * i, block.data(), sizeof(block));
     }
-    // Without a branch for each, for texts mix units and pairs: by arithmetic of which compilers
-    // make none.
-    std::size_t done = 0;
-    bool allGood = true;
-    for (std::size_t i = 0; i < kBlock; ++i) {
-        const unsigned pair = (0 - (codes[i] >> 16)) >> 31;
-        allGood &= utf16::isPair(codes[i]) == (pair != 0);
-        const std::uint32_t bits = octets::firstHighest(codes[i] << (16 - 16 * pair));
-        std::memcpy(out + done, &bits, sizeof(bits));
-        done += 2 + 2 * pair;
+    for (; i < length; ++i) {
+        out[2 * i] = static_cast<char>(units[i] >> 8);
+        out[2 * i + 1] = static_cast<char>(units[i]);
     }
-    return allGood ? done : 0;
 }
 
 }  // namespace
 
 std::size_t OctetToUcs2Transform::convert(std::uint32_t* out, std::size_t most) {
+    return convertAny(out, most);
+}
+
+std::size_t OctetToUcs2Transform::convert(char16_t* out, std::size_t most) {
+    return convertAny(out, most);
+}
+
+template <class Code>
+std::size_t OctetToUcs2Transform::convertAny(Code* out, std::size_t most) {
     if (OctetSourceBuffer* memory = source == nullptr ? nullptr : source->asOctetSource())
         return convertMemory(*memory, out, most);
     std::array<std::uint32_t, 2 * kCodes> octets;
@@ -68,7 +64,8 @@ std::size_t OctetToUcs2Transform::convert(std::uint32_t* out, std::size_t most) 
     return done;
 }
 
-std::size_t OctetToUcs2Transform::convertMemory(OctetSourceBuffer& memory, std::uint32_t* out,
+template <class Code>
+std::size_t OctetToUcs2Transform::convertMemory(OctetSourceBuffer& memory, Code* out,
                                                 std::size_t most) {
     const auto octets = memory.peek();
     const std::size_t units = std::min(most, octets.size() / 2);
@@ -76,7 +73,7 @@ std::size_t OctetToUcs2Transform::convertMemory(OctetSourceBuffer& memory, std::
     for (; i + kBlock <= units; i += kBlock)
         widenBlock(out + i, octets.data() + 2 * i);
     for (; i < units; ++i)
-        out[i] = static_cast<std::uint32_t>(octets[2 * i] << 8 | octets[2 * i + 1]);
+        out[i] = static_cast<std::uint16_t>(octets[2 * i] << 8 | octets[2 * i + 1]);
     memory.skip(2 * units);
     if (units < most && octets.size() % 2 != 0) {
         memory.skip(1);
@@ -85,9 +82,9 @@ std::size_t OctetToUcs2Transform::convertMemory(OctetSourceBuffer& memory, std::
     return units;
 }
 
-std::uint32_t OctetToUcs2Transform::unitOf(std::uint32_t high, std::uint32_t low) {
+std::uint16_t OctetToUcs2Transform::unitOf(std::uint32_t high, std::uint32_t low) {
     if ((high | low) <= 0xFF)
-        return high << 8 | low;
+        return static_cast<std::uint16_t>(high << 8 | low);
     markExceptionOccurred();
     return utf16::kReplacement;
 }
@@ -98,45 +95,23 @@ void Ucs2ToOctetTransform::reset() {
 }
 
 std::size_t Ucs2ToOctetTransform::convert(char* out, std::size_t most) {
-    std::array<std::uint32_t, kCodes> codes;
+    UnitBuffer units;
     std::size_t done = rest_.take(out, most);
     while (done < most) {
-        const std::size_t wanted = std::min((most - done + 3) / 4, kCodes);
-        const std::size_t got = pull(codes.data(), wanted);
-        done += convertCodes(codes.data(), got, out + done, most - done);
+        const std::size_t wanted = std::min((most - done + 1) / 2, kUnitsAtOnce);
+        const std::size_t got = pullUnits(*this, units.data(), wanted);
+        const std::size_t whole = std::min(got, (most - done) / 2);
+        narrow(out + done, units.data(), whole);
+        done += 2 * whole;
+        for (std::size_t i = whole; i < got; ++i) {
+            rest_.bits |= std::uint32_t{units[i]} << (16 - 8 * rest_.length);
+            rest_.length += 2;
+        }
+        done += rest_.take(out + done, most - done);
         if (got < wanted)
             break;
     }
     return done;
-}
-
-std::size_t Ucs2ToOctetTransform::convertCodes(const std::uint32_t* codes, std::size_t length,
-                                               char* out, std::size_t most) {
-    std::size_t done = 0;
-    for (std::size_t i = 0; i < length;) {
-        while (length - i >= kBlock && most - done >= 4 * kBlock) {
-            const std::size_t converted = convertBlock(codes + i, out + done);
-            if (converted == 0)
-                break;
-            i += kBlock;
-            done += converted;
-        }
-        for (const std::size_t stop = std::min(length, i + kBlock); i < stop; ++i) {
-            rest_ = encode(codes[i]);
-            done += rest_.take(out + done, most - done);
-        }
-    }
-    return done;
-}
-
-octets::Few Ucs2ToOctetTransform::encode(std::uint32_t code) {
-    if (utf16::isPair(code))
-        return {code, 4};
-    if (code > 0xFFFF) {
-        markExceptionOccurred();
-        code = utf16::kReplacement;
-    }
-    return {code << 16, 2};
 }
 
 }  // namespace plr

@@ -5,13 +5,17 @@
 
 namespace plr {
 
-class OctetToUcs2Transform : public Stage<OctetToUcs2Transform> {
+class OctetToUcs2Transform : public UnitStage<OctetToUcs2Transform> {
   public:
     std::size_t convert(std::uint32_t* out, std::size_t most);
+    std::size_t convert(char16_t* out, std::size_t most);
 
   private:
-    std::size_t convertMemory(OctetSourceBuffer& memory, std::uint32_t* out, std::size_t most);
-    std::uint32_t unitOf(std::uint32_t high, std::uint32_t low);
+    template <class Code>
+    std::size_t convertAny(Code* out, std::size_t most);
+    template <class Code>
+    std::size_t convertMemory(OctetSourceBuffer& memory, Code* out, std::size_t most);
+    std::uint16_t unitOf(std::uint32_t high, std::uint32_t low);
 };
 
 class Ucs2ToOctetTransform : public OctetStage<Ucs2ToOctetTransform> {
@@ -21,10 +25,6 @@ class Ucs2ToOctetTransform : public OctetStage<Ucs2ToOctetTransform> {
     std::size_t convert(char* out, std::size_t most);
 
   private:
-    std::size_t convertCodes(const std::uint32_t* codes, std::size_t length, char* out,
-                             std::size_t most);
-    octets::Few encode(std::uint32_t code);
-
     octets::Few rest_;  // of the last code, still to come
 };
 

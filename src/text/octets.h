@@ -47,6 +47,19 @@ inline void narrow(char* out, const std::uint32_t* codes, std::size_t length) no
         out[i] = static_cast<char>(codes[i]);
 }
 
+// Of each code the low 16 bits.
+inline void narrowUnits(char16_t* out, const std::uint32_t* codes, std::size_t length) noexcept {
+    std::size_t i = 0;
+    for (; i + kBlock <= length; i += kBlock) {
+        std::array<char16_t, kBlock> block;
+        for (std::size_t k = 0; k < kBlock; ++k)
+            block[k] = static_cast<char16_t>(codes[i + k]);
+        std::memcpy(out + i, block.data(), sizeof(block));
+    }
+    for (; i < length; ++i)
+        out[i] = static_cast<char16_t>(codes[i]);
+}
+
 // Whether none of a block of codes has a bit that is not in `mask`.
 inline bool blockFits(const std::uint32_t* codes, std::uint32_t mask) noexcept {
     std::uint32_t all = 0;

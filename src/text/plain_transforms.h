@@ -6,8 +6,9 @@ namespace plr {
 
 // Codes up to `greatest` as they are; `replacement` for others, which are marked.
 template <std::uint32_t greatest, std::uint32_t replacement>
-class BoundedTransform : public Stage<BoundedTransform<greatest, replacement>> {
+class BoundedTransform : public UnitStage<BoundedTransform<greatest, replacement>> {
   public:
+    using UnitStage<BoundedTransform>::convert;
     std::size_t convert(std::uint32_t* out, std::size_t most) {
         const std::size_t codes = this->pull(out, most);
         for (std::size_t i = 0; i < codes; ++i) {

@@ -45,6 +45,30 @@ class Stage : public TextTransform {
     }
 };
 
+// A stage that delivers units and no pairs, by a convert() to codes. It may have one to units,
+// too, or take this one by `using UnitStage::convert;`.
+template <class Derived>
+class UnitStage : public Stage<Derived> {
+  public:
+    std::size_t nextUnits(char16_t* out, std::size_t most) final {
+        return this->deliver(out, most);
+    }
+    [[nodiscard]] bool deliversUnits() const noexcept final { return true; }
+
+    std::size_t convert(char16_t* out, std::size_t most) {
+        std::array<std::uint32_t, 512> codes;
+        std::size_t done = 0;
+        for (bool more = true; more && done < most;) {
+            const std::size_t wanted = std::min(most - done, codes.size());
+            const std::size_t got = static_cast<Derived*>(this)->convert(codes.data(), wanted);
+            octets::narrowUnits(out + done, codes.data(), got);
+            done += got;
+            more = got == wanted;
+        }
+        return done;
+    }
+};
+
 // A stage that delivers octets, by a convert() to characters, so that they need not pass as
 // codes. It may have one to codes, too, or take this one by `using OctetStage::convert;`.
 template <class Derived>

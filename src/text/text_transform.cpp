@@ -3,6 +3,7 @@
 #include <array>
 
 #include "src/text/octets.h"
+#include "src/text/utf16.h"
 
 namespace plr {
 
@@ -33,11 +34,23 @@ std::size_t TextTransform::nextChars(char* out, std::size_t most) {
     return done;
 }
 
+std::size_t TextTransform::nextUnits(char16_t* out, std::size_t most) {
+    const char16_t* const begin = out;
+    const char16_t* const end = out + most;
+    for (std::uint32_t code = 0; out < end && (code = nextCode()) != kEnd;)
+        out = utf16::put(out, code);
+    return static_cast<std::size_t>(out - begin);
+}
+
 OctetSourceBuffer* TextTransform::asOctetSource() noexcept {
     return nullptr;
 }
 
 bool TextTransform::deliversOctets() const noexcept {
+    return false;
+}
+
+bool TextTransform::deliversUnits() const noexcept {
     return false;
 }
 

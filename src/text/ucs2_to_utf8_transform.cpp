@@ -1,15 +1,12 @@
 #include "src/text/ucs2_to_utf8_transform.h"
 
-#include <array>
 #include <utility>
 
+#include "src/text/unit_pull.h"
 #include "src/text/utf16.h"
-#include "src/text/utf8_kernel.h"
 
 namespace plr {
 namespace {
-
-constexpr std::size_t kCodes = 256;  // at a time
 
 constexpr octets::Few kReplacement{0xEFBFBD00, 3};
 
@@ -34,63 +31,54 @@ octets::Few encodePair(std::uint32_t pair) {
 void Ucs2ToUtf8Transform::reset() {
     TextTransform::reset();
     rest_ = {};
-    held_ = kEnd;
+    heldLength_ = 0;
 }
 
+// A unit makes up to three octets, so a third as many are pulled as there is room for octets.
+// Where a high surrogate is last, the next unit is needed, too, and may have to be kept.
 std::size_t Ucs2ToUtf8Transform::convert(char* out, std::size_t most) {
-    std::array<std::uint32_t, kCodes> codes;
-    std::size_t done = rest_.take(out, most);
-    for (bool more = true; done < most && (more || held_ != kEnd);) {
-        if (held_ != kEnd) {
-            convertHeld();
-            done += rest_.take(out + done, most - done);
-            continue;
-        }
-        const std::size_t wanted = std::min((most - done + 3) / 4, kCodes);
-        const std::size_t got = pull(codes.data(), wanted);
-        done += convertCodes(codes.data(), got, out + done, most - done);
-        more = got == wanted;
+    std::array<char16_t, std::tuple_size_v<UnitBuffer> + 2> units;
+    char* const end = out + most;
+    char* next = out + rest_.take(out, most);
+    for (bool more = true; next != end && (more || heldLength_ != 0);) {
+        const std::size_t have = std::exchange(heldLength_, 0);
+        std::copy_n(held_.begin(), have, units.begin());
+        const std::size_t least = have == 1 && utf16::isHighSurrogate(units[0]) ? 2 : 1;
+        const auto room = static_cast<std::size_t>(end - next);
+        const std::size_t wanted = std::max(std::min((room + 2) / 3, kUnitsAtOnce), least);
+        const std::size_t missing = wanted - std::min(wanted, have);
+        const std::size_t got = pullUnits(*this, units.data() + have, missing);
+        more = got >= missing;
+        const char16_t* const stop = units.data() + have + got;
+        const bool waits = more && utf16::isHighSurrogate(stop[-1]);
+        utf8kernel::Encoding run{units.data(), stop - (waits ? 1 : 0), next, end};
+        convertUnits(run);
+        next = run.out;
+        heldLength_ = static_cast<std::size_t>(stop - run.in);
+        std::copy(run.in, stop, held_.begin());
     }
-    return done;
+    return static_cast<std::size_t>(next - out);
 }
 
-std::size_t Ucs2ToUtf8Transform::convertCodes(const std::uint32_t* codes, std::size_t length,
-                                              char* out, std::size_t most) {
-    std::size_t done = 0;
-    for (std::size_t i = 0; i < length;) {
-        utf8kernel::Encoding run{codes + i, codes + length, out + done, out + most};
+// As long as there is room.
+void Ucs2ToUtf8Transform::convertUnits(utf8kernel::Encoding& run) {
+    while (run.in != run.end && run.out != run.outEnd) {
         utf8kernel::kernel().encode(run);
-        i = static_cast<std::size_t>(run.in - codes);
-        done = static_cast<std::size_t>(run.out - out);
-        if (i == length)
+        if (run.in == run.end || run.out == run.outEnd)
             break;
-        std::uint32_t code = codes[i++];
-        if (utf16::isHighSurrogate(code)) {
-            if (i == length) {
-                held_ = code;
-                break;
-            }
-            if (utf16::isLowSurrogate(codes[i]))
-                code = utf16::pairOf(code, codes[i++]);
-        }
+        std::uint32_t code = *run.in++;
+        if (utf16::isHighSurrogate(code) && run.in != run.end && utf16::isLowSurrogate(*run.in))
+            code = utf16::pairOf(code, *run.in++);
         rest_ = encode(code);
-        done += rest_.take(out + done, most - done);
+        run.out += rest_.take(run.out, static_cast<std::size_t>(run.outEnd - run.out));
     }
-    return done;
-}
-
-void Ucs2ToUtf8Transform::convertHeld() {
-    std::uint32_t code = std::exchange(held_, kEnd);
-    if (utf16::isHighSurrogate(code) && pull(&held_, 1) != 0 && utf16::isLowSurrogate(held_))
-        code = utf16::pairOf(code, std::exchange(held_, kEnd));
-    rest_ = encode(code);
 }
 
 octets::Few Ucs2ToUtf8Transform::encode(std::uint32_t code) {
-    if (code < 0xD800 || code - 0xE000 < 0x2000)
-        return encodeUnit(code);
-    if (utf16::isPair(code))
+    if (code > 0xFFFF)
         return encodePair(code);
+    if (code >> 11 != 0xD800 >> 11)
+        return encodeUnit(code);
     markExceptionOccurred();
     return kReplacement;
 }

@@ -29,4 +29,20 @@ constexpr std::uint32_t characterOfPair(std::uint32_t pair) noexcept {
     return 0x10000 + ((pair >> 16 & 0x3FF) << 10) + (pair & 0x3FF);
 }
 
+// Whether one of 16 units is a surrogate.
+constexpr bool hasSurrogates(const char16_t* units) noexcept {
+    bool any = false;
+    for (int k = 0; k < 16; ++k)
+        any |= (units[k] & 0xF800) == 0xD800;
+    return any;
+}
+
+// Of a unit or pair its units; returns where they end.
+constexpr char16_t* put(char16_t* out, std::uint32_t code) noexcept {
+    if (code > 0xFFFF)
+        *out++ = static_cast<char16_t>(code >> 16);
+    *out++ = static_cast<char16_t>(code);
+    return out;
+}
+
 }  // namespace plr::utf16

@@ -40,23 +40,23 @@ constexpr std::uint32_t codeOf(std::uint32_t character) {
 
 }  // namespace
 
-std::size_t Utf8Decoder::decode(std::uint32_t* out, std::size_t most, bool atEnd) noexcept {
-    const std::uint32_t* const begin = out;
-    const std::uint32_t* const end = out + most;
-    while (out != end && next_ != end_) {
-        utf8kernel::Decoding run{next_, end_, out, out + (end - out)};
+std::size_t Utf8Decoder::decode(char16_t* out, std::size_t most, bool atEnd) noexcept {
+    const char16_t* const begin = out;
+    char16_t* const end = out + most;
+    while (out < end && next_ != end_) {
+        utf8kernel::Decoding run{next_, end_, out, end, pairs_};
         kernel_.decode(run);
         next_ = run.in;
         out = run.out;
-        if (out == end || next_ == end_ || !decodeOne(*out, atEnd))
+        pairs_ = run.pairs;
+        if (out == end || next_ == end_ || !decodeOne(out, atEnd))
             break;
-        ++out;
     }
     return static_cast<std::size_t>(out - begin);
 }
 
 // False, with nothing read, where more octets decide.
-bool Utf8Decoder::decodeOne(std::uint32_t& out, bool atEnd) noexcept {
+bool Utf8Decoder::decodeOne(char16_t*& out, bool atEnd) noexcept {
     const Sequence& sequence = kSequences[*next_];
     std::uint32_t character = *next_ & (0x7FU >> (sequence.length == 1 ? 0 : sequence.length));
     std::size_t i = 1;
@@ -70,7 +70,8 @@ bool Utf8Decoder::decodeOne(std::uint32_t& out, bool atEnd) noexcept {
     const bool wellFormed = i == sequence.length;
     if (!wellFormed && i == left() && i < sequence.length && !atEnd)
         return false;
-    out = wellFormed ? codeOf(character) : utf16::kReplacement;
+    out = utf16::put(out, wellFormed ? codeOf(character) : utf16::kReplacement);
+    pairs_ += wellFormed && character > 0xFFFF ? 1 : 0;
     marked_ |= !wellFormed;
     next_ += i;
     return true;

@@ -14,19 +14,19 @@
 // Cost:    bench/text_pelorin.cpp.
 namespace plr::utf8kernel {
 
-// Where it stands in octets, and in the units and pairs (utf16.h) they become.
+// Where it stands in octets, and in the UTF-16 they become; and how many pairs that has.
 struct Decoding {
     const unsigned char* in;
     const unsigned char* end;
-    std::uint32_t* out;
-    std::uint32_t* outEnd;
+    char16_t* out;
+    char16_t* outEnd;
+    std::size_t pairs = 0;
 };
 
-// Where it stands in units and pairs, and in the octets they become. Two units may be one
-// character.
+// Where it stands in UTF-16, and in the octets it becomes.
 struct Encoding {
-    const std::uint32_t* in;
-    const std::uint32_t* end;
+    const char16_t* in;
+    const char16_t* end;
     char* out;
     char* outEnd;
 };

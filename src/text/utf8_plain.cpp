@@ -14,7 +14,7 @@ constexpr bool isTrail(unsigned octet) {
     return (octet & 0xC0) == 0x80;
 }
 
-// Reads a character of more than one octet. False where it is ill-formed.
+// Reads a character of more than one octet, as a code. False where it is ill-formed.
 inline bool decodeLong(const unsigned char*& in, std::uint32_t& out) {
     const std::uint32_t first = in[0];
     const std::uint32_t second = in[1] & 0x3FU;
@@ -61,45 +61,44 @@ constexpr Octets octetsOf(std::uint32_t character) {
 
 bool decodeBlock(Decoding& run) noexcept {
     if (isAsciiBlock(run.in)) {
-        octets::widenBlock(run.out, run.in);
+        for (std::size_t k = 0; k < kBlock; ++k)
+            run.out[k] = run.in[k];
         run.in += kBlock;
         run.out += kBlock;
         return true;
     }
-    // Until no character of four octets fits any more. Locals stay in registers.
+    // Until no character of four octets fits any more. A local stays in registers.
     const unsigned char* in = run.in;
-    std::uint32_t* out = run.out;
-    bool good = true;
-    for (const unsigned char* const stop = in + kBlock - 3; good && in < stop;) {
-        const unsigned char* next = in;
-        if (*in < 0x80)
-            *out = *next++;
-        else
-            good = decodeLong(next, *out);
-        in = good ? next : in;
-        out += good ? 1 : 0;
+    for (const unsigned char* const stop = in + kBlock - 3; in < stop; run.in = in) {
+        std::uint32_t code = *in;
+        if (code < 0x80)
+            ++in;
+        else if (!decodeLong(in, code))
+            return false;
+        run.out = utf16::put(run.out, code);
+        run.pairs += code > 0xFFFF ? 1 : 0;
     }
-    run.in = in;
-    run.out = out;
-    return good;
+    return true;
 }
 
 bool encodeBlock(Encoding& run) noexcept {
-    if (octets::blockFits(run.in, 0x7F)) {
-        octets::narrowBlock(run.out, run.in);
+    std::uint32_t all = 0;
+    for (std::size_t k = 0; k < kBlock; ++k)
+        all |= run.in[k];
+    if (all < 0x80) {
+        for (std::size_t k = 0; k < kBlock; ++k)
+            run.out[k] = static_cast<char>(run.in[k]);
         run.in += kBlock;
         run.out += kBlock;
         return true;
     }
-    // Until two codes, which may be one character, do not fit any more.
-    for (const std::uint32_t* const stop = run.in + kBlock - 1; run.in < stop; ++run.in) {
+    // Until two units, which may be one character, do not fit any more.
+    for (const char16_t* const stop = run.in + kBlock - 1; run.in < stop; ++run.in) {
         std::uint32_t code = *run.in;
-        if (utf16::isPair(code)) {
-            code = utf16::characterOfPair(code);
-        } else if (utf16::isHighSurrogate(code) && utf16::isLowSurrogate(run.in[1])) {
+        if (code >> 11 == 0xD800 >> 11) {
+            if (!utf16::isPair(utf16::pairOf(code, run.in[1])))
+                return false;
             code = utf16::characterOfPair(utf16::pairOf(code, *++run.in));
-        } else if (code > 0xFFFF || code >> 11 == 0xD800 >> 11) {
-            return false;
         }
         const Octets encoded = octetsOf(code);
         const std::uint32_t bits = octets::firstLowest(encoded.bits);

@@ -5,7 +5,7 @@
 #include "src/text/utf8_kernel.h"
 
 // One character at a time. A block is what the vector kernels leave to this: so many octets
-// or codes, for which there is room whatever they become.
+// or units, for which there is room whatever they become.
 namespace plr::utf8kernel {
 
 inline constexpr std::size_t kBlock = octets::kBlock;

@@ -10,10 +10,19 @@ class Utf8ToUcs2Transform : public Stage<Utf8ToUcs2Transform> {
   public:
     void reset() override;
     std::size_t convert(std::uint32_t* out, std::size_t most);
+    std::size_t nextUnits(char16_t* out, std::size_t most) override;
+    [[nodiscard]] bool deliversUnits() const noexcept override;
 
   private:
-    std::size_t convertMemory(OctetSourceBuffer& memory, std::uint32_t* out, std::size_t most);
-    std::size_t convertPulled(std::uint32_t* out, std::size_t most);
+    struct Run {
+        std::size_t units = 0;
+        std::size_t pairs = 0;  // among them
+    };
+
+    // As TextTransform::nextUnits(), without a look at the count.
+    Run convertUnits(char16_t* out, std::size_t most);
+    Run convertMemory(OctetSourceBuffer& memory, char16_t* out, std::size_t most);
+    Run convertPulled(char16_t* out, std::size_t most);
     std::size_t pullOctets(unsigned char* octets, std::size_t most);
 
     static constexpr std::size_t kPulled = 256;  // octets at a time

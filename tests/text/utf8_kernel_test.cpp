@@ -14,24 +14,24 @@ namespace {
 
 using namespace plr;
 using utf8kernel::Kernel;
-using Codes = std::vector<std::uint32_t>;
 
 constexpr Kernel kNone{"none", [](utf8kernel::Decoding&) noexcept {},
                        [](utf8kernel::Encoding&) noexcept {}};
 
 struct Decoded {
-    Codes codes;
+    std::u16string units;
+    std::size_t pairs;
     bool isMarked;
     std::size_t used;
     bool operator==(const Decoded&) const = default;
 };
 
-// Up to `most` codes of octets that fill their memory.
+// Up to `most` units, or one more, of octets that fill their memory.
 Decoded decode(const Kernel& kernel, const std::vector<unsigned char>& octets, std::size_t most) {
     Utf8Decoder decoder(octets, kernel);
-    Codes codes(most);
-    codes.resize(decoder.decode(codes.data(), most, true));
-    return {codes, decoder.isMarked(), decoder.used()};
+    std::u16string units(most + 1, 0);
+    units.resize(decoder.decode(units.data(), most, true));
+    return {units, decoder.pairs(), decoder.isMarked(), decoder.used()};
 }
 
 void expectAlike(const std::vector<unsigned char>& octets, std::size_t most) {
@@ -110,41 +110,45 @@ TEST(Utf8Kernel, MixedTextsWholeAndSpoilt) {
     }
 }
 
-// Codes go in as they are, and pairs as two units, too. What a kernel makes of them is
-// right, and it stops before what it must not convert, and near the end otherwise.
+// What a kernel makes of UTF-16 is right, and it stops before what it must not convert, and near
+// the end otherwise.
 TEST(Utf8Kernel, EncodesUpToWhatIsNoCharacter) {
     Random random;
     for (int i = 0; i < 20000; ++i) {
-        Codes codes;
-        std::vector<std::string> characters;  // by code; empty for the second of two
+        std::vector<char16_t> units;
+        std::vector<std::string> characters;  // by unit; empty for the first of two
         const std::uint32_t length = random(100);
-        while (codes.size() < length) {
+        while (units.size() < length) {
             const std::uint32_t code = random.code();
-            if (utf16::isPair(code) && i % 2 == 0) {
-                codes.push_back(code >> 16);
-                characters.push_back(octetsOf(code));
+            if (utf16::isPair(code)) {
+                units.push_back(static_cast<char16_t>(code >> 16));
+                characters.emplace_back();
             }
-            codes.push_back(utf16::isPair(code) && i % 2 == 0 ? code & 0xFFFF : code);
-            characters.push_back(codes.back() == code ? octetsOf(code) : std::string());
+            units.push_back(static_cast<char16_t>(code));
+            characters.push_back(octetsOf(code));
         }
-        std::size_t bad = codes.size();
-        if (!codes.empty() && i % 3 == 0) {
-            constexpr std::uint32_t kBad[] = {0x10000, 0xFFFFFFFF, 0xD800D800, 0xD800, 0xDFFF};
+        std::size_t bad = units.size();
+        if (!units.empty() && i % 3 == 0) {
             bad = random(static_cast<std::uint32_t>(bad));
-            codes[bad] = kBad[random(i % 2 == 0 ? 3 : 5)];  // beside a half it would be one
+            bad -= utf16::isLowSurrogate(units[bad]) ? 1 : 0;
+            units[bad] = i % 2 == 0 ? 0xDFFF : u'x';  // a low one without its high one
+            if (i % 2 != 0)
+                units[bad] = bad + 1 < units.size() && utf16::isLowSurrogate(units[bad + 1])
+                                 ? 0xDC00
+                                 : 0xD800;
         }
         for (const Kernel& kernel : utf8kernel::kernels()) {
-            std::vector<char> out(4 * codes.size());
-            utf8kernel::Encoding run{codes.data(), codes.data() + codes.size(), out.data(),
+            std::vector<char> out(4 * units.size());
+            utf8kernel::Encoding run{units.data(), units.data() + units.size(), out.data(),
                                      out.data() + out.size()};
             kernel.encode(run);
-            const auto read = static_cast<std::size_t>(run.in - codes.data());
+            const auto read = static_cast<std::size_t>(run.in - units.data());
             std::string expected;
             for (std::size_t k = 0; k < read; ++k)
                 expected += characters[k];
             ASSERT_EQ(std::string(out.data(), run.out), expected) << kernel.name << " " << i;
             ASSERT_LE(read, bad) << kernel.name;
-            ASSERT_GE(read + 1, std::min(bad, codes.size() < 16 ? 0 : codes.size() - 15))
+            ASSERT_GE(read + 1, std::min(bad, units.size() < 16 ? 0 : units.size() - 15))
                 << kernel.name;
         }
     }

@@ -42,11 +42,18 @@ class PLR_EXPORT TextTransform {
     virtual std::size_t nextCodes(std::uint32_t* out, std::size_t most);
     // The same, of each code the low 8 bits. By default of blocks of nextCodes().
     virtual std::size_t nextChars(char* out, std::size_t most);
+    // The same as UTF-16: codes until there are `most` units, or one more where a pair is last;
+    // there is room for that. Returns the number of units; fewer than `most` mean the end.
+    // By default by nextCode().
+    virtual std::size_t nextUnits(char16_t* out, std::size_t most);
     // This stage where it is the bottom one, whose octets lie in memory and need not be
     // copied; null elsewhere.
     virtual OctetSourceBuffer* asOctetSource() noexcept;
     // Whether no code is above 0xFF, so that nextChars() loses nothing. By default false.
     [[nodiscard]] virtual bool deliversOctets() const noexcept;
+    // Whether every code is a unit or a pair, so that nextUnits() loses nothing. By default
+    // false.
+    [[nodiscard]] virtual bool deliversUnits() const noexcept;
 
     // How many more codes it may deliver; any number if `codes` is negative.
     void setCount(int codes) noexcept { count = codes; }
