@@ -23,15 +23,11 @@
 namespace {
 
 constexpr const char* kService = "net.example.radio";
-constexpr auto kMostTime = std::chrono::minutes(1);  // for one message
-
 using Language = plr::TextConverter::NationalLanguageId;
-
 struct Options {
     bool print = false;
     std::vector<Language> languages;
-    std::string number;
-    std::string text;
+    std::string number, text;
 };
 
 std::optional<Language> languageOf(const std::string& name) {
@@ -56,7 +52,7 @@ std::optional<Options> parse(const std::vector<std::string>& words) {
     if (words.size() != i + 2)
         return std::nullopt;
     options.number = words[i];
-    options.text = words[i + 1];
+    options.text = words.back();
     return options;
 }
 
@@ -70,27 +66,24 @@ std::vector<std::string> pdusOf(const Options& options) {
                ", left: " + std::to_string(size.unitsLeft));
     std::vector<std::string> pdus;
     const auto number = static_cast<std::uint16_t>(std::random_device()());
-    for (const plr::SmsPart& part :
-         plr::encodeSms(options.text, encoding, plr::SmsReference::k8Bit, number)) {
-        const auto pdu = radio::writeSubmit(options.number, part);
-        if (!pdu)
-            return {};
-        pdus.push_back(plr::hex(*pdu));
-    }
+    const auto parts = plr::encodeSms(options.text, encoding, plr::SmsReference::k8Bit, number);
+    for (const plr::SmsPart& part : parts)
+        if (const auto pdu = radio::writeSubmit(options.number, part))
+            pdus.push_back(plr::hex(*pdu));
     return pdus;
 }
 
 plr::Result<vox::object> request(const std::vector<std::string>& pdus) {
+    const auto value = vox::array::create();
+    for (const std::string& pdu : pdus)
+        value.append(vox::string(pdu));
     const auto queue = dispatch::queue::create("radio_send");
     const plr::RestModule rest(queue, "radio_send");
     const dispatch::group open;
     plr::Result<vox::object> answer;
-    const auto value = vox::array::create();
-    for (const std::string& pdu : pdus)
-        value.append(vox::string(pdu));
     queue.sync([&] {
         rest.connect(vox::connection::create(kService));
-        rest.sendRequest("/requests/send_sms", value, kMostTime * static_cast<int>(pdus.size()),
+        rest.sendRequest("/requests/send_sms", value, std::chrono::minutes(pdus.size()),
                          [&, session = dispatch::group_session(open)](
                              const plr::Result<vox::object>& result) { answer = result; });
     });
