@@ -1,4 +1,5 @@
-# The two libraries that users link, shared and static, and their installation.
+# The libraries that users link, and their installation: two, shared and static, and
+# one for tests.
 
 find_package(Threads REQUIRED)
 set(header_dir ${CMAKE_INSTALL_INCLUDEDIR}/pelorin)
@@ -41,6 +42,19 @@ if(has_upper)
   set_target_properties(pelorin_static PROPERTIES EXPORT_NAME pelorin-static)
   add_library(Pelorin::pelorin ALIAS pelorin)
   list(APPEND installed pelorin pelorin_static)
+
+  # For tests, an archive that goes with either kind: users link the kind.
+  pelorin_library(pelorin_testing STATIC pelorin-test test)
+  set_target_properties(pelorin_testing PROPERTIES EXPORT_NAME test-archive)
+  list(APPEND installed pelorin_testing)
+  foreach(kind "" _static)
+    string(REPLACE _ - suffix "${kind}")
+    add_library(pelorin_test_kit${kind} INTERFACE)
+    target_link_libraries(pelorin_test_kit${kind} INTERFACE pelorin_testing pelorin${kind})
+    set_target_properties(pelorin_test_kit${kind} PROPERTIES EXPORT_NAME test${suffix})
+    add_library(Pelorin::test${suffix} ALIAS pelorin_test_kit${kind})
+    list(APPEND installed pelorin_test_kit${kind})
+  endforeach()
 endif()
 
 include(CMakePackageConfigHelpers)
@@ -52,7 +66,7 @@ write_basic_package_version_file(${PROJECT_BINARY_DIR}/PelorinConfigVersion.cmak
   COMPATIBILITY SameMinorVersion)
 install(FILES ${PROJECT_BINARY_DIR}/PelorinConfig.cmake ${PROJECT_BINARY_DIR}/PelorinConfigVersion.cmake
   DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/Pelorin)
-foreach(pc pelorin pelorin-platform)
+foreach(pc pelorin pelorin-platform pelorin-test)
   configure_file(${PROJECT_SOURCE_DIR}/cmake/${pc}.pc.in ${PROJECT_BINARY_DIR}/${pc}.pc @ONLY)
   install(FILES ${PROJECT_BINARY_DIR}/${pc}.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
 endforeach()

@@ -685,3 +685,25 @@ pelorin_component(umbrella LEVEL 9 LIBRARY pelorin
     include/plr/qf.h
     include/plr/rest.h
     include/plr/text.h)
+
+# For users' tests, and our own: a library by itself, on top of all the others.
+pelorin_component(test LEVEL 10 LIBRARY test
+  HEADERS
+    include/plr/test.h
+    include/plr/test/fake_rest.h
+    include/plr/test/fake_transport.h
+    include/plr/test/faulty_transport.h
+    include/plr/test/manual_calendar.h
+    include/plr/test/manual_clock.h
+    include/plr/test/modem_script.h
+    include/plr/test/recording_log_writer.h
+    include/plr/test/scripted_modem.h
+    include/plr/test/virtual_time.h
+    include/plr/test/vox_peer.h
+    include/plr/test/waiting.h
+  SOURCES
+    src/test/faulty_transport.cpp
+    src/test/modem_script.cpp
+    src/test/scripted_modem.cpp
+    src/test/virtual_time.cpp
+    src/test/vox_peer.cpp)

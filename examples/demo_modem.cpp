@@ -1,5 +1,5 @@
 // modem: a modem behind a pseudo terminal, for radiod and for whoever has none at hand.
-// It speaks AT from a script (tests/support/modem_script.h).
+// It speaks AT from a script (plr/test/modem_script.h).
 //
 //   modem --script FILE --link PATH [--lines FIFO]
 //
@@ -18,7 +18,7 @@
 #include <thread>
 
 #include "examples/end_signals.h"
-#include "support/scripted_modem.h"
+#include "plr/test/scripted_modem.h"
 
 namespace {
 

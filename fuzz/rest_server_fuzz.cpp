@@ -8,7 +8,7 @@
 
 #include "platform/linux/vox/codec.h"
 #include "plr/rest.h"
-#include "tests/support/fake_rest.h"
+#include "plr/test/fake_rest.h"
 
 // Whole REST messages into a server in this process: nothing that decodes may
 // end it, and nothing that decodes may make a resource throw. The input is one

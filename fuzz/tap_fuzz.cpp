@@ -11,7 +11,7 @@
 
 #include "Pelorin"
 #include "plr/base/assert.h"
-#include "tests/support/fake_transport.h"
+#include "plr/test/fake_transport.h"
 #include "tests/support/tap_records.h"
 
 namespace {

@@ -6,8 +6,8 @@
 #include <cerrno>
 #include <utility>
 
+#include "plr/test/manual_calendar.h"
 #include "support/fake_log.h"
-#include "support/manual_calendar.h"
 
 namespace {
 

@@ -6,7 +6,7 @@
 #include <limits>
 
 #include "plr/concurrency/dispatch_timer_service.h"
-#include "support/manual_calendar.h"
+#include "plr/test/manual_calendar.h"
 #include "support/waiting.h"
 
 namespace {

@@ -2,7 +2,7 @@
 #include <vector>
 
 #include "dispatch/dispatch.h"
-#include "support/manual_calendar.h"
+#include "plr/test/manual_calendar.h"
 #include "support/waiting.h"
 
 namespace {

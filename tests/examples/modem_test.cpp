@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "support/scripted_modem.h"
+#include "plr/test/scripted_modem.h"
 #include "support/waiting.h"
 
 namespace radio {

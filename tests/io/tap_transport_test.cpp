@@ -10,9 +10,9 @@
 #include <vector>
 
 #include "Pelorin"
+#include "plr/test/fake_transport.h"
 #include "src/io/secret_mask.h"
 #include "support/failing_allocations.h"
-#include "support/fake_transport.h"
 #include "support/tap_records.h"
 
 namespace {

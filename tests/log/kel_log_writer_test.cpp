@@ -8,8 +8,8 @@
 #include <string>
 #include <utility>
 
+#include "plr/test/manual_calendar.h"
 #include "support/fake_log.h"
-#include "support/manual_calendar.h"
 
 namespace {
 

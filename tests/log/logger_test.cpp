@@ -11,8 +11,8 @@
 #include "plr/log/log_message.h"
 #include "plr/log/staged_logger.h"
 #include "plr/log/static_logger.h"
+#include "plr/test/manual_calendar.h"
 #include "support/log_fixture.h"
-#include "support/manual_calendar.h"
 #include "support/waiting.h"
 
 namespace {

@@ -8,7 +8,7 @@
 #include <set>
 #include <tuple>
 
-#include "support/fake_rest.h"
+#include "plr/test/fake_rest.h"
 #include "support/sanitized.h"
 
 // Random clients and providers against a model of assertions: after every step the

@@ -10,7 +10,7 @@
 
 #include "plr/rest/auto_reply.h"
 #include "plr/rest/value_coding.h"
-#include "support/fake_rest.h"
+#include "plr/test/fake_rest.h"
 
 namespace {
 

@@ -7,7 +7,7 @@
 #include <random>
 
 #include "plr/rest/property_resource.h"
-#include "support/fake_rest.h"
+#include "plr/test/fake_rest.h"
 #include "support/sanitized.h"
 #include "tests/rest/property_model.h"
 

@@ -11,7 +11,7 @@
 #include <optional>
 
 #include "plr/rest.h"
-#include "support/fake_rest.h"
+#include "plr/test/fake_rest.h"
 #include "support/module_client.h"
 #include "support/runtime.h"
 #include "support/sanitized.h"

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "support/fake_rest.h"
+#include "plr/test/fake_rest.h"
 
 namespace {
 

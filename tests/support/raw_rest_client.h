@@ -3,7 +3,7 @@
 #include <future>
 #include <string_view>
 
-#include "support/fake_rest.h"
+#include "plr/test/fake_rest.h"
 #include "support/waiting.h"
 
 namespace plr::test {

@@ -1,4 +1,4 @@
-#include "support/modem_script.h"
+#include "plr/test/modem_script.h"
 
 #include <strings.h>
 

@@ -1,4 +1,4 @@
-#include "support/scripted_modem.h"
+#include "plr/test/scripted_modem.h"
 
 #include <fcntl.h>
 #include <poll.h>

@@ -10,7 +10,7 @@
 #include <thread>
 #include <vector>
 
-#include "support/modem_script.h"
+#include "plr/test/modem_script.h"
 
 // A modem behind a pseudo terminal that speaks AT from a script, for tests of what
 // talks to one. Clients open, close and open path() as they like.
