@@ -24,6 +24,22 @@ bool assignWord(bool& out, QfStringRef text) {
     return true;
 }
 
+// Deliberate: 0 comes first, so a failed call leaves it.
+template <class T>
+bool assignNumber(T& out, const void* value, QfNumberType type, T (*numberIn)(QfStringRef)) {
+    out = 0;
+    if (const QfNumberRef number = typed<Number>(value))
+        return qf_number_get_value(number, type, &out);
+    if (const QfStringRef text = typed<String>(value)) {
+        out = numberIn(text);
+        return true;
+    }
+    bool truth = false;
+    const bool isBoolean = assign(truth, typed<Boolean>(value));
+    out = truth;
+    return isBoolean;
+}
+
 }  // namespace
 
 bool assign_loosely(bool& out, const void* value) {
@@ -39,31 +55,11 @@ bool assign_loosely(bool& out, const void* value) {
 }
 
 bool assign_loosely(int& out, const void* value) {
-    out = 0;
-    if (const QfNumberRef number = typed<Number>(value))
-        return qf_number_get_value(number, kQfNumberSInt32Type, &out);
-    if (const QfStringRef text = typed<String>(value)) {
-        out = qf_string_get_int_value(text);
-        return true;
-    }
-    bool truth = false;
-    const bool isBoolean = assign(truth, typed<Boolean>(value));
-    out = truth;
-    return isBoolean;
+    return assignNumber(out, value, kQfNumberSInt32Type, &qf_string_get_int_value);
 }
 
 bool assign_loosely(double& out, const void* value) {
-    out = 0;
-    if (const QfNumberRef number = typed<Number>(value))
-        return qf_number_get_value(number, kQfNumberDoubleType, &out);
-    if (const QfStringRef text = typed<String>(value)) {
-        out = qf_string_get_double_value(text);
-        return true;
-    }
-    bool truth = false;
-    const bool isBoolean = assign(truth, typed<Boolean>(value));
-    out = truth;
-    return isBoolean;
+    return assignNumber(out, value, kQfNumberDoubleType, &qf_string_get_double_value);
 }
 
 }  // namespace plr::qf

@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <string>
 #include <utility>
 
 #include "plr/concurrency/qf_shared_ref.h"
@@ -56,33 +55,18 @@ TEST_F(SharedRefTest, CopiesRetainAndMovesDoNot) {
     EXPECT_EQ(count(), 2);
 }
 
-TEST_F(SharedRefTest, ChecksTheTypeOfCreatedValues) {
-    qf_retain(string_);
-    const Text fits{_Created<const void>(string_)};
-    EXPECT_EQ(fits.get(), string_);
+TEST_F(SharedRefTest, AdoptsAnyCreatedValueWhenUntyped) {
+    const QfSharedRef<const void> untyped{_Created<const void>(qf_retain(string_))};
+    EXPECT_EQ(untyped.get(), string_);
     EXPECT_EQ(count(), 2);
-
-    const QfNumberRef number = qf_number_create_int64(5);
-    qf_retain(number);  // the created reference
-    const Text doesNot{_Created<const void>(number)};
-    EXPECT_EQ(doesNot.get(), nullptr);
-    EXPECT_EQ(qf_get_retain_count(number), 1);
-
-    const QfSharedRef<const void> untyped{_Created<const void>(number)};
-    EXPECT_EQ(untyped.get(), number);
-    EXPECT_FALSE(Text{_Created<const void>(nullptr)});
 }
 
-TEST(Qf, ValuesKeepTheirContentAndType) {
-    const Text text{_Created<plr::qf::String>(qf_string_create_with_length("a\0b", 3))};
-    EXPECT_EQ(std::string(qf_string_get_string_ptr(text.get()), qf_string_get_length(text.get())),
-              std::string("a\0b", 3));
-    const QfSharedRef<plr::qf::Number> number{
-        _Created<plr::qf::Number>(qf_number_create_int64(-5))};
-    EXPECT_EQ(qf_number_get_int64(number.get()), -5);
-    EXPECT_EQ(qf_get_type_id(text.get()), qf_string_get_type_id());
-    EXPECT_EQ(qf_get_type_id(number.get()), qf_number_get_type_id());
-    EXPECT_NE(qf_string_get_type_id(), qf_number_get_type_id());
+TEST_F(SharedRefTest, DetachesWithoutReleasing) {
+    Text text(string_);
+    EXPECT_EQ(text.detach(), string_);
+    EXPECT_FALSE(text);
+    EXPECT_EQ(count(), 2);
+    qf_release(string_);
 }
 
 }  // namespace
