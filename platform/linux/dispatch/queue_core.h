@@ -36,6 +36,9 @@
 //
 // A drainer owns the queue and all its targets; a sync() too.
 //
+// model/queue.pml is all of this as a model that is checked exhaustively; each of its
+// steps names the function here. Who changes the one changes the other.
+//
 // A queue whose last target is a pump's (dispatch/pump.h) is activated there instead
 // of in the pool. Only the thread that serves the pump ever owns it for running: a
 // sync() from another thread hands its work over, so no waiter stands in such lists.

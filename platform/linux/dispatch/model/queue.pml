@@ -1,0 +1,751 @@
+/*
+ * The state machine of a queue (queue_core.h) as a model that spin checks
+ * exhaustively: every order in which the atomic steps of a few threads can
+ * follow each other. tests/platform/queue_model_test.py runs it; each step names the
+ * function of queue_core.cpp that it stands for. Who changes the one changes the
+ * other.
+ *
+ * What is there: push, drain in batches, queues with a target (ROOT is CHILD's),
+ * sync, suspend and resume, the counts of handles and references, destruction.
+ * A queue's target never changes in its life, so nothing here changes it.
+ *
+ * What is not: orders weaker than sequential consistency (ThreadSanitizer's
+ * build has the tests for those), the sleeping and waking of workers (pool.h;
+ * here a worker comes whenever the pool has work), pumps, diagnostics, lingering.
+ *
+ * A configuration is given by macros:
+ *   CHILDREN          0: ROOT alone; 1: ROOT and CHILD
+ *   PRODUCER0/1       the queue to which it submits; ITEMS0/1: how many pieces
+ *   SYNCED            the queue on which SYNCS threads, 1 or 2, make a sync() each;
+ *                     SUBMITS_BEFORE: the only one submits a piece before
+ *   SUSPENDED         the queue that one thread suspends and resumes
+ * and one of the faults below may be put in, by FAULT_…, to see that the checks
+ * find it.
+ *
+ * Checked, by assertions in the steps, and at the end of `init`, when no thread can
+ * go on:
+ *   - a queue has one owner, and one piece of work of ROOT and CHILD runs at a
+ *     time;
+ *   - the pieces of one producer run in their order, once each; a sync() after
+ *     what its thread submitted before;
+ *   - once suspend() has returned, only a piece that is next may still start;
+ *   - everything submitted has run when nothing moves any more: no wake-up is lost;
+ *   - nobody touches a queue after its destruction or an item after its end, and
+ *     all queues are destroyed once, when the last handle and the last work went.
+ */
+#define ROOT  0
+#define CHILD 1
+#define QUEUES (1 + CHILDREN)
+
+/* Items. 0 is the null pointer. */
+#define STUB(q)       (1 + (q))
+#define PLACE         3 /* CHILD's, in ROOT's list; that of ROOT is `pooled` */
+#define FIRST_WAITER  4
+#define FIRST_CLOSURE 6
+#define CLOSURE(p, k) (FIRST_CLOSURE + 2 * (p) + (k))
+#define PRODUCER(x)   (((x) - FIRST_CLOSURE) / 2)
+#define NUMBER(x)     (((x) - FIRST_CLOSURE) % 2)
+#define ALL_ITEMS     10
+
+#define NOBODY        0 /* as the owner of a queue: that is `init` */
+#define ME            _pid
+/* The threads that make a sync() are started first, and have a waiter each. */
+#define MY_WAITER     (_pid + FIRST_WAITER - 1)
+#define THREAD_OF(x)  ((x) - FIRST_WAITER + 1)
+#define is_waiter(x)  (x >= FIRST_WAITER && x < FIRST_CLOSURE)
+
+#define BATCH QUEUES
+
+/* queue_core's fields. */
+byte tail[QUEUES];
+byte head[QUEUES];
+byte references[QUEUES];
+byte handles[QUEUES];
+byte suspensions[QUEUES]; /* suspension_'s count */
+bit parked[QUEUES];       /* suspension_'s kParked */
+bit counted[QUEUES];
+
+byte successor[ALL_ITEMS];
+bit pooled;  /* ROOT's place is in the pool's list */
+bit granted[ALL_ITEMS]; /* the waiters' */
+
+/* What the checks remember. */
+byte owner[QUEUES];
+bit destroyed[QUEUES];
+bit live[ALL_ITEMS];   /* closures, and waiters on their stacks */
+bit late[QUEUES];      /* suspended, and some piece has started since */
+byte ran[2];           /* of a producer's pieces */
+byte synced;
+
+#define alive(q) assert(!destroyed[q])
+#define exists(x) assert(x < FIRST_WAITER || live[x])
+
+/* ---- Pieces of work ---- */
+
+#define may_start(q) assert(suspensions[q] == 0 || !late[q])
+#define starts(q)    late[q] = suspensions[q] > 0
+
+inline begin_piece(q) {
+    assert(owner[q] == ME && owner[ROOT] == ME);
+    may_start(ROOT);
+    starts(ROOT);
+#if CHILDREN
+    if
+    :: q == CHILD -> may_start(CHILD)
+    :: else
+    fi;
+    starts(CHILD)
+#endif
+}
+
+/* item::run of a closure. */
+inline call(q, x) {
+    d_step {
+        begin_piece(q);
+        assert(live[x] && ran[PRODUCER(x)] == NUMBER(x));
+        ran[PRODUCER(x)]++
+    }
+}
+
+/* ---- Life ---- */
+
+/* release_reference() and ~queue_core() */
+inline release_root() {
+    d_step {
+        alive(ROOT);
+        assert(references[ROOT] > 0);
+        references[ROOT]--;
+        if
+        :: references[ROOT] == 0 -> assert(tail[ROOT] == 0 && handles[ROOT] == 0); destroyed[ROOT] = 1
+        :: else
+        fi
+    }
+}
+
+inline release_handle_of_root() {
+    d_step { alive(ROOT); handles[ROOT]--; answer = handles[ROOT] == 0 };
+    if
+    :: answer -> release_root()
+    :: else
+    fi
+}
+
+inline release_reference(q) {
+#if CHILDREN
+    if
+    :: q == ROOT -> release_root()
+    :: else ->
+        d_step {
+            alive(CHILD);
+            assert(references[CHILD] > 0);
+            references[CHILD]--;
+            answer = references[CHILD] == 0;
+            if
+            :: answer -> assert(tail[CHILD] == 0 && handles[CHILD] == 0); destroyed[CHILD] = 1
+            :: else
+            fi
+        };
+        if
+        :: answer -> release_handle_of_root()
+        :: else
+        fi
+    fi
+#else
+    release_root()
+#endif
+}
+
+/* release(): a handle goes */
+inline release(q) {
+    d_step { alive(q); handles[q]--; answer = handles[q] == 0 };
+    if
+    :: answer -> release_reference(q)
+    :: else
+    fi
+}
+
+/* push() by one who found the queue idle, or count_ownership(), in two steps */
+inline add_reference(q) {
+    d_step {
+        alive(q);
+#ifndef FAULT_OWNER_HOLDS_NO_REFERENCE
+        references[q]++
+#endif
+    }
+}
+
+/* ---- Suspension ---- */
+
+/* park() */
+inline park(q) {
+    d_step {
+        alive(q);
+#ifdef FAULT_PARKS_WHATEVER_THE_COUNT
+        answer = 1;
+#else
+        answer = suspensions[q] > 0;
+#endif
+        if
+        :: answer -> assert(owner[q] == ME); owner[q] = NOBODY; parked[q] = 1
+        :: else
+        fi
+    }
+}
+
+/* is_suspended(), then park() */
+inline park_if_suspended(q) {
+    if
+    :: suspensions[q] > 0 -> park(q)
+    :: else -> answer = 0
+    fi
+}
+
+/* suspend() */
+inline suspend(q) {
+    d_step { alive(q); suspensions[q]++; late[q] = 0 }
+}
+
+/* resume() */
+inline resume(q) {
+    d_step {
+        alive(q);
+        suspensions[q]--;
+        late[q] = 0;
+        answer = suspensions[q] == 0 && parked[q]
+    };
+#ifndef FAULT_RESUME_LEAVES_THE_QUEUE_PARKED
+    if
+    :: answer ->
+        d_step {
+            alive(q);
+            answer = suspensions[q] == 0 && parked[q];
+            if
+            :: answer -> assert(owner[q] == NOBODY); owner[q] = ME; parked[q] = 0
+            :: else
+            fi
+        };
+        if
+        :: answer -> activate(q)
+        :: else
+        fi
+    :: else
+    fi
+#endif
+}
+
+/* ---- The list ---- */
+
+/* push()'s exchange; who finds null is the owner and sets its fields */
+inline exchange_tail(q, x) {
+    d_step {
+        alive(q);
+        live[x] = 1;
+        successor[x] = 0;
+        previous = tail[q];
+        tail[q] = x;
+        if
+        :: previous == 0 -> assert(owner[q] == NOBODY); owner[q] = ME; head[q] = x; counted[q] = 1
+        :: else
+        fi;
+#if CHILDREN
+        if
+        :: x == PLACE -> assert(owner[CHILD] == ME); owner[CHILD] = NOBODY
+        :: else
+        fi
+#endif
+    }
+}
+
+inline link(x) {
+    d_step { exists(previous); successor[previous] = x }
+}
+
+/* activate() of a queue without target: pool::submit() */
+inline activate_root() {
+    park_if_suspended(ROOT);
+    if
+    :: answer
+    :: else -> d_step { alive(ROOT); assert(!pooled && owner[ROOT] == ME); owner[ROOT] = NOBODY; pooled = 1 }
+    fi
+}
+
+inline push_root(x) {
+    exchange_tail(ROOT, x);
+    if
+    :: previous -> link(x)
+    :: else -> add_reference(ROOT); activate_root()
+    fi
+}
+
+/* activate() */
+inline activate(q) {
+#if CHILDREN
+    if
+    :: q == ROOT -> activate_root()
+    :: else ->
+        park_if_suspended(CHILD);
+        if
+        :: answer
+        :: else -> push_root(PLACE)
+        fi
+    fi
+#else
+    activate_root()
+#endif
+}
+
+/* push() */
+inline push(q, x) {
+    exchange_tail(q, x);
+    if
+    :: previous ->
+        link(x)
+#ifdef FAULT_EVERY_PUSH_ACTIVATES
+        ; activate(q)
+#endif
+    :: else -> add_reference(q); activate(q)
+    fi
+}
+
+/* wait_for_next(): its spinning is waiting here */
+inline wait_for_next(x) {
+    d_step { successor[x] != 0 -> following = successor[x] }
+}
+
+/* detach(): head_ is the successor of `x`, or null with the stub in its place */
+inline detach(q, x) {
+    following = successor[x];
+    if
+    :: following
+    :: else ->
+        d_step {
+            alive(q);
+            answer = tail[q] == x;
+            if
+            :: answer -> tail[q] = STUB(q)
+            :: else
+            fi
+        };
+        if
+        :: answer
+        :: else -> wait_for_next(x)
+        fi
+    fi;
+    head[q] = following
+}
+
+/* attach() of the caller's waiter */
+inline attach(q) {
+    d_step { following = head[q]; live[MY_WAITER] = 1; successor[MY_WAITER] = 0 };
+    if
+    :: following
+    :: else ->
+        d_step {
+            alive(q);
+            answer = tail[q] == STUB(q);
+            if
+            :: answer -> tail[q] = MY_WAITER
+            :: else
+            fi
+        };
+        if
+        :: answer
+        :: else -> wait_for_next(STUB(q)); successor[STUB(q)] = 0
+        fi
+    fi;
+    d_step {
+        head[q] = MY_WAITER;
+        if
+        :: following -> successor[MY_WAITER] = following
+        :: else
+        fi
+    }
+}
+
+/* The compare-exchange of the tail to null: `answer` when ownership was given up */
+inline give_up(q, last) {
+    d_step {
+        alive(q);
+#ifdef FAULT_GIVES_UP_WITHOUT_COMPARING
+        answer = 1;
+#else
+        answer = tail[q] == last;
+#endif
+        if
+        :: answer -> tail[q] = 0; owner[q] = NOBODY; live[last] = 0
+        :: else
+        fi
+    }
+}
+
+/* take_after_stub(): `following` is 0 when ownership was given up */
+inline take_after_stub(q) {
+    following = successor[STUB(q)];
+    if
+    :: following
+    :: else ->
+        give_up(q, STUB(q));
+        if
+        :: answer
+        :: else -> wait_for_next(STUB(q))
+        fi
+    fi;
+    if
+    :: following -> successor[STUB(q)] = 0
+    :: else
+    fi
+}
+
+/* head_, or what comes after the stub */
+inline take_next(q) {
+    following = head[q];
+    if
+    :: following
+    :: else -> take_after_stub(q)
+    fi
+}
+
+/* ---- sync ---- */
+
+/* grant(): with the queue come its targets */
+inline grant(q, x) {
+    d_step {
+        exists(x);
+        assert(!granted[x] && owner[q] == ME && owner[ROOT] == ME);
+        granted[x] = 1;
+        owner[q] = THREAD_OF(x);
+        owner[ROOT] = THREAD_OF(x)
+    }
+}
+
+/* try_lock() */
+inline try_lock(q) {
+    d_step {
+        alive(q);
+        answer = tail[q] == 0;
+        if
+        :: answer -> assert(owner[q] == NOBODY); tail[q] = STUB(q); owner[q] = ME; counted[q] = 0; head[q] = 0
+        :: else
+        fi
+    }
+}
+
+/* waiter::wait(), and the end of the waiter's life */
+inline wait_until_granted() {
+    d_step { granted[MY_WAITER] -> granted[MY_WAITER] = 0; live[MY_WAITER] = 0; assert(owner[ROOT] == ME) }
+}
+
+/* wait_for_ownership() */
+inline wait_for_ownership(q) {
+    push(q, MY_WAITER);
+    wait_until_granted()
+}
+
+/* wait_for_resume() */
+inline wait_for_resume(q) {
+    attach(q);
+    count_ownership(q);
+#if CHILDREN
+    if
+    :: q == CHILD -> unlock_root()
+    :: else
+    fi;
+#endif
+    activate(q);
+    wait_until_granted()
+}
+
+inline count_ownership(q) {
+    if
+    :: counted[q]
+    :: else -> counted[q] = 1; add_reference(q)
+    fi
+}
+
+/* unlock() */
+inline unlock_root() {
+    was_counted = counted[ROOT];
+    take_next(ROOT);
+    if
+    :: following == 0 ->
+        if
+        :: was_counted -> release_root()
+        :: else
+        fi
+    :: else ->
+        head[ROOT] = following;
+        count_ownership(ROOT);
+        if
+        :: is_waiter(following) && suspensions[ROOT] == 0 ->
+            granted_next = following;
+            detach(ROOT, granted_next);
+            grant(ROOT, granted_next)
+        :: else -> activate_root()
+        fi
+    fi
+}
+
+#if CHILDREN
+inline unlock_child() {
+    was_counted = counted[CHILD];
+    take_next(CHILD);
+    if
+    :: following == 0 ->
+        if
+        :: was_counted -> release_reference(CHILD)
+        :: else
+        fi
+    :: else ->
+        head[CHILD] = following;
+        count_ownership(CHILD);
+        activate(CHILD)
+    fi
+}
+#endif
+
+/* ---- Threads ---- */
+
+/* One that submits: each in its turn, then it drops its handle. */
+inline produce(p, q, items) {
+    do
+    :: i == items -> break
+    :: else -> push(q, CLOSURE(p, i)); i++
+    od;
+    release(q)
+}
+
+#define LOCALS bit answer; bit was_counted; byte previous; byte following
+
+#ifdef PRODUCER0
+proctype producer0() {
+    LOCALS;
+    byte i;
+    produce(0, PRODUCER0, ITEMS0)
+}
+#endif
+#ifdef PRODUCER1
+proctype producer1() {
+    LOCALS;
+    byte i;
+    produce(1, PRODUCER1, ITEMS1)
+}
+#endif
+
+#ifdef SUSPENDED
+proctype suspender() {
+    LOCALS;
+    suspend(SUSPENDED);
+    resume(SUSPENDED);
+    release(SUSPENDED)
+}
+#endif
+
+#ifdef SYNCED
+/* run_sync(). What it submits before is producer 1's. */
+proctype syncer() {
+    LOCALS;
+    byte level; /* QUEUES for none */
+    byte below;
+    byte granted_next;
+#ifdef SUBMITS_BEFORE
+    push(SYNCED, CLOSURE(1, 0));
+#endif
+    /* lock_from_here() */
+    level = SYNCED;
+#if CHILDREN
+    if
+    :: level == CHILD -> try_lock(CHILD); level = (answer -> ROOT : CHILD)
+    :: else -> answer = 1
+    fi;
+    if
+    :: answer -> try_lock(ROOT); level = (answer -> QUEUES : ROOT)
+    :: else
+    fi;
+#else
+    try_lock(ROOT);
+    level = (answer -> QUEUES : ROOT);
+#endif
+    if
+    :: level == QUEUES
+    :: else -> wait_for_ownership(level)
+    fi;
+#ifndef FAULT_SYNC_LOOKS_AT_SUSPENSION_ONCE
+    below = SYNCED;
+    do
+    :: below == level -> break
+    :: else ->
+        if
+        :: suspensions[below] > 0 -> wait_for_resume(below); level = below; below = SYNCED
+        :: else -> below = (below == CHILD -> ROOT : QUEUES)
+        fi
+    od;
+#endif
+    atomic {
+        begin_piece(SYNCED);
+#ifdef SUBMITS_BEFORE
+        assert(ran[1] == 1);
+#endif
+        synced++
+    };
+    /* unlock_chain() */
+#if CHILDREN
+    if
+    :: SYNCED == CHILD -> unlock_child()
+    :: else
+    fi;
+#endif
+    unlock_root();
+    release(SYNCED)
+}
+#endif
+
+/* pool::run(), run_owned() of ROOT, and drain() of whichever `queue` is: ROOT, or
+   CHILD as a piece of ROOT's. Whether other work waits in
+   the pool when it is over is left open. */
+proctype worker() {
+    LOCALS;
+    byte queue;
+    byte work;
+    byte budget;
+end:
+    atomic { pooled -> pooled = 0 };
+    queue = ROOT;
+    budget = BATCH;
+
+drain:
+    atomic {
+        alive(queue);
+        assert(owner[queue] == NOBODY);
+        owner[queue] = ME;
+        work = head[queue]
+    };
+
+next_piece:
+    if
+    :: suspensions[queue] > 0 ->
+        head[queue] = work;
+        park(queue);
+        if
+        :: answer -> goto parked_or_idle
+        :: else
+        fi
+    :: else
+    fi;
+#if CHILDREN && !defined(FAULT_TARGETS_SUSPENSION_WAITS_FOR_THE_CHILD)
+    if
+    :: queue == CHILD && suspensions[ROOT] > 0 -> head[CHILD] = work; goto more
+    :: else
+    fi;
+#endif
+    if
+    :: budget > 0 -> budget--
+    :: budget == 0 -> head[queue] = work; goto more
+    :: budget == 0 -> budget = BATCH - 1
+    fi;
+    if
+    :: is_waiter(work) ->
+#ifdef FAULT_GRANTS_BEFORE_DETACHING
+        grant(queue, work);
+        detach(queue, work);
+#else
+        detach(queue, work);
+        grant(queue, work);
+#endif
+        goto end
+#if CHILDREN
+    :: work == PLACE -> /* run_nested() */
+        detach(ROOT, PLACE);
+        queue = CHILD;
+        goto drain
+#endif
+    :: work >= FIRST_CLOSURE ->
+        call(queue, work);
+        following = successor[work];
+        if
+        :: following
+        :: else ->
+            give_up(queue, work);
+            if
+            :: answer -> goto idle
+            :: else -> wait_for_next(work)
+            fi
+        fi;
+        d_step { live[work] = 0; work = following };
+        goto next_piece
+    fi;
+
+more:
+    activate(queue);
+    goto parked_or_idle;
+
+idle:
+    release_reference(queue);
+
+parked_or_idle: /* on with ROOT's list after a piece that was CHILD's */
+#if CHILDREN
+    if
+    :: queue == CHILD ->
+        queue = ROOT;
+        take_next(ROOT);
+        work = following;
+        if
+        :: work -> goto next_piece
+        :: else -> goto idle
+        fi
+    :: else
+    fi;
+#endif
+    goto end
+}
+
+/* Starts the threads, and looks once none of them can go on: each is at its end, or
+   waits for what nobody will do. */
+init {
+    atomic {
+        references[ROOT] = 1;
+        handles[ROOT] = CHILDREN;
+#if CHILDREN
+        references[CHILD] = 1;
+#endif
+#ifdef SYNCED
+        handles[SYNCED] = handles[SYNCED] + SYNCS;
+        run syncer();
+#if SYNCS == 2
+        run syncer();
+#endif
+#endif
+#ifdef PRODUCER0
+        handles[PRODUCER0]++;
+        run producer0();
+#endif
+#ifdef PRODUCER1
+        handles[PRODUCER1]++;
+        run producer1();
+#endif
+#ifdef SUSPENDED
+        handles[SUSPENDED]++;
+        run suspender();
+#endif
+        run worker();
+        run worker()
+    };
+    timeout;
+    d_step {
+#ifdef PRODUCER0
+        assert(ran[0] == ITEMS0);
+#endif
+#ifdef PRODUCER1
+        assert(ran[1] == ITEMS1);
+#endif
+#ifdef SUBMITS_BEFORE
+        assert(ran[1] == 1);
+#endif
+#ifdef SYNCED
+        assert(synced == SYNCS);
+#endif
+#if CHILDREN
+        assert(destroyed[CHILD]);
+#endif
+        assert(destroyed[ROOT])
+    }
+}
