@@ -24,16 +24,15 @@ bool assignWord(bool& out, QfStringRef text) {
     return true;
 }
 
-// Deliberate: 0 comes first, so a failed call leaves it.
 template <class T>
 bool assignNumber(T& out, const void* value, QfNumberType type, T (*numberIn)(QfStringRef)) {
-    out = 0;
     if (const QfNumberRef number = typed<Number>(value))
         return qf_number_get_value(number, type, &out);
     if (const QfStringRef text = typed<String>(value)) {
         out = numberIn(text);
         return true;
     }
+    // Deliberate: what is no boolean either leaves 0.
     bool truth = false;
     const bool isBoolean = assign(truth, typed<Boolean>(value));
     out = truth;
