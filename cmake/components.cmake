@@ -73,13 +73,6 @@ pelorin_component(platform_common LEVEL 1 LIBRARY platform
     platform/linux/common/key_index.cpp
     platform/linux/common/key_index.h)
 
-pelorin_component(platform_common LEVEL 1 LIBRARY platform
-  SOURCES
-    platform/linux/common/description.cpp
-    platform/linux/common/description.h
-    platform/linux/common/key_index.cpp
-    platform/linux/common/key_index.h)
-
 pelorin_component(vox_values LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/vox/value.h
@@ -200,7 +193,8 @@ pelorin_component(qf_core LEVEL 1 LIBRARY platform
     platform/linux/qf/string_number.cpp
     platform/linux/qf/url.cpp
     platform/linux/qf/value.cpp
-    platform/linux/qf/value.h)
+    platform/linux/qf/value.h
+    platform/linux/qf/vox_bridge.cpp)
 if(PELORIN_CHECKS)
   target_compile_definitions(component_qf_core PRIVATE PELORIN_CHECKS=1)  # counts values alive
 endif()
@@ -477,6 +471,12 @@ pelorin_component(qf_adapters LEVEL 3 LIBRARY pelorin
     src/qf/map_adapter.cpp
     src/qf/plist_adapter.cpp
     src/qf/show.cpp)
+
+pelorin_component(ipc_qf_bridge LEVEL 3 LIBRARY pelorin
+  HEADERS
+    include/plr/ipc/qf_bridge.h
+  SOURCES
+    src/ipc/qf_bridge.cpp)
 
 pelorin_component(format_log LEVEL 4 LIBRARY pelorin
   HEADERS

@@ -15,13 +15,18 @@
 // | date, data, string   | the same          | the same                      |
 // | array, dictionary    | the same, in order| the same                      |
 // | UUID                 | string, 36 characters, lower case | string        |
-// | error                | error, domain "vox"| error, code and description  |
+// | error                | error, domain "vox"| error, code and description, |
+// |                      |                   | which every Qf error has      |
 // | endpoint, fd, connection | nothing (null)| -                             |
 // | -                    | URL               | string                        |
 // | -                    | locale, formatter | nothing (null)                |
 //
-// What has no counterpart is left out of a collection. Collections deeper than
-// 64 levels, which no message can carry, convert to nothing.
+// What has no counterpart is left out of a dictionary, and null in an array, whose
+// other elements keep their places. So is an entry left out whose key has a NUL in
+// it, which no Vox key can. A value of collections more than 64 deep, which no
+// message can carry, converts to nothing, as a whole.
+//
+// Copies: what is made shares no bytes with what it was made from. Any thread.
 #ifdef __cplusplus
 extern "C" {
 #endif
