@@ -42,6 +42,8 @@ ASIO = "Asio strand"
 TBB = "oneTBB"
 SWAP = "mutex + deque swapped"
 MUTEX = "std::mutex lock + unlock"
+BLOCK = "a normal block's run"
+HOP = "from its end to the highest"
 EPOLL = "raw socket, epoll"
 BLOCKING = "raw socket, blocking"
 BATCHED = "raw socket, batched"
@@ -94,6 +96,10 @@ def dispatch():
                        MUTEX: Cell("dispatch_mutex", ("mutex",), "ns")},
                       (Bar((MUTEX,), 4.0, "at most 4 times"),))
     yield Measurement("dispatch", "post from outside and wait, one core", "us", queue_cells("outside", 1e-3))
+    highest = {OURS: "p99_us", BLOCK: "block_us", HOP: "hop_us"}
+    yield Measurement("dispatch", "highest block behind 100,000 normal ones, p99", "us",
+                      {peer: Cell("priority_pelorin", (), key) for peer, key in highest.items()},
+                      (Bar((BLOCK,), 1.1, "one block's run and a hop"),))
 
 
 def vox():
