@@ -19,6 +19,7 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
   HEADERS
     platform/include/dispatch/block.h
     platform/include/dispatch/calendar.h
+    platform/include/dispatch/diagnostics.h
     platform/include/dispatch/dispatch.h
     platform/include/dispatch/group.h
     platform/include/dispatch/main_queue.h
@@ -33,10 +34,13 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/deputy.cpp
     platform/linux/dispatch/deputy.h
     platform/linux/dispatch/detached_thread.h
+    platform/linux/dispatch/dump.cpp
     platform/linux/dispatch/futex.h
     platform/linux/dispatch/group.cpp
     platform/linux/dispatch/io_watch.h
     platform/linux/dispatch/item_store.cpp
+    platform/linux/dispatch/latency.cpp
+    platform/linux/dispatch/latency.h
     platform/linux/dispatch/poller.cpp
     platform/linux/dispatch/poller.h
     platform/linux/dispatch/pool.cpp
@@ -45,8 +49,11 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/pump_core.cpp
     platform/linux/dispatch/pump_core.h
     platform/linux/dispatch/queue.cpp
+    platform/linux/dispatch/queue_cells.cpp
+    platform/linux/dispatch/queue_cells.h
     platform/linux/dispatch/queue_core.cpp
     platform/linux/dispatch/queue_core.h
+    platform/linux/dispatch/queue_inspection.cpp
     platform/linux/dispatch/queue_specific.cpp
     platform/linux/dispatch/run_list.h
     platform/linux/dispatch/source.cpp
@@ -58,7 +65,8 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/timer_queue.h
     platform/linux/dispatch/timer_wheel.cpp
     platform/linux/dispatch/timer_wheel.h
-    platform/linux/dispatch/uptime.cpp)
+    platform/linux/dispatch/uptime.cpp
+    platform/linux/dispatch/watchdog.cpp)
 
 # Need GLib and libsystemd, which their users bring; no other header includes them.
 pelorin_component(dispatch_loops LEVEL 1 LIBRARY platform

@@ -3,6 +3,7 @@
 // Everything of namespace dispatch.
 #include "dispatch/block.h"
 #include "dispatch/calendar.h"
+#include "dispatch/diagnostics.h"
 #include "dispatch/group.h"
 #include "dispatch/main_queue.h"
 #include "dispatch/pump.h"

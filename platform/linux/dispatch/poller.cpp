@@ -128,6 +128,15 @@ bool poller::remove(io_watch& watch) noexcept {
     return watch.events_.load(std::memory_order_acquire) == 0;
 }
 
+std::vector<poller::view> poller::look() {
+    std::vector<view> seen;
+    scoped_lock guard(lock_);
+    for (const place& each : places_)
+        if (each.watch)
+            seen.push_back({each.watch->fd_, each.watch->on_->label()});
+    return seen;
+}
+
 // ---- io_watch and embedded items -----------------------------------------------------------
 
 embedded_item::embedded_item(function_type called) noexcept : function(called) {
@@ -135,8 +144,8 @@ embedded_item::embedded_item(function_type called) noexcept : function(called) {
 }
 
 void submit(queue_core* core, embedded_item* work) noexcept {
-    if (core->is_global())
-        pool::shared().submit(work, core->level());
+    if (core->is_special())
+        core->submit_specially(work);
     else
         core->push(work);
 }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <string>
 #include <vector>
 
 #include "platform/linux/dispatch/io_watch.h"
@@ -29,6 +30,13 @@ class poller {
     [[nodiscard]] int add(io_watch& watch, std::uint32_t interest) noexcept;
     [[nodiscard]] int change(io_watch& watch, std::uint32_t interest) noexcept;
     [[nodiscard]] bool remove(io_watch& watch) noexcept;
+
+    // A watched descriptor and the queue that its events are for.
+    struct view {
+        int fd;
+        std::string label;
+    };
+    [[nodiscard]] std::vector<view> look();
 
   private:
     // A watch may end while its event is on the way from the kernel: events

@@ -22,6 +22,7 @@ namespace {
 
 constexpr unsigned kBatch = 256;
 constexpr auto kRetireAfter = std::chrono::seconds(10);
+constexpr unsigned kTakenPerStamp = 64;  // so often a worker that never rests reads the clock
 
 unsigned usable_processors() noexcept {
     cpu_set_t set;
@@ -125,6 +126,7 @@ bool pool::add_worker() noexcept {
 void* pool::main(void* context) noexcept {
     auto* self = static_cast<worker*>(context);
     self->thread = ::gettid();
+    self->doing = &activity::of_this_thread();
     ::pthread_setname_np(::pthread_self(), "plr-worker");
     pool& owner = shared();
     {
@@ -146,7 +148,8 @@ void* pool::main(void* context) noexcept {
 // Begins as a searcher.
 void pool::run(worker& self) noexcept {
     bool searching = true;
-    for (;;) {
+    activity::of_this_thread().stamp();
+    for (unsigned taken = 1;; ++taken) {
         priority level;
         if (item* work = take(level)) {
             if (searching) {
@@ -155,6 +158,8 @@ void pool::run(worker& self) noexcept {
                 if (searching_.fetch_sub(1, std::memory_order_seq_cst) == 1 && has_waiting_work())
                     notify();
             }
+            if (taken % kTakenPerStamp == 0)
+                activity::of_this_thread().stamp();
             execute(work, level);
             continue;
         }
@@ -167,6 +172,7 @@ void pool::run(worker& self) noexcept {
         if (!sleep(self))
             return;
         searching = self.wake.exchange(0, std::memory_order_acq_rel) != 0;
+        activity::of_this_thread().stamp();
     }
 }
 
@@ -190,7 +196,9 @@ void pool::execute(item* work, priority level) noexcept {
         queue_core::of(work)->run_owned(budget);
         return;
     }
-    frame here(queue_core::global(level));
+    const frame here(queue_core::global(level));
+    const working_on seen(here.queue);
+    seen.here.step();
     if (work->run == &embedded_tag) {
         auto* embedded = static_cast<embedded_item*>(work);
         embedded->function(embedded);
@@ -279,6 +287,17 @@ pool::progress pool::look() noexcept {
     seen.sleeping = static_cast<unsigned>(sleepers_.size());
     seen.poller = poller_;
     return seen;
+}
+
+void pool::look_at_workers(std::vector<view>& seen) noexcept {
+    scoped_lock guard(all_lock_);
+    scoped_lock idle(idle_lock_);
+    for (const worker* each : all_) {
+        const activity& doing = *each->doing;
+        const std::uint64_t steps = doing.steps.load(std::memory_order_relaxed);
+        seen.push_back({each->thread, doing.queue.load(std::memory_order_relaxed), steps,
+                        doing.since.load(std::memory_order_relaxed), each->polling});
+    }
 }
 
 unsigned pool::runnable_workers() noexcept {

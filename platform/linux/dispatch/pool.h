@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "dispatch/queue.h"
+#include "platform/linux/dispatch/activity.h"
 #include "platform/linux/dispatch/run_list.h"
 #include "platform/linux/dispatch/spin_lock.h"
 
@@ -30,6 +31,7 @@ struct worker {
     std::atomic<std::uint32_t> wake{0};
     bool polling = false;  // under pool::idle_lock_
     pid_t thread = 0;
+    const activity* doing = nullptr;  // its thread's
 };
 
 class pool {
@@ -98,7 +100,7 @@ class pool {
     static void* main(void* context) noexcept;
 
     void run(worker& self) noexcept;
-    void execute(item* work, priority level) noexcept;
+    static void execute(item* work, priority level) noexcept;
     [[nodiscard]] item* take(priority& level) noexcept;
     [[nodiscard]] bool sleep(worker& self) noexcept;
     void notify() noexcept;

@@ -41,8 +41,8 @@ void release(queue_core* core) noexcept {
 }
 
 void submit(queue_core* core, closure_item* work) noexcept {
-    if (core->is_global()) [[unlikely]]
-        pool::shared().submit(work, core->level());
+    if (core->is_special()) [[unlikely]]
+        core->submit_specially(work);
     else
         core->push(work);
 }

@@ -3,9 +3,12 @@
 #include <sched.h>
 
 #include <cstring>
+#include <new>
 #include <utility>
 
+#include "platform/linux/dispatch/activity.h"
 #include "platform/linux/dispatch/pool.h"
+#include "platform/linux/dispatch/queue_cells.h"
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
 
@@ -45,14 +48,14 @@ item* linger(item* last, unsigned ran) noexcept {
 
 }  // namespace
 
-// What the public header promises of an idle queue.
-static_assert(sizeof(queue_core) < 256);
+static_assert(sizeof(queue_core) <= queue_cell::kCore);
 
 void queue_tag(item*) noexcept {}
 void waiter_tag(item*) noexcept {}
 void embedded_tag(item*) noexcept {}
 
-frame::frame(const queue_core* entered) noexcept : queue(entered), up(top_frame) {
+frame::frame(const queue_core* entered, bool draining) noexcept
+    : queue(entered), up(top_frame), drains(draining) {
     top_frame = this;
 }
 frame::~frame() {
@@ -63,7 +66,7 @@ frame* frame::top() noexcept {
 }
 bool frame::more_to_do() noexcept {
     for (const frame* each = top_frame; each; each = each->up)
-        if (each->queue->has_behind(each->running))
+        if (each->drains && each->queue->has_more())
             return true;
     return false;
 }
@@ -88,38 +91,57 @@ void waiter::grant() noexcept {
 
 queue_core* queue_core::create(std::string_view label, queue_core* target,
                                std::unique_ptr<pump_core> served) {
-    void* memory = ::operator new(sizeof(queue_core) + label.size() + 1);
     const bool on_pool = !target || target->is_global();
-    pump_core* const pump = on_pool ? served.release() : target->pump_;
-    auto* made = ::new (memory) queue_core(label, on_pool ? nullptr : target, pump,
-                                           target ? target->level() : priority::normal, false);
+    pump_core* const pump = on_pool ? served.get() : target->pump_;
+    auto* made = make(label, on_pool ? nullptr : target, pump,
+                      target ? target->level() : priority::normal, false);
+    static_cast<void>(served.release());
     if (!on_pool)
         target->retain();
     return made;
 }
 
+queue_core* queue_core::make(std::string_view label, queue_core* target, pump_core* pump,
+                             priority level, bool global) {
+    queue_cell* cell = queue_cells::take();
+    char* text = cell->label;
+    if (label.size() >= sizeof cell->label) {
+        text = new (std::nothrow) char[label.size() + 1];
+        if (!text) {
+            queue_cells::give(cell);
+            throw std::bad_alloc();
+        }
+    }
+    std::memcpy(text, label.data(), label.size());
+    text[label.size()] = '\0';
+    auto* made =
+        ::new (static_cast<void*>(cell->bytes)) queue_core(text, target, pump, level, global);
+    cell->begin();
+    return made;
+}
+
 queue_core* queue_core::global(priority level) noexcept {
-    static constexpr std::string_view kLabels[] = {"global.high", "global.normal", "global.low"};
+    static constexpr const char* kLabels[] = {"global.high", "global.normal", "global.low"};
     static queue_core* const* const queues = [] {
         auto* made = new queue_core*[3];
-        for (unsigned i = 0; i < 3; ++i) {
-            void* memory = ::operator new(sizeof(queue_core) + kLabels[i].size() + 1);
-            made[i] = ::new (memory)
-                queue_core(kLabels[i], nullptr, nullptr, static_cast<priority>(i), true);
-        }
+        for (unsigned i = 0; i < 3; ++i)
+            made[i] = make(kLabels[i], nullptr, nullptr, static_cast<priority>(i), true);
         return made;
     }();
     return queues[static_cast<unsigned>(level)];
 }
 
-queue_core::queue_core(std::string_view label, queue_core* target, pump_core* pump, priority level,
+queue_core::queue_core(const char* label, queue_core* target, pump_core* pump, priority level,
                        bool global) noexcept
-    : target_(target), pump_(pump), priority_(level), global_(global) {
+    : target_(target),
+      pump_(pump),
+      priority_(level),
+      kind_(global ? kGlobal
+            : pump ? kPumped
+                   : std::uint8_t{0}),
+      label_(label) {
     place_.run = &queue_tag;
     place_.owner = this;
-    char* text = reinterpret_cast<char*>(this + 1);
-    std::memcpy(text, label.data(), label.size());
-    text[label.size()] = '\0';
 }
 
 queue_core::~queue_core() {
@@ -134,10 +156,15 @@ queue_core::~queue_core() {
         target_->release();
     else
         delete pump_;
+    delete statistics();
 }
 
 void queue_core::release() noexcept {
-    if (global_ || handles_.fetch_sub(1, std::memory_order_acq_rel) != 1)
+    if (is_global())
+        return;
+    // The only handle has no rival.
+    if (handles_.load(std::memory_order_acquire) != 1 &&
+        handles_.fetch_sub(1, std::memory_order_acq_rel) != 1)
         return;
     if (is_suspended())
         stop("the last handle of a suspended queue went");
@@ -145,10 +172,16 @@ void queue_core::release() noexcept {
 }
 
 void queue_core::release_reference() noexcept {
-    if (references_.fetch_sub(1, std::memory_order_acq_rel) == 1) {
-        this->~queue_core();
-        ::operator delete(this);
-    }
+    if (references_.load(std::memory_order_acquire) != 1 &&
+        references_.fetch_sub(1, std::memory_order_acq_rel) != 1)
+        return;
+    queue_cell* const cell = queue_cell::of(this);
+    cell->end();
+    const char* const text = label_;
+    this->~queue_core();
+    if (text != cell->label)
+        delete[] text;
+    queue_cells::give(cell);
 }
 
 void queue_core::stop(const char* why) const noexcept {
@@ -167,7 +200,7 @@ void queue_core::push(item* work) noexcept {
         previous->next.store(work, std::memory_order_release);
         return;
     }
-    head_ = work;
+    begin_list_at(nullptr, work);
     counted_ = true;
     references_.fetch_add(1, std::memory_order_relaxed);
     activate();
@@ -195,18 +228,18 @@ item* queue_core::detach(item* first) noexcept {
 
 // The reverse: `first` runs before everything that waits.
 void queue_core::attach(item* first) noexcept {
-    item* next = head_;
+    item* next = head_.load(std::memory_order_relaxed);
     if (!next) {
         item* expected = &stub_;
         if (tail_.compare_exchange_strong(expected, first, std::memory_order_acq_rel)) {
-            head_ = first;
+            begin_list_at(&stub_, first);
             return;
         }
         next = wait_for_next(&stub_);
         stub_.next.store(nullptr, std::memory_order_relaxed);
     }
     first->next.store(next, std::memory_order_relaxed);
-    head_ = first;
+    begin_list_at(&stub_, first);
 }
 
 // The item behind the stub; null after ownership was given up because there is
@@ -230,57 +263,86 @@ void queue_core::count_ownership() noexcept {
 }
 
 queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
-    frame here(this);
-    item* work = head_;
+    const frame here(this, true);
+    const working_on seen(this);
+    item* work = head_.load(std::memory_order_relaxed);
+    running_.store(work, std::memory_order_release);
     for (unsigned ran = 0;; ++ran) {
         if (is_suspended()) [[unlikely]] {
-            head_ = work;
+            put_back(work);
             if (park())
                 return outcome::parked;
+            running_.store(work, std::memory_order_release);
         }
         if (target_ && target_->is_held_back()) [[unlikely]] {
-            head_ = work;
+            put_back(work);
             return outcome::more;
         }
         if (budget == 0) [[unlikely]] {
             if (pump_ || pool::shared().has_waiting_work()) {
-                head_ = work;
+                put_back(work);
                 return outcome::more;
             }
             budget = kBatch;
+            seen.here.stamp();
         }
         --budget;
         if (work->run == &waiter_tag) [[unlikely]] {
-            head_ = detach(work);
-            static_cast<waiter*>(work)->grant();
+            grant(work);
             return outcome::handed;
         }
+        seen.here.step();
         if (work->run == &queue_tag || work->run == &embedded_tag) {
-            head_ = detach(work);
-            here.running = &stub_;
+            begin_list_at(&stub_, detach(work));
+            let_walk();
             if (!run_nested(work, budget))
                 return outcome::handed;
-            work = head_ ? head_ : take_after_stub();
+            item* const next = head_.load(std::memory_order_relaxed);
+            work = next ? next : take_after_stub();
             if (!work)
                 return outcome::idle;
+            running_.store(work, std::memory_order_release);
             continue;
         }
-        here.running = work;
         work->run(work);
         item* next = work->next.load(std::memory_order_acquire);
         if (!next)
             next = linger(work, ran);
         if (!next) {
-            item* expected = work;
-            if (tail_.compare_exchange_strong(expected, nullptr, std::memory_order_acq_rel)) {
-                recycle_item(static_cast<closure_item*>(work));
+            next = leave(work);
+            if (!next)
                 return outcome::idle;
-            }
-            next = wait_for_next(work);
         }
+        running_.store(next, std::memory_order_release);
+        let_walk();
         recycle_item(static_cast<closure_item*>(work));
         work = next;
     }
+}
+
+// `last` has run and nothing follows it. Gives up the ownership and returns null,
+// or returns what follows by now.
+item* queue_core::leave(item* last) noexcept {
+    for (;;) {
+        begin_list_at(&stub_, nullptr);
+        std::atomic_signal_fence(std::memory_order_seq_cst);
+        if (!walked_.load(std::memory_order_acquire)) [[likely]]
+            break;
+        begin_list_at(last, nullptr);  // who counts must not wait for us
+        wait_for_walk();
+    }
+    item* expected = last;
+    if (!tail_.compare_exchange_strong(expected, nullptr, std::memory_order_acq_rel))
+        return wait_for_next(last);
+    recycle_item(static_cast<closure_item*>(last));
+    return nullptr;
+}
+
+// Hands ownership to the waiter that is first in the list.
+void queue_core::grant(item* first) noexcept {
+    begin_list_at(&stub_, detach(first));
+    let_walk();
+    static_cast<waiter*>(first)->grant();
 }
 
 // Runs a detached item that is a queue or embedded. Returns false when a waiter
@@ -318,22 +380,41 @@ bool queue_core::try_lock() noexcept {
     if (!tail_.compare_exchange_strong(expected, &stub_, std::memory_order_acq_rel))
         return false;
     counted_ = false;
-    head_ = nullptr;
+    begin_list_at(&stub_, nullptr);
     return true;
 }
 
 // Hot path when idle: one compare-exchange to enter and one to leave;
 // bench/dispatch_cases.h.
 void queue_core::run_sync(void (*function)(void*) noexcept, void* context) {
-    if (pump_) [[unlikely]] {
+    if (has(kGlobal | kMeasured | kPumped)) [[unlikely]]
+        run_sync_specially(function, context);
+    else
+        run_sync_here(function, context);
+}
+
+void queue_core::run_sync_specially(void (*function)(void*) noexcept, void* context) {
+    if (has(kMeasured)) {
+        measured_sync measured{*statistics(), function, context};
+        run_sync_unmeasured(&measured_sync::run, &measured);
+    } else {
+        run_sync_unmeasured(function, context);
+    }
+}
+
+void queue_core::run_sync_unmeasured(void (*function)(void*) noexcept, void* context) {
+    if (pump_) {
         hand_over(function, context);
-        return;
-    }
-    frame here(this);
-    if (global_) {
+    } else if (is_global()) {
+        const frame here(this);
         function(context);
-        return;
+    } else {
+        run_sync_here(function, context);
     }
+}
+
+void queue_core::run_sync_here(void (*function)(void*) noexcept, void* context) {
+    const frame here(this);
     lock_from_here();
     function(context);
     unlock_chain();
@@ -393,17 +474,18 @@ void queue_core::unlock_chain() noexcept {
 
 void queue_core::unlock() noexcept {
     const bool counted = counted_;  // not ours to read once the list is empty
-    item* next = head_ ? head_ : take_after_stub();
+    item* next = head_.load(std::memory_order_relaxed);
+    if (!next)
+        next = take_after_stub();
     if (!next) {
         if (counted)
             release_reference();
         return;
     }
-    head_ = next;
+    begin_list_at(&stub_, next);
     count_ownership();
     if (next->run == &waiter_tag && !target_ && !is_suspended()) {
-        head_ = detach(next);
-        static_cast<waiter*>(next)->grant();
+        grant(next);
         return;
     }
     activate();
@@ -440,7 +522,7 @@ bool queue_core::park() noexcept {
 }
 
 void queue_core::suspend() noexcept {
-    PLR_ASSERT(!global_, "a global queue cannot be suspended");
+    PLR_ASSERT(!is_global(), "a global queue cannot be suspended");
     suspension_.fetch_add(kSuspension, std::memory_order_acq_rel);
 }
 

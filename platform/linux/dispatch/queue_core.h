@@ -7,6 +7,7 @@
 
 #include "dispatch/queue.h"
 #include "platform/linux/dispatch/io_watch.h"
+#include "platform/linux/dispatch/latency.h"
 #include "platform/linux/dispatch/pump_core.h"
 #include "platform/linux/dispatch/spin_lock.h"
 
@@ -23,8 +24,8 @@
 // activate the queue: hand it to its target's list, or to the pool. The owner
 // passes on ownership with the queue: activator -> list -> drainer, or drainer ->
 // waiter of a sync(). Ownership ends with the compare-exchange of the tail from
-// the last item (or the stub) to null. `head_`, `stub_`, `counted_` are the
-// owner's alone.
+// the last item (or the stub) to null. `head_`, `running_`, `stub_`, `counted_`
+// are the owner's to change.
 //
 // An executed item stays in place as the tail until its successor is known, so
 // that producers which keep the queue busy touch the tail word only.
@@ -38,6 +39,12 @@
 //
 // model/queue.pml is all of this as a model that is checked exhaustively; each of its
 // steps names the function here. Who changes the one changes the other.
+//
+// Whoever counts what waits (count_waiting()) sets walked_; nothing leaves the list
+// then. What waits begins behind running_, or when that is null or the stub with
+// head_ or else behind the stub; before an item may go, the owner writes down that
+// the list begins behind it, and then looks at walked_. The one who counts has the
+// barrier between for both of them (membarrier(2)).
 //
 // A queue whose last target is a pump's (dispatch/pump.h) is activated there instead
 // of in the pool. Only the thread that serves the pump ever owns it for running: a
@@ -63,7 +70,7 @@ struct waiter : item {
 
 // What the calling thread runs: innermost queue first.
 struct frame {
-    explicit frame(const queue_core* entered) noexcept;
+    explicit frame(const queue_core* entered, bool drains = false) noexcept;
     ~frame();
     frame(const frame&) = delete;
     frame& operator=(const frame&) = delete;
@@ -73,7 +80,7 @@ struct frame {
 
     const queue_core* queue;
     frame* up;
-    const item* running = nullptr;  // what stands for the present work in the queue's list
+    const bool drains;  // what waits on the queue runs on this thread next
 };
 
 class queue_core {
@@ -92,7 +99,7 @@ class queue_core {
 
     // Global queues live for ever, and everybody shares them: they are not counted.
     void retain() noexcept {
-        if (!global_)
+        if (!is_global())
             handles_.fetch_add(1, std::memory_order_relaxed);
     }
     void release() noexcept;
@@ -111,28 +118,57 @@ class queue_core {
     // For whoever got outcome::idle.
     void release_reference() noexcept;
 
-    [[nodiscard]] bool is_global() const noexcept { return global_; }
+    [[nodiscard]] bool is_global() const noexcept { return has(kGlobal); }
+    // Whether submitting work is more than push().
+    [[nodiscard]] bool is_special() const noexcept { return has(kGlobal | kMeasured); }
+    void submit_specially(closure_item* work) noexcept;
+    void submit_specially(embedded_item* work) noexcept;
     // Null for queues that end in the pool.
     [[nodiscard]] pump_core* pump() const noexcept { return pump_; }
     [[nodiscard]] bool is_current() const noexcept;
-    [[nodiscard]] const char* label() const noexcept {
-        return reinterpret_cast<const char*>(this + 1);
-    }
+    [[nodiscard]] const char* label() const noexcept { return label_; }
+    [[nodiscard]] const queue_core* target() const noexcept { return target_; }
     [[nodiscard]] priority level() const noexcept { return priority_; }
     void set_specific(const void* key, void* value, void (*destructor)(void*));
     [[nodiscard]] void* get_specific(const void* key) const noexcept;
     // Ends the process with a message that names the queue.
     [[noreturn]] void stop(const char* why) const noexcept;
 
-    // Whether something waits behind `running`.
-    [[nodiscard]] bool has_behind(const item* running) const noexcept {
-        return running && tail_.load(std::memory_order_relaxed) != running;
+    // For the drainer, in its work: whether something waits behind it.
+    [[nodiscard]] bool has_more() const noexcept {
+        return tail_.load(std::memory_order_relaxed) != running_.load(std::memory_order_relaxed);
     }
+
+    // ---- Looking inside: any thread ---------------------------------------------
+
+    void enable_statistics(bool on);
+    // Null when they were never enabled.
+    [[nodiscard]] latencies* statistics() const noexcept {
+        return statistics_.load(std::memory_order_acquire);
+    }
+    [[nodiscard]] bool keeps_statistics() const noexcept { return has(kMeasured); }
+    [[nodiscard]] bool is_busy() const noexcept {
+        return tail_.load(std::memory_order_relaxed) != nullptr;
+    }
+    [[nodiscard]] std::uint32_t suspensions() const noexcept {
+        return suspension_.load(std::memory_order_relaxed) / kSuspension;
+    }
+    struct waiting {
+        std::size_t count = 0;
+        std::int64_t oldest = 0;  // submitted, monotonic nanoseconds; 0 when not known
+        bool is_known = true;     // false where the kernel has no membarrier(2)
+    };
+    // For one caller at a time, who keeps the queue alive. Holds the queue up.
+    [[nodiscard]] waiting count_waiting() noexcept;
 
     // The queue whose place in a list `work` is.
     static queue_core* of(item* work) noexcept { return static_cast<place*>(work)->owner; }
 
   private:
+    static constexpr std::uint8_t kGlobal = 1;
+    static constexpr std::uint8_t kMeasured = 2;
+    static constexpr std::uint8_t kPumped = 4;
+
     static constexpr std::uint32_t kParked = 1;
     static constexpr std::uint32_t kSuspension = 2;
 
@@ -146,9 +182,37 @@ class queue_core {
         specific* next;
     };
 
-    queue_core(std::string_view label, queue_core* target, pump_core* pump, priority level,
+    queue_core(const char* label, queue_core* target, pump_core* pump, priority level,
                bool global) noexcept;
     ~queue_core();
+    static queue_core* make(std::string_view label, queue_core* target, pump_core* pump,
+                            priority level, bool global);
+
+    [[nodiscard]] bool has(std::uint8_t kinds) const noexcept {
+        return kind_.load(std::memory_order_relaxed) & kinds;
+    }
+    template <class Item>
+    void submit_stamped(Item* work) noexcept;
+    void run_sync_specially(void (*function)(void*) noexcept, void* context);
+    void run_sync_unmeasured(void (*function)(void*) noexcept, void* context);
+    void run_sync_here(void (*function)(void*) noexcept, void* context);
+
+    // The list begins behind `first`, or as `head` says when it is the stub or null.
+    void begin_list_at(item* running, item* head) noexcept {
+        head_.store(head, std::memory_order_relaxed);
+        running_.store(running, std::memory_order_release);
+    }
+    void let_walk() noexcept {
+        std::atomic_signal_fence(std::memory_order_seq_cst);
+        if (walked_.load(std::memory_order_acquire)) [[unlikely]]
+            wait_for_walk();
+    }
+    void wait_for_walk() noexcept;
+    void put_back(item* work) noexcept { begin_list_at(nullptr, work); }
+    void grant(item* first) noexcept;
+    [[nodiscard]] item* leave(item* last) noexcept;
+    [[nodiscard]] item* first_waiting(bool& settled) const noexcept;
+    [[nodiscard]] waiting walk() const noexcept;
 
     [[nodiscard]] bool is_suspended() const noexcept {
         return suspension_.load(std::memory_order_acquire) >= kSuspension;
@@ -178,14 +242,18 @@ class queue_core {
     place place_;                               // in the target's list, or the pool's
     std::atomic<std::uint32_t> references_{1};  // one for all handles, one while owned
     std::atomic<std::uint32_t> handles_{1};
-    priority priority_;
-    bool global_;
+    const priority priority_;
+    std::atomic<std::uint8_t> kind_;
     // Owner's line.
-    item* head_ = nullptr;  // next to run; null: what follows the stub
-    item stub_;             // its `next` is null whenever it is not in the list
+    alignas(64) std::atomic<item*> head_{nullptr};  // next to run; null: what follows the stub
+    std::atomic<item*> running_{&stub_};
+    item stub_;  // its `next` is null whenever it is not in the list
     std::atomic<std::uint32_t> suspension_{0};
     bool counted_ = false;  // ownership holds a reference
+    std::atomic<bool> walked_{false};
     std::atomic<specific*> specifics_{nullptr};
+    std::atomic<latencies*> statistics_{nullptr};
+    const char* const label_;
 };
 
 }  // namespace dispatch::detail
