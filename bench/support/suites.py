@@ -58,6 +58,8 @@ LIBUV = "libuv"
 LIBEVENT = "libevent"
 ASIO_TIMERS = "Asio steady_timer"
 TIMER_SERVICE = "our timer service"
+GHASHTABLE = "GHashTable of GVariant"
+GVARIANT = "GVariant a{sv}"
 SPDLOG = "spdlog"
 BOOST_LOG = "Boost.Log"
 LOG4CPLUS = "log4cplus"
@@ -251,5 +253,24 @@ def text():
                           (Bar((ICU, ICONV), 1.0, "ahead of each"),))
 
 
+def values():
+    def measurement(case, size, what, variant=True):
+        cells = {OURS: Cell("values_pelorin", (case, str(size)), "ns"),
+                 GHASHTABLE: Cell("values_glib", ("table", case, str(size)), "ns")}
+        if variant:
+            cells[GVARIANT] = Cell("values_glib", ("variant", case, str(size)), "ns")
+        return Measurement("values", what, "ns each", cells, (Bar(tuple(cells)[1:], 1.0, "ahead"),))
+
+    for size, named in ((10, "10 entries"), (1000, "1,000 entries")):
+        yield measurement("build", size, f"dictionary of {named}, made and freed")
+        # A look-up in a GVariant walks, which takes for ever in a large one.
+        yield measurement("find", size, f"dictionary of {named}, found by text and read", variant=size == 10)
+        yield measurement("find_kept", size, f"dictionary of {named}, found by a kept key and read",
+                          variant=size == 10)
+        yield measurement("walk", size, f"dictionary of {named}, walked")
+    yield measurement("number", 1, "number made, read and freed")
+    yield measurement("read", 1000, "number read")
+
+
 SUITES = {"dispatch": dispatch, "vox": vox, "fanout": fanout, "log": log, "timers": timers, "bytes": bytes_,
-          "text": text}
+          "text": text, "values": values}
