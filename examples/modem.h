@@ -18,6 +18,7 @@ struct ModemSettings {
     std::string path;             // a terminal; or a FIFO or file with a recorded session
     std::uint32_t baud = 115200;  // bits a second
     bool flowControl = true;      // by hardware
+    bool operator==(const ModemSettings&) const = default;
 };
 
 struct ModemHandlers {

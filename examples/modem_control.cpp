@@ -36,17 +36,15 @@ LogLevel unlessAgain(LogLevel level, unsigned failures) {
 }  // namespace
 
 ModemControl::ModemControl(std::shared_ptr<plr::LogServer> logServer,
-                           std::shared_ptr<plr::TimerService> timers, ModemSettings settings,
-                           ReportHandler onReport)
+                           std::shared_ptr<plr::TimerService> timers, ReportHandler onReport)
     : SharedLoggable("modem", "radio.modem", std::move(logServer)),
       timers_(std::move(timers)),
-      settings_(std::move(settings)),
       onReport_(std::move(onReport)) {}
 
-void ModemControl::start() {
-    execute_wrapped([this] {
+void ModemControl::use(ModemSettings settings) {
+    execute_wrapped([this, settings = std::move(settings)] {
         ownQueue_.assertCurrent();
-        open_sync();
+        use_sync(settings);
     });
 }
 
@@ -54,6 +52,7 @@ void ModemControl::close() {
     execute_wrapped_sync([this] {
         ownQueue_.assertCurrent();
         isClosed_ = true;
+        next_.reset();
         channel_.reset();
         modem_.reset();
     });
@@ -96,7 +95,20 @@ void ModemControl::reset(std::function<void(bool)> onBack) {
 
 // ---- The line ---------------------------------------------------------------------
 
+void ModemControl::use_sync(const ModemSettings& settings) {
+    if (settings == settings_)
+        return;
+    if (!settings_.path.empty())
+        log(logger(), LogLevel::Notice, "the settings changed: ", settings.path, ", ",
+            settings.baud, " bits a second");
+    settings_ = settings;
+    failures_ = 0;
+    leave_sync();
+    open_sync();
+}
+
 void ModemControl::open_sync() {
+    next_.reset();
     if (isClosed_)
         return;
     try {
@@ -113,11 +125,11 @@ void ModemControl::open_sync() {
 }
 
 void ModemControl::openAgain_sync() {
-    timers_->runAfter(pauseAfter(failures_++), ownQueue_.queue(),
-                      plr::whileAlive(weak_from_this(), [](ModemControl& self) {
-                          self.ownQueue_.assertCurrent();
-                          self.open_sync();
-                      }));
+    next_ = timers_->startTimer(pauseAfter(failures_++), ownQueue_.queue(),
+                                plr::whileAlive(weak_from_this(), [](ModemControl& self) {
+                                    self.ownQueue_.assertCurrent();
+                                    self.open_sync();
+                                }));
 }
 
 // What these call is on the queue, and ends there together with this object.
@@ -162,16 +174,20 @@ void ModemControl::handleEnd_sync() {
     log(logger(), LogLevel::Notice, "the modem has ended");
 }
 
-// What is asked and answered meanwhile finds no channel any more.
 void ModemControl::lose_sync(const char* why) {
-    const auto channel = std::exchange(channel_, nullptr);
-    if (!channel)
+    if (!channel_)
         return;
-    modem_.reset();
     log(logger(), unlessAgain(LogLevel::Warn, failures_), "the modem ", why);
+    leave_sync();
+    openAgain_sync();
+}
+
+// What is asked and answered meanwhile finds no channel any more.
+void ModemControl::leave_sync() {
+    const auto channel = std::exchange(channel_, nullptr);
+    modem_.reset();
     for (const std::string& path : std::exchange(reported_, {}))
         onReport_(path, {});
-    openAgain_sync();
 }
 
 // ---- Questions and reports --------------------------------------------------------

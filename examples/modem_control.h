@@ -33,13 +33,14 @@ class ModemControl : public plr::SharedLoggable<ModemControl> {
 
     [[nodiscard]] static std::shared_ptr<ModemControl> create(
         std::shared_ptr<plr::LogServer> logServer, std::shared_ptr<plr::TimerService> timers,
-        ModemSettings settings, ReportHandler onReport) {
-        return make_shared_ptr(new ModemControl(std::move(logServer), std::move(timers),
-                                                std::move(settings), std::move(onReport)));
+        ReportHandler onReport) {
+        return make_shared_ptr(
+            new ModemControl(std::move(logServer), std::move(timers), std::move(onReport)));
     }
 
-    // Opens the line; once.
-    void start();
+    // Opens the line. Once it is open, or tried: when these settings are others, it is
+    // closed and opened anew, as if the modem had been unplugged; else nothing. Any thread.
+    void use(ModemSettings settings);
     // Closes it for good: nothing is reported any more when this returns. Not on the queue.
     void close();
 
@@ -55,12 +56,13 @@ class ModemControl : public plr::SharedLoggable<ModemControl> {
 
   private:
     ModemControl(std::shared_ptr<plr::LogServer> logServer,
-                 std::shared_ptr<plr::TimerService> timers, ModemSettings settings,
-                 ReportHandler onReport);
+                 std::shared_ptr<plr::TimerService> timers, ReportHandler onReport);
+    void use_sync(const ModemSettings& settings) PLR_ON(ownQueue_);
     void open_sync() PLR_ON(ownQueue_);
     void openAgain_sync() PLR_ON(ownQueue_);
     void handleEnd_sync() PLR_ON(ownQueue_);
     void lose_sync(const char* why) PLR_ON(ownQueue_);
+    void leave_sync() PLR_ON(ownQueue_);
     void begin_sync(const AtChannel::Handler& onAnswer) PLR_ON(ownQueue_);
     void refresh_sync(const AtChannel::Handler& onAnswer) PLR_ON(ownQueue_);
     void send_sync(const std::string& command, AtChannel::Handler onAnswer,
@@ -74,10 +76,11 @@ class ModemControl : public plr::SharedLoggable<ModemControl> {
     void trace(std::string_view exchange) const;
 
     const std::shared_ptr<plr::TimerService> timers_;
-    const ModemSettings settings_;
     const ReportHandler onReport_;
+    ModemSettings settings_ PLR_CONFINED_TO(ownQueue_);  // without a path: none yet
     bool isClosed_ PLR_CONFINED_TO(ownQueue_)
     = false;
+    std::unique_ptr<plr::Timer> next_ PLR_CONFINED_TO(ownQueue_);  // attempt to open
     std::unique_ptr<Modem> modem_ PLR_CONFINED_TO(ownQueue_);
     std::unique_ptr<AtChannel> channel_ PLR_CONFINED_TO(ownQueue_);  // of a terminal
     SmsInbox inbox_ PLR_CONFINED_TO(ownQueue_);

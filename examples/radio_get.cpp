@@ -11,13 +11,12 @@
 #include <chrono>
 #include <optional>
 
+#include "examples/radio_settings.h"
 #include "examples/show.h"
 #include "plr/ipc.h"
 #include "plr/rest.h"
 
 namespace {
-
-constexpr const char* kService = "net.example.radio";
 
 struct Answers {
     std::optional<vox::object> value;  // nothing: nobody answered for the path
@@ -30,7 +29,7 @@ Answers get(const std::string& path) {
     const dispatch::group open;
     Answers answers;
     queue.sync([&] {
-        rest.connect(vox::connection::create(kService));
+        rest.connect(vox::connection::create(radio::serviceName().c_str()));
         rest.getPropertyOnce(path, [&](const vox::object& value) { answers.value = value; });
         // A path that leads nowhere gets no answer, but the root always answers,
         // and answers come in the order of their questions.
@@ -47,7 +46,7 @@ plr::Result<vox::object> request(const std::string& path, const vox::object& val
     const dispatch::group open;
     plr::Result<vox::object> answer;
     queue.sync([&] {
-        rest.connect(vox::connection::create(kService));
+        rest.connect(vox::connection::create(radio::serviceName().c_str()));
         rest.sendRequest(path, value, std::chrono::seconds(10),
                          [&, session = dispatch::group_session(open)](
                              const plr::Result<vox::object>& result) { answer = result; });
@@ -92,7 +91,7 @@ int main(int argc, char** argv) {
     }
     const Answers answers = get(path);
     if (!answers.served)
-        return fail(std::string(kService) + " is not there");
+        return fail(radio::serviceName() + " is not there");
     if (!answers.value)
         return fail("there is nothing at " + path);
     if (const vox::dict found(*answers.value); path.starts_with("/descriptions") && found)

@@ -11,6 +11,7 @@
 #include <string>
 
 #include "examples/end_signals.h"
+#include "examples/radio_settings.h"
 #include "examples/show.h"
 #include "plr/rest.h"
 
@@ -26,7 +27,7 @@ int main(int argc, char** argv) {
     queue.sync([&] {
         held = plr::rest::AssertionHandle(
             rest, argv[1], [](bool granted) { radio::say(granted ? "granted" : "not granted"); });
-        rest.connectToService("net.example.radio");
+        rest.connectToService(radio::serviceName());
     });
     const int status = end.wait();
     queue.sync([&] { held.reset(); });

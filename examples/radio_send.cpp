@@ -13,6 +13,7 @@
 #include <string>
 #include <vector>
 
+#include "examples/radio_settings.h"
 #include "examples/show.h"
 #include "examples/sms_pdu.h"
 #include "plr/format/hex.h"
@@ -22,7 +23,6 @@
 
 namespace {
 
-constexpr const char* kService = "net.example.radio";
 using Language = plr::TextConverter::NationalLanguageId;
 struct Options {
     bool print = false;
@@ -82,7 +82,7 @@ plr::Result<vox::object> request(const std::vector<std::string>& pdus) {
     const dispatch::group open;
     plr::Result<vox::object> answer;
     queue.sync([&] {
-        rest.connect(vox::connection::create(kService));
+        rest.connect(vox::connection::create(radio::serviceName().c_str()));
         rest.sendRequest("/requests/send_sms", value, std::chrono::minutes(pdus.size()),
                          [&, session = dispatch::group_session(open)](
                              const plr::Result<vox::object>& result) { answer = result; });

@@ -5,12 +5,11 @@
 
 #include <string>
 
+#include "examples/radio_settings.h"
 #include "examples/show.h"
 #include "plr/rest.h"
 
 namespace {
-
-constexpr const char* kService = "net.example.radio";
 
 // Whether the service has handled it.
 bool set(const std::string& path, const vox::object& value) {
@@ -19,7 +18,7 @@ bool set(const std::string& path, const vox::object& value) {
     const dispatch::group open;
     bool handled = false;
     queue.sync([&] {
-        rest.connect(vox::connection::create(kService));
+        rest.connect(vox::connection::create(radio::serviceName().c_str()));
         rest.setProperty(path, value);
         // A SET has no reply. But messages are handled in order, so an answer to
         // a later one says that the SET was.
@@ -38,7 +37,7 @@ int main(int argc, char** argv) {
         return 2;
     }
     if (!set(argv[1], radio::valueOf(argv[2]))) {
-        std::cerr << "radio_set: " << kService << " is not there\n";
+        std::cerr << "radio_set: " << radio::serviceName() << " is not there\n";
         return 1;
     }
 }

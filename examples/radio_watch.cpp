@@ -16,6 +16,7 @@
 
 #include "examples/end_signals.h"
 #include "examples/logging.h"
+#include "examples/radio_settings.h"
 #include "examples/show.h"
 #include "plr/concurrency.h"
 #include "plr/log/vox_logger.h"
@@ -24,8 +25,6 @@
 namespace {
 
 using plr::LogLevel;
-
-constexpr const char* kService = "net.example.radio";
 
 // Owns its queue; see plr/concurrency/shared_synchronizable.h.
 class Watcher : public plr::SharedSynchronizable<Watcher> {
@@ -59,14 +58,14 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
                 self.ownQueue_.assertCurrent();
                 self.handleConnection_sync(isReached);
             }));
-        rest_.connectToService(kService);
+        rest_.connectToService(service_);
     }
 
     void handleConnection_sync(bool isReached) PLR_ON(ownQueue_)
     {
         if (!isReached)
-            return radio::log(*logger_, LogLevel::Warn, kService, " is gone");
-        radio::log(*logger_, LogLevel::Notice, "connected to ", kService);
+            return radio::log(*logger_, LogLevel::Warn, service_, " is gone");
+        radio::log(*logger_, LogLevel::Notice, "connected to ", service_);
         // Each service has a log of its own.
         rest_.getPropertyOnce("/log_server",
                               plr::whileAlive(weak_from_this(), [](Watcher& self, const auto& log) {
@@ -75,6 +74,7 @@ class Watcher : public plr::SharedSynchronizable<Watcher> {
                               }));
     }
 
+    const std::string service_ = radio::serviceName();
     const std::string pid_ = std::to_string(::getpid());
     const std::shared_ptr<plr::VoxLogger> logger_ = plr::VoxLogger::create(
         ownQueue_.queue(), "radio_watch", "radio.watch." + pid_, vox::connection());

@@ -1,15 +1,18 @@
 // radiod: a radio service. It asks a modem, reads what it says, line by line, and
-// publishes that as properties and events under the name net.example.radio.
+// publishes that as properties and events under a name, net.example.radio.
 //
-//   radiod --modem PATH [--baud N] [--no-flow-control] [--log PLACE]... [--group NAME]
+//   radiod [--modem PATH] [--baud N] [--no-flow-control] [--log PLACE]... [--group NAME]
 //
 //   --modem PATH    a terminal with a modem that speaks AT, there already or yet to come;
 //                   or a FIFO or file with a recorded session
-//   --baud N        bits a second of the terminal, 115200
+//   --baud N        bits a second of the terminal
 //   --no-flow-control   the terminal has no lines for it
 //   --log PLACE     console (standard error; used when there is no --log), system,
 //                   or the path of a file
 //   --group NAME    its members may be clients; without it only this user and root
+//
+// What is left out is in the preferences (radio_settings.h), which it follows while it
+// runs; a new name is for the next start.
 //
 // systemd may start it (systemd/net.example.radio.service). radio_tree.h says what
 // clients find, radio_reports.h which result code becomes which path and value.
@@ -29,15 +32,15 @@
 #include "examples/modem_requests.h"
 #include "examples/power.h"
 #include "examples/radio_service.h"
+#include "examples/radio_settings.h"
 #include "examples/radiod_options.h"
+#include "examples/settings_watch.h"
 #include "vox/service.h"
 
 namespace {
 
-constexpr const char* kService = "net.example.radio";
-
-vox::listener createListener(const std::string& groupName) {
-    const auto listener = vox::listener::create(kService);
+vox::listener createListener(const std::string& service, const std::string& groupName) {
+    const auto listener = vox::listener::create(service.c_str());
     if (groupName.empty())
         return listener;
     const group* const found = ::getgrnam(groupName.c_str());  // NOLINT(concurrency-mt-unsafe)
@@ -52,9 +55,10 @@ int serve(const radio::RadiodOptions& options, const std::shared_ptr<plr::LogSer
     const auto timers = plr::DispatchTimerService::create(logServer);
     const auto service = radio::RadioService::create(logServer, timers);
     const auto modem = radio::ModemControl::create(
-        logServer, timers, options.modem,
+        logServer, timers,
         [service](const auto& path, const auto& value) { service->publish(path, value); });
-    const auto listener = createListener(options.group);
+    const std::string name = radio::serviceName();
+    const auto listener = createListener(name, options.group);
     std::shared_ptr<radio::PowerControl> power;
     std::shared_ptr<radio::ModemRequests> requests;
     const plr::StaticLogger logger("radio", logServer);
@@ -62,10 +66,10 @@ int serve(const radio::RadiodOptions& options, const std::shared_ptr<plr::LogSer
         const auto endpoint = vox::endpoint::create(listener);
         power = radio::PowerControl::create(logServer, endpoint.connect());
         requests = radio::ModemRequests::create(logServer, modem, endpoint.connect());
-        radio::log(logger, plr::LogLevel::Notice, "serving ", kService);
+        radio::log(logger, plr::LogLevel::Notice, "serving ", name);
         vox_notify_ready();
     }
-    modem->start();
+    const auto settings = radio::SettingsWatch::create(logServer, options, name, modem);
     const int status = end.wait();
     vox_notify_stopping();
     modem->close();
@@ -91,7 +95,7 @@ int run(const radio::RadiodOptions& options, radio::EndSignals& end) {
 int main(int argc, char** argv) {
     const auto options = radio::parseOptions({argv + 1, argv + argc});
     if (!options) {
-        std::cerr << "usage: radiod --modem PATH [--baud N] [--no-flow-control]"
+        std::cerr << "usage: radiod [--modem PATH] [--baud N] [--no-flow-control]"
                      " [--log console|system|PATH]... [--group NAME]\n";
         return 2;
     }

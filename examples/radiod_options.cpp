@@ -15,9 +15,9 @@ bool readNumber(const std::string& text, std::uint32_t& number) {
 // One that has a value.
 bool take(const std::string& name, const std::string& value, RadiodOptions& options) {
     if (name == "--modem")
-        options.modem.path = value;
+        options.modem = value;
     else if (name == "--baud")
-        return readNumber(value, options.modem.baud);
+        return readNumber(value, options.baud.emplace());
     else if (name == "--log")
         options.logs.push_back(value);
     else if (name == "--group")
@@ -29,18 +29,22 @@ bool take(const std::string& name, const std::string& value, RadiodOptions& opti
 
 }  // namespace
 
+ModemSettings RadiodOptions::over(ModemSettings preferred) const {
+    return {.path = modem.value_or(preferred.path),
+            .baud = baud.value_or(preferred.baud),
+            .flowControl = preferred.flowControl && !noFlowControl};
+}
+
 std::optional<RadiodOptions> parseOptions(const std::vector<std::string>& arguments) {
     RadiodOptions options;
     for (std::size_t i = 0; i < arguments.size(); ++i) {
         if (arguments[i] == "--no-flow-control")
-            options.modem.flowControl = false;
+            options.noFlowControl = true;
         else if (i + 1 == arguments.size() || !take(arguments[i], arguments[i + 1], options))
             return std::nullopt;
         else
             ++i;
     }
-    if (options.modem.path.empty())
-        return std::nullopt;
     if (options.logs.empty())
         options.logs.emplace_back("console");
     return options;

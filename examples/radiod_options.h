@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -8,11 +9,17 @@
 
 namespace radio {
 
-// What radiod's command line says; radiod.cpp explains it.
+// What radiod's command line says; radiod.cpp explains it. What it leaves open the
+// preferences say (radio_settings.h).
 struct RadiodOptions {
-    ModemSettings modem;
+    std::optional<std::string> modem;
+    std::optional<std::uint32_t> baud;
+    bool noFlowControl = false;
     std::vector<std::string> logs;  // at least one
     std::string group;              // empty: none
+
+    // What the preferences say of the modem's line, but for what is said here.
+    [[nodiscard]] ModemSettings over(ModemSettings preferred) const;
 };
 
 // Nothing when it is wrong.

@@ -22,6 +22,7 @@ RADIOD = os.path.abspath(os.path.join(sys.argv.pop(1), "radiod"))
 SERVICE = "net.example.radio"
 FIRST_PASSED = 3  # SD_LISTEN_FDS_START
 BOUND = 60
+LAYERS = [f"PELORIN_PREFERENCES_{layer}" for layer in ("VENDOR", "SYSTEM", "USER")]
 
 
 def message(operation, value=None):
@@ -37,6 +38,7 @@ class Activation(unittest.TestCase):
         os.mkfifo(self.fifo)
         self.notifications = self.bound(socket.SOCK_DGRAM, pathlib.Path(folder.name, "notify"))
         os.environ["VOX_RUNTIME_DIR"] = folder.name
+        os.environ.update({name: folder.name + "/nothing" for name in LAYERS})
         os.environ["NOTIFY_SOCKET"] = str(pathlib.Path(folder.name, "notify"))
 
     def bound(self, kind, place):
@@ -85,7 +87,7 @@ class Activation(unittest.TestCase):
 
     @unittest.skipUnless(shutil.which("systemd-socket-activate"), "systemd is not there")
     def test_the_first_client_starts_the_service_and_loses_nothing(self):
-        kept = ("VOX_RUNTIME_DIR", "NOTIFY_SOCKET", "ASAN_OPTIONS", "TSAN_OPTIONS")
+        kept = ("VOX_RUNTIME_DIR", "NOTIFY_SOCKET", "ASAN_OPTIONS", "TSAN_OPTIONS", *LAYERS)
         process = self.service("systemd-socket-activate", "--listen", self.place, f"--fdname={SERVICE}.socket",
                                *(f"--setenv={name}={os.environ.get(name, '')}" for name in kept))
         first = self.client(7)

@@ -3,8 +3,10 @@
 usage: radiod_test.py FOLDER-OF-THE-EXAMPLES
 """
 
+import fcntl
 import os
 import pathlib
+import struct
 import subprocess
 import sys
 import tempfile
@@ -17,6 +19,7 @@ import vox_client  # noqa: E402
 EXAMPLES = pathlib.Path(sys.argv.pop(1))
 SCRIPTS = pathlib.Path(__file__).resolve().parents[2] / "examples" / "data"
 SERVICE = "net.example.radio"
+TCGETS2 = 0x802C542A
 
 
 def message(operation, path, value=None, author="python"):
@@ -30,20 +33,34 @@ class Radiod(unittest.TestCase):
         folder = tempfile.TemporaryDirectory()
         self.addCleanup(folder.cleanup)
         self.fifo = os.path.join(folder.name, "modem")
+        self.terminal = os.path.join(folder.name, "terminal")
         os.mkfifo(self.fifo)
         self.log = pathlib.Path(folder.name, "log")
         os.environ["VOX_RUNTIME_DIR"] = os.path.join(folder.name, "run")
         self.folder = folder.name
+        for layer in ("VENDOR", "SYSTEM", "USER"):
+            os.environ["PELORIN_PREFERENCES_" + layer] = os.path.join(self.folder, layer)
+        os.mkdir(os.path.join(self.folder, "SYSTEM"))
 
-    def serve(self, modem):
-        self.radiod = self.start("radiod", "--modem", modem, "--log", self.log)
-        self.client = vox_client.Connection.open(SERVICE)
+    def settings(self, **settings):
+        """What an administrator writes, all at once."""
+        lines = "".join(f"{key} = {value!r}\n" for key, value in settings.items())
+        new = pathlib.Path(self.folder, "new")
+        new.write_text(lines)
+        new.rename(new.with_name("SYSTEM") / "radiod.toml")
+
+    def serve(self, *options, service=SERVICE):
+        self.radiod = self.start("radiod", *options, "--log", self.log)
+        self.client = vox_client.Connection.open(service)
         self.addCleanup(self.client.close)
 
     def start(self, program, *arguments):
         process = subprocess.Popen([EXAMPLES / program, *arguments], stdout=subprocess.DEVNULL)
         self.addCleanup(self.end, process)
         return process
+
+    def start_modem(self, script):
+        return self.start("modem", "--script", SCRIPTS / script, "--link", self.terminal, "--lines", self.fifo)
 
     def end(self, process):
         if process.poll() is None:
@@ -85,7 +102,8 @@ class Recorded(Radiod):
 
     def setUp(self):
         super().setUp()
-        self.serve(self.fifo)
+        self.settings(modem="/nowhere")  # options win
+        self.serve("--modem", self.fifo)
 
     def test_sets_gets_and_watches_a_property(self):
         self.watch("/settings/volume")
@@ -162,14 +180,7 @@ class Terminal(Radiod):
 
     def setUp(self):
         super().setUp()
-        self.terminal = os.path.join(self.folder, "terminal")
-        self.serve(self.terminal)  # before it is there
-
-    def start_modem(self, script):
-        modem = subprocess.Popen([EXAMPLES / "modem", "--script", SCRIPTS / script, "--link", self.terminal,
-                                  "--lines", self.fifo], stdout=subprocess.DEVNULL)
-        self.addCleanup(self.end, modem)
-        return modem
+        self.serve("--modem", self.terminal)  # before it is there
 
     def test_asks_a_modem_as_often_as_it_comes(self):
         self.watch("/radio/signal", "/radio/sim", "/radio/operator")
@@ -216,6 +227,29 @@ class Terminal(Radiod):
         self.assertIn('AT+CPIN="****"', log)
         for secret in ('"1234', "31 32 33 34", '"9876', "39 38 37 36"):
             self.assertNotIn(secret, log)
+
+
+class Settings(Radiod):
+    """Radiod without options for its modem."""
+
+    def test_it_follows_what_an_administrator_edits(self):
+        name = "org.example.radio"
+        self.start_modem("modem_script.txt")
+        self.settings(service=name, modem="/nowhere")
+        self.serve(service=name)
+        self.watch("/radio/signal")
+        self.assertEqual(self.notified(), ("/radio/signal", None))
+        for setting, speed in ((9600, 9600), ("12345", 12345), ("fast", 115200)):
+            with self.subTest(setting=setting):
+                self.settings(service=name, modem=self.terminal, baud=setting)
+                self.notified_until("/radio/signal", -59)
+                with open(self.terminal, "rb") as terminal:
+                    attributes = fcntl.ioctl(terminal, TCGETS2, bytes(44))
+                self.assertEqual(struct.unpack_from("=I", attributes, 40), (speed,))
+        self.settings(service="com.example.radio", modem="/nowhere")
+        self.notified_until("/radio/signal", None)
+        self.end(self.radiod)
+        self.assertIn("com.example.radio will be served from the next start on", self.log.read_text())
 
 
 if __name__ == "__main__":
