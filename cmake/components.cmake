@@ -35,6 +35,8 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/deputy.h
     platform/linux/dispatch/detached_thread.h
     platform/linux/dispatch/dump.cpp
+    platform/linux/dispatch/fork.cpp
+    platform/linux/dispatch/fork.h
     platform/linux/dispatch/futex.h
     platform/linux/dispatch/group.cpp
     platform/linux/dispatch/io_watch.h

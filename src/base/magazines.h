@@ -43,6 +43,9 @@ class Magazines {
         *local.place++ = unused;
     }
 
+    // The depot's, for a fork: nobody is in the middle of a change while it is held.
+    static BriefMutex& depotLock() noexcept { return depot.lock(); }
+
   private:
     struct Magazine {
         Magazine* next = nullptr;  // in the depot
@@ -69,6 +72,8 @@ class Magazines {
             if (!give(empty_, emptyCount_, given))
                 delete given;
         }
+
+        BriefMutex& lock() noexcept { return lock_; }
 
       private:
         Magazine* take(Magazine*& list, std::size_t& count) noexcept {

@@ -39,6 +39,13 @@
 // takes it after some milliseconds.
 //
 // An exception that leaves submitted work ends the process.
+//
+// After fork(2), queues work in the child, which has a pool of its own. What waited
+// on them, timers, sources and the watchdog stay with the parent: the child forgets
+// them, closures undestroyed. Work that forks goes on in the child; a suspended queue
+// stays suspended. What other threads held at that time, such as groups entered,
+// mutexes and connections, is held for ever: create anew what the child uses, or
+// call exec.
 namespace dispatch {
 
 inline constexpr unsigned kMaximumWorkers = 512;

@@ -19,17 +19,17 @@ constexpr unsigned kMostAtOnce = 16;
 }  // namespace
 
 std::atomic<std::uint32_t> deputy::watching_{0};
+std::atomic<bool> deputy::made_{false};
 
 void deputy::start() noexcept {
-    static std::atomic<bool> made{false};
     if (watching_.exchange(1, std::memory_order_acq_rel))
         return;
-    if (made.exchange(true)) {
+    if (made_.exchange(true)) {
         futex_wake(watching_, 1);
         return;
     }
     if (start_detached(&deputy::main, nullptr) != 0) {
-        made.store(false);
+        made_.store(false);
         watching_.store(0, std::memory_order_release);  // the next call tries again
     }
 }

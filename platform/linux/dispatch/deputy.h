@@ -18,12 +18,19 @@ class deputy {
             start();
     }
 
+    // In the child of a fork: the thread is the parent's.
+    static void forked() noexcept {
+        made_.store(false, std::memory_order_relaxed);
+        watching_.store(0, std::memory_order_relaxed);
+    }
+
   private:
     static void start() noexcept;
     static void* main(void*) noexcept;
     static void observe() noexcept;
 
     static std::atomic<std::uint32_t> watching_;  // futex: 0 asleep, 1 awake
+    static std::atomic<bool> made_;
 };
 
 }  // namespace dispatch::detail

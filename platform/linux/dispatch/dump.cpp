@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "dispatch/diagnostics.h"
+#include "platform/linux/dispatch/fork.h"
 #include "platform/linux/dispatch/poller.h"
 #include "platform/linux/dispatch/pool.h"
 #include "platform/linux/dispatch/queue_cells.h"
@@ -171,11 +172,19 @@ class picture {
     std::int64_t now_ = 0;
 };
 
+std::mutex& one_at_a_time() {
+    static std::mutex& lock = *new std::mutex;
+    return lock;
+}
+
 }  // namespace
 
+void detail::forks::lock_dump(moment when) noexcept {
+    hold(one_at_a_time(), when);
+}
+
 std::string dump() {
-    static std::mutex& one_at_a_time = *new std::mutex;
-    const std::lock_guard guard(one_at_a_time);
+    const std::lock_guard guard(one_at_a_time());
     return picture().text();
 }
 

@@ -4,6 +4,7 @@
 #include <new>
 
 #include "dispatch/queue.h"
+#include "platform/linux/dispatch/fork.h"
 #include "src/base/magazines.h"
 
 // Recycled nodes of queues' lists.
@@ -38,6 +39,10 @@ struct slabs {
 using store = plr::detail::Magazines<closure_item, slabs>;
 
 }  // namespace
+
+void forks::lock_items(moment when) noexcept {
+    hold(store::depotLock(), when);
+}
 
 closure_item* allocate_item() {
     if constexpr (plr::detail::kRecycle)

@@ -34,14 +34,35 @@ poller& poller::shared() noexcept {
     return made;
 }
 
-poller::poller() noexcept
-    : epoll_(make_epoll()),
-      interruption_(::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC)),
-      timers_(epoll_, kFirstTimerTag) {
+poller::poller() noexcept {
+    open();
+}
+
+void poller::open() noexcept {
+    epoll_ = make_epoll();
+    interruption_ = ::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC);
     epoll_event interest{};
     interest.events = EPOLLIN | EPOLLET;
     interest.data.u64 = kInterruptionTag;
     PLR_ASSERT(::epoll_ctl(epoll_, EPOLL_CTL_ADD, interruption_, &interest) == 0, "eventfd");
+    timers_.open(epoll_, kFirstTimerTag);
+}
+
+void poller::at_fork(forks::moment when) noexcept {
+    forks::hold(timers_.lock(), when);
+    forks::hold(lock_, when);
+}
+
+// What the parent waits for is not to be touched: the descriptors are closed, which
+// are the parent's as well.
+void poller::forked() noexcept {
+    ::close(epoll_);
+    ::close(interruption_);
+    timers_.forked();
+    scoped_lock guard(lock_);
+    places_.clear();
+    free_.clear();
+    open();
 }
 
 void poller::interrupt() noexcept {
@@ -122,6 +143,8 @@ int poller::change(io_watch& watch, std::uint32_t interest) noexcept {
 
 bool poller::remove(io_watch& watch) noexcept {
     scoped_lock guard(lock_);
+    if (watch.slot_ >= places_.size() || places_[watch.slot_].watch != &watch)
+        return true;  // from before a fork
     ::epoll_ctl(epoll_, EPOLL_CTL_DEL, watch.fd_, nullptr);
     places_[watch.slot_].watch = nullptr;
     free_.push_back(watch.slot_);  // never grows past places_.size(), which add() reserved

@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "platform/linux/dispatch/fork.h"
 #include "platform/linux/dispatch/io_watch.h"
 #include "platform/linux/dispatch/spin_lock.h"
 #include "platform/linux/dispatch/timer_queue.h"
@@ -26,6 +27,10 @@ class poller {
 
     [[nodiscard]] timer_queue& timers() noexcept { return timers_; }
 
+    // For forks. The child has descriptors of its own, and nothing is waited for.
+    void at_fork(forks::moment when) noexcept;
+    void forked() noexcept;
+
     // For io_watch.
     [[nodiscard]] int add(io_watch& watch, std::uint32_t interest) noexcept;
     [[nodiscard]] int change(io_watch& watch, std::uint32_t interest) noexcept;
@@ -47,11 +52,12 @@ class poller {
     };
 
     poller() noexcept;
+    void open() noexcept;
     void deliver(std::uint64_t tag, std::uint32_t events) noexcept;
     static std::uint64_t tag_of(const io_watch& watch) noexcept;
 
-    int epoll_;
-    int interruption_;  // eventfd, edge-triggered, so that nobody has to read it
+    int epoll_ = -1;
+    int interruption_ = -1;  // eventfd, edge-triggered, so that nobody has to read it
     timer_queue timers_;
     spin_lock lock_;
     std::vector<place> places_ PLR_GUARDED_BY(lock_);

@@ -36,7 +36,10 @@ unsigned usable_processors() noexcept {
 std::atomic<pool*> pool::shared_{nullptr};
 
 pool& pool::make() noexcept {
-    static pool* const made = new pool;  // never destroyed: workers outlive main()
+    static pool* const made = [] {  // never destroyed: workers outlive main()
+        forks::expect();
+        return new pool;
+    }();
     shared_.store(made, std::memory_order_release);
     return *made;
 }
@@ -249,6 +252,31 @@ void pool::leave_idle(worker& self) noexcept {
     // nobody else may wait in the poller yet.
     if (self.polling)
         self.polling = poller_ = false;
+}
+
+// ---- Forks ---------------------------------------------------------------------------------
+
+void pool::at_fork(forks::moment when) noexcept {
+    forks::hold(all_lock_, when);
+    forks::hold(idle_lock_, when);
+}
+
+void pool::forked() noexcept {
+    for (run_list& each : lists_)
+        each.clear();
+    take_lock_.assert_held();  // by nobody who is here
+    take_lock_.unlock();
+    scoped_lock guard(all_lock_);
+    scoped_lock idle(idle_lock_);
+    all_.clear();
+    sleepers_.clear();
+    poller_ = false;
+    if (current_worker)
+        all_.push_back(current_worker);
+    sleeping_.store(0);
+    searching_.store(0);
+    blocked_.store(0);
+    workers_.store(static_cast<unsigned>(all_.size()));
 }
 
 // ---- Blocking and growing ------------------------------------------------------------------

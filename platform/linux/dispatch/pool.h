@@ -9,6 +9,7 @@
 
 #include "dispatch/queue.h"
 #include "platform/linux/dispatch/activity.h"
+#include "platform/linux/dispatch/fork.h"
 #include "platform/linux/dispatch/run_list.h"
 #include "platform/linux/dispatch/spin_lock.h"
 
@@ -64,6 +65,11 @@ class pool {
 
     // For the poller, when it has events in hand and is no poller any more.
     void leave_idle(worker& self) noexcept;
+
+    // For forks. In the child, the calling thread is the only worker that is left, if
+    // it is one.
+    void at_fork(forks::moment when) noexcept;
+    void forked() noexcept;
 
     // For the deputy.
     struct progress {

@@ -1,5 +1,6 @@
 #include "platform/linux/dispatch/pump_core.h"
 
+#include <fcntl.h>
 #include <poll.h>
 #include <sys/eventfd.h>
 #include <unistd.h>
@@ -88,6 +89,18 @@ void pump_core::run(queue_core& served) noexcept {
     while (!stopped_.exchange(false, std::memory_order_acq_rel))
         if (!process(served))
             wait();
+}
+
+void pump_core::forked() noexcept {
+    state expected = state::ready;
+    state_.compare_exchange_strong(expected, state::idle, std::memory_order_relaxed);
+    server_.store(nullptr, std::memory_order_relaxed);
+    // The same number, but the child's own.
+    const int own = ::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC);
+    if (own >= 0) {
+        ::dup3(own, descriptor_, O_CLOEXEC);
+        ::close(own);
+    }
 }
 
 void pump_core::stop() noexcept {

@@ -26,6 +26,9 @@ class pump_core {
     // closed: the pool shall have it.
     [[nodiscard]] bool announce() noexcept;
 
+    // In the child of a fork: any of its threads may serve, and nothing is announced.
+    void forked() noexcept;
+
     [[nodiscard]] int descriptor() const noexcept { return descriptor_; }
     bool process(queue_core& served) noexcept;
     void run(queue_core& served) noexcept;

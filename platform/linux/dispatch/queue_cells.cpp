@@ -4,6 +4,7 @@
 
 #include <new>
 
+#include "platform/linux/dispatch/fork.h"
 #include "src/base/magazines.h"
 
 namespace dispatch::detail {
@@ -140,4 +141,10 @@ void if_live(const queue_core* core, const std::function<void(queue_core&)>& loo
 }
 
 }  // namespace queue_cells
+
+void forks::lock_queues(moment when) noexcept {
+    hold(queue_cells::pages.lock(), when);
+    hold(queue_cells::store::depotLock(), when);
+}
+
 }  // namespace dispatch::detail

@@ -504,6 +504,27 @@ bool queue_core::is_current() const noexcept {
     return false;
 }
 
+// ---- Forks -----------------------------------------------------------------------------
+
+void queue_core::forked() noexcept {
+    if (pump_ && !target_)
+        pump_->forked();
+    walked_.store(false, std::memory_order_relaxed);
+    suspension_.fetch_and(~kParked, std::memory_order_relaxed);
+    stub_.next.store(nullptr, std::memory_order_relaxed);
+    if (!is_current()) {
+        references_.store(1, std::memory_order_relaxed);
+        begin_list_at(&stub_, nullptr);
+        tail_.store(nullptr, std::memory_order_relaxed);
+    } else if (!is_global()) {
+        // This thread's own: what it runs at present is all there is.
+        item* const last = running_.load(std::memory_order_relaxed);
+        begin_list_at(last, nullptr);
+        last->next.store(nullptr, std::memory_order_relaxed);
+        tail_.store(last, std::memory_order_relaxed);
+    }
+}
+
 // ---- Suspension ------------------------------------------------------------------------
 
 bool queue_core::is_held_back() const noexcept {

@@ -139,6 +139,9 @@ class queue_core {
         return tail_.load(std::memory_order_relaxed) != running_.load(std::memory_order_relaxed);
     }
 
+    // In the child of a fork: forgets what waits, and threads that are not there.
+    void forked() noexcept;
+
     // ---- Looking inside: any thread ---------------------------------------------
 
     void enable_statistics(bool on);

@@ -3,6 +3,7 @@
 #include <memory>
 #include <utility>
 
+#include "platform/linux/dispatch/fork.h"
 #include "platform/linux/dispatch/queue_core.h"
 
 namespace dispatch::detail {
@@ -11,6 +12,10 @@ namespace {
 spin_lock specifics_lock;
 
 }  // namespace
+
+void forks::lock_specifics(moment when) noexcept {
+    hold(specifics_lock, when);
+}
 
 void queue_core::set_specific(const void* key, void* value, void (*destructor)(void*)) {
     auto fresh = std::unique_ptr<specific>(new specific{key, value, destructor, nullptr});

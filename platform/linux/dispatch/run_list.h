@@ -28,6 +28,12 @@ class run_list {
         return tail_.load(std::memory_order_seq_cst) == nullptr;
     }
 
+    // Forgets what is in it. For the child of a fork.
+    void clear() noexcept {
+        tail_.store(nullptr, std::memory_order_relaxed);
+        head_.store(nullptr, std::memory_order_relaxed);
+    }
+
     // Null when empty.
     item* take() noexcept {
         if (empty())

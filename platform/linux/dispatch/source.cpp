@@ -11,6 +11,7 @@
 #include <new>
 #include <system_error>
 
+#include "platform/linux/dispatch/fork.h"
 #include "platform/linux/dispatch/poller.h"
 #include "platform/linux/dispatch/pool.h"
 #include "platform/linux/dispatch/queue_core.h"
@@ -183,6 +184,11 @@ queue serial(const queue& on) {
 }
 
 }  // namespace
+
+void forks::lock_sources(moment when) noexcept {
+    hold(descriptor_lock, when);
+    hold(timer_memories::depotLock(), when);
+}
 
 void retain(source_core* core) noexcept {
     core->retain();

@@ -32,7 +32,7 @@ bool is_kernels(clock which) noexcept {
 
 }  // namespace
 
-timer_queue::timer_queue(int epoll, std::uint64_t first_tag) noexcept {
+void timer_queue::open(int epoll, std::uint64_t first_tag) noexcept {
     static_assert(std::size(kClocks) == std::tuple_size_v<decltype(clocks_)>);
     std::size_t i = 0;
     for (const clockid_t clock : kClocks) {
@@ -44,6 +44,16 @@ timer_queue::timer_queue(int epoll, std::uint64_t first_tag) noexcept {
             plr::report("dispatch: no timer descriptor (%s)", ::strerrordesc_np(errno));
         PLR_ASSERT(made >= 0, "timerfd_create");
         clocks_[i++].descriptor = made;
+    }
+}
+
+void timer_queue::forked() noexcept {
+    scoped_lock guard(lock_);
+    for (per_clock& each : clocks_) {
+        ::close(each.descriptor);
+        each.armed = timer_wheel::kNever;
+        each.pending = 0;
+        each.wheel.clear();
     }
 }
 

@@ -32,9 +32,11 @@ class timer_entry : public wheel_entry {
 
 class timer_queue {
   public:
-    // Adds the timerfds to the poller's descriptor, `first_tag` + clock being
+    // Makes the timerfds and adds them to the poller's descriptor, `first_tag` + clock being
     // their epoll data.
-    timer_queue(int epoll, std::uint64_t first_tag) noexcept;
+    void open(int epoll, std::uint64_t first_tag) noexcept;
+    // In the child of a fork, before it is opened again: nothing is pending.
+    void forked() noexcept PLR_EXCLUDES(lock_);
 
     // Owners may keep state of their own under it. Not to be held over expire().
     [[nodiscard]] spin_lock& lock() noexcept PLR_RETURN_CAPABILITY(lock_) { return lock_; }

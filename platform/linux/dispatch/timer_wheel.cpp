@@ -122,6 +122,12 @@ void timer_wheel::open(unsigned place) noexcept {
     }
 }
 
+void timer_wheel::clear() noexcept {
+    while (levels_ != 0)
+        for (wheel_entry* each = detach(first_place()).first; each; each = each->next_)
+            each->place_ = wheel_entry::kNowhere;
+}
+
 void timer_wheel::set_back(std::int64_t now) noexcept {
     if (now >= base_)
         return;

@@ -67,6 +67,9 @@ class timer_wheel {
     // removed. kNever when nothing is pending.
     [[nodiscard]] std::int64_t earliest() const noexcept;
 
+    // Nothing is pending any more. Takes time for each entry.
+    void clear() noexcept;
+
     // The clock was set back to `now`: later deadlines are no longer due. Takes
     // time for each entry. Does nothing when the clock was not set back.
     void set_back(std::int64_t now) noexcept;

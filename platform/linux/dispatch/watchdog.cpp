@@ -2,6 +2,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <condition_variable>
 #include <mutex>
 #include <unordered_map>
@@ -9,6 +10,7 @@
 
 #include "dispatch/diagnostics.h"
 #include "platform/linux/dispatch/detached_thread.h"
+#include "platform/linux/dispatch/fork.h"
 #include "platform/linux/dispatch/pool.h"
 #include "platform/linux/dispatch/queue_cells.h"
 #include "platform/linux/dispatch/queue_core.h"
@@ -25,10 +27,18 @@ using std::chrono::nanoseconds;
 // between. It is made when first wanted, and sleeps without a tick when not.
 class watchdog {
   public:
+    // Never destroyed.
     static watchdog& shared() {
-        static watchdog& made = *new watchdog;
-        return made;
+        watchdog* seen = made.load(std::memory_order_acquire);
+        if (seen)
+            return *seen;
+        auto* const fresh = new watchdog;
+        if (made.compare_exchange_strong(seen, fresh, std::memory_order_acq_rel))
+            return *fresh;
+        delete fresh;
+        return *seen;
     }
+    static void forget() noexcept { made.store(nullptr, std::memory_order_relaxed); }
 
     void set(nanoseconds limit, block<void(const overrun&)>&& handler) {
         std::unique_lock guard(lock_);
@@ -116,6 +126,8 @@ class watchdog {
         changed_.notify_all();
     }
 
+    static inline std::atomic<watchdog*> made{nullptr};
+
     std::mutex lock_;
     std::condition_variable changed_;
     nanoseconds limit_{0};
@@ -128,6 +140,11 @@ class watchdog {
 };
 
 }  // namespace
+
+// Its thread is the parent's.
+void detail::forks::forget_watchdog() noexcept {
+    watchdog::forget();
+}
 
 void set_watchdog(nanoseconds limit, block<void(const overrun&)> handler) {
     watchdog::shared().set(limit, std::move(handler));
