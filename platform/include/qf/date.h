@@ -12,7 +12,8 @@ PLR_EXPORT QfDateRef qf_date_create(int64_t nanoseconds);
 PLR_EXPORT int64_t qf_date_get_nanoseconds(QfDateRef date);
 
 // A locale by its POSIX name ("de_DE.UTF-8", "C"); "" is that of the
-// environment. Null when the system does not have it.
+// environment. Null when the system does not have it, or it writes other
+// characters than UTF-8 or ASCII.
 PLR_EXPORT QfLocaleRef qf_locale_create(const char* name);
 PLR_EXPORT const char* qf_locale_get_name(QfLocaleRef locale);
 

@@ -148,7 +148,7 @@ std::size_t hash_of_scalar(const qf::header* value) noexcept {
     switch (value->kind) {
         case qf::type::number: {
             const exact number = exact_value(as<qf_number>(value));
-            return mixed(kind + 16u * number.kind, number.bits);
+            return mixed(kind << 8 | number.kind, number.bits);
         }
         case qf::type::boolean:
             return mixed(kind, as<qf_boolean>(value)->value);

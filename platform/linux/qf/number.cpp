@@ -12,6 +12,12 @@ QfNumberRef make_number(QfNumberType type, std::uint64_t bits) noexcept {
     return qf::make<qf_number>(0, type, bits);
 }
 
+// One past the range of an integer type: a power of two, which every float has.
+template <class Integer>
+constexpr double kPastEnd = 2.0 *
+                            static_cast<double>(std::uint64_t{1}
+                                                << (std::numeric_limits<Integer>::digits - 1));
+
 template <class Value>
 Value load(const void* value) noexcept {
     Value loaded;
@@ -34,9 +40,7 @@ bool fits(Integer from, Target to) noexcept {
     if constexpr (std::is_integral_v<Target>) {
         return std::cmp_equal(from, to);
     } else {
-        // One past the range is a power of two, which every float has.
-        constexpr auto kEnd = static_cast<Target>(std::numeric_limits<Integer>::max() / 2 + 1) * 2;
-        return to < kEnd && static_cast<Integer>(to) == from;
+        return static_cast<double>(to) < kPastEnd<Integer> && static_cast<Integer>(to) == from;
     }
 }
 
@@ -51,12 +55,10 @@ bool convert_integer(Integer from, void* value) noexcept {
 
 template <class Target>
 Target cut(double from) noexcept {
-    constexpr double kEnd =
-        2.0 * static_cast<double>(std::numeric_limits<Target>::max() / 2 + 1);  // one past
     constexpr auto kLeast = static_cast<double>(std::numeric_limits<Target>::min());
     if (std::isnan(from))
         return 0;
-    if (from >= kEnd)
+    if (from >= kPastEnd<Target>)
         return std::numeric_limits<Target>::max();
     return from <= kLeast ? std::numeric_limits<Target>::min() : static_cast<Target>(from);
 }
@@ -70,8 +72,7 @@ bool convert_float(double from, void* value) noexcept {
         to = static_cast<Target>(from);
     std::memcpy(value, &to, sizeof to);
     if constexpr (std::is_integral_v<Target>)
-        return from < 2.0 * static_cast<double>(std::numeric_limits<Target>::max() / 2 + 1) &&
-               static_cast<double>(to) == from;
+        return from < kPastEnd<Target> && static_cast<double>(to) == from;
     else
         return static_cast<double>(to) == from || std::isnan(from);
 }

@@ -75,7 +75,7 @@ void reserve(vox_dictionary_object& dictionary, std::uint32_t capacity) noexcept
         return;
     auto* entries =
         static_cast<vox_dictionary_entry*>(allocate(capacity * sizeof(vox_dictionary_entry)));
-    if (dictionary.count > 0)
+    if (dictionary.entries)
         std::memcpy(entries, dictionary.entries, dictionary.count * sizeof *entries);
     if (dictionary.entries != dictionary.inline_entries())
         deallocate(dictionary.entries);
