@@ -177,8 +177,11 @@ target_file target_of(QfStringRef application, QfStringRef user, QfStringRef hos
     const bool any_host = is(host, kQfPreferencesAnyHost);
     if (folder.empty() || (!any_host && !is_name(on)))
         return {{}, 0, 0, system_error(ENOENT, folder.empty() ? "home folder" : "host name")};
-    const std::string path =
-        folder + "/" + std::string(view(application)) + (any_host ? "" : "@" + on) + ".toml";
+    std::string path = folder + "/";
+    path += view(application);
+    if (!any_host)
+        path += "@" + on;
+    path += ".toml";
     return any_user ? target_file{path, 0644, 0755, {}} : target_file{path, 0600, 0700, {}};
 }
 

@@ -33,7 +33,10 @@ struct selection {
     std::string application;
     std::string user;
     std::string host;
-    friend auto operator<=>(const selection&, const selection&) = default;
+    friend bool operator<(const selection& left, const selection& right) noexcept {
+        return std::tie(left.application, left.user, left.host) <
+               std::tie(right.application, right.user, right.host);
+    }
 };
 
 // What the files of a selection say together.
