@@ -59,19 +59,22 @@ void deputy::observe() noexcept {
         const pool::progress seen = watched.look();
         const bool moved = seen.taken != last.taken || seen.polled != last.polled;
         last = seen;
-        if (moved) {
+        if (!seen.waiting)
+            watched.relax();
+        if (moved && !watched.is_distressed()) {
             reinforcements = 1;
             continue;
         }
         if (!seen.waiting && seen.poller)
             return;
-        if (!seen.waiting || seen.sleeping > 0) {
+        if (!seen.waiting || (seen.sleeping > 0 && !watched.is_distressed())) {
             watched.reinforce();  // takes the work, or becomes the poller
             continue;
         }
         // All workers are at it. When they compute, more of them would not help.
-        if (watched.runnable_workers() >= watched.processors())
+        if (watched.unstuck_workers() >= watched.processors())
             continue;
+        watched.distress();
         for (unsigned i = 0; i < reinforcements && watched.reinforce(); ++i) {
         }
         reinforcements = std::min(2 * reinforcements, kMostAtOnce);

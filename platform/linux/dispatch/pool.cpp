@@ -11,6 +11,7 @@
 #include "platform/linux/dispatch/detached_thread.h"
 #include "platform/linux/dispatch/io_watch.h"
 #include "platform/linux/dispatch/poller.h"
+#include "platform/linux/dispatch/queue_cells.h"
 #include "platform/linux/dispatch/queue_core.h"
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
@@ -22,6 +23,8 @@ namespace {
 
 constexpr unsigned kBatch = 256;
 constexpr auto kRetireAfter = std::chrono::seconds(10);
+constexpr auto kRetireSparesAfter = std::chrono::seconds(1);
+constexpr unsigned kSpare = 4;           // sleepers for each processor
 constexpr unsigned kTakenPerStamp = 64;  // so often a worker that never rests reads the clock
 
 unsigned usable_processors() noexcept {
@@ -70,17 +73,22 @@ void pool::notify() noexcept {
     deputy::watch();
 }
 
-bool pool::wake_one() noexcept {
+bool pool::wake_one(bool any) noexcept {
     worker* chosen = nullptr;
     bool polling = false;
     {
         scoped_lock guard(idle_lock_);
-        if (sleepers_.empty())
-            return false;
         // The poller stays where it is as long as somebody else can come.
-        const auto last = std::find_if(sleepers_.rbegin(), sleepers_.rend(),
-                                       [](const worker* each) { return !each->polling; });
-        chosen = last == sleepers_.rend() ? sleepers_.back() : *last;
+        for (auto each = sleepers_.rbegin(); each != sleepers_.rend(); ++each) {
+            if (!any && (*each)->reserved.load(std::memory_order_relaxed))
+                continue;
+            if (!chosen || chosen->polling)
+                chosen = *each;
+            if (!chosen->polling)
+                break;
+        }
+        if (!chosen)
+            return false;
         polling = chosen->polling;
         remove_sleeper(*chosen);
         searching_.fetch_add(1, std::memory_order_seq_cst);
@@ -154,7 +162,7 @@ void pool::run(worker& self) noexcept {
     activity::of_this_thread().stamp();
     for (unsigned taken = 1;; ++taken) {
         priority level;
-        if (item* work = take(level)) {
+        if (item* work = take(self, level)) {
             if (searching) {
                 searching = false;
                 // The last searcher that found work sends the next one.
@@ -179,16 +187,45 @@ void pool::run(worker& self) noexcept {
     }
 }
 
-item* pool::take(priority& level) noexcept {
-    if (!has_waiting_work())
+item* pool::take(worker& self, priority& level) noexcept {
+    if (!has_waiting_work() && !is_distressed())
         return nullptr;
     scoped_lock guard(take_lock_);
-    for (unsigned i = 0; i < lists_.size(); ++i) {
-        if (item* work = lists_[i].take()) {
+    item* work = nullptr;
+    if (!is_distressed()) [[likely]] {
+        work = take_first(lists_, level);
+    } else {
+        if (!self.reserved.load(std::memory_order_relaxed) && reserved_ < processors_) {
+            self.reserved.store(true, std::memory_order_relaxed);
+            ++reserved_;
+        }
+        work = take_quick(level);
+        if (!work && !self.reserved.load(std::memory_order_relaxed))
+            work = take_first(deferred_, level);
+    }
+    if (work)
+        taken_.store(taken_.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
+    return work;
+}
+
+item* pool::take_first(std::array<run_list, 3>& from, priority& level) noexcept {
+    for (unsigned i = 0; i < from.size(); ++i) {
+        if (item* work = from[i].take()) {
             level = static_cast<priority>(i);
-            taken_.store(taken_.load(std::memory_order_relaxed) + 1, std::memory_order_relaxed);
             return work;
         }
+    }
+    return nullptr;
+}
+
+// What is not quick is put off.
+item* pool::take_quick(priority& level) noexcept {
+    while (item* work = take_first(lists_, level)) {
+        const queue_core* queue =
+            work->run == &queue_tag ? queue_core::of(work) : queue_core::global(level);
+        if (queue->is_quick())
+            return work;
+        deferred_[static_cast<unsigned>(level)].push(work);
     }
     return nullptr;
 }
@@ -205,10 +242,11 @@ void pool::execute(item* work, priority level) noexcept {
     if (work->run == &embedded_tag) {
         auto* embedded = static_cast<embedded_item*>(work);
         embedded->function(embedded);
-        return;
+    } else {
+        work->run(work);
+        recycle_item(static_cast<closure_item*>(work));
     }
-    work->run(work);
-    recycle_item(static_cast<closure_item*>(work));
+    queue_core::global(level)->was_drained();
 }
 
 // Idle until there may be work. Returns false when the worker shall retire; else
@@ -234,7 +272,7 @@ bool pool::sleep(worker& self) noexcept {
         return true;
     }
     while (!self.wake.load(std::memory_order_acquire)) {
-        if (futex_wait(self.wake, 0, time::after(kRetireAfter)))
+        if (futex_wait(self.wake, 0, time::after(patience())))
             continue;
         scoped_lock guard(idle_lock_);
         if (self.wake.load(std::memory_order_acquire))
@@ -265,18 +303,24 @@ void pool::forked() noexcept {
     for (run_list& each : lists_)
         each.clear();
     take_lock_.assert_held();  // by nobody who is here
-    take_lock_.unlock();
     scoped_lock guard(all_lock_);
     scoped_lock idle(idle_lock_);
     all_.clear();
     sleepers_.clear();
     poller_ = false;
-    if (current_worker)
+    for (run_list& each : deferred_)
+        each.clear();
+    distressed_.store(false);
+    reserved_ = 0;
+    if (current_worker) {
+        current_worker->reserved = false;
         all_.push_back(current_worker);
+    }
     sleeping_.store(0);
     searching_.store(0);
     blocked_.store(0);
     workers_.store(static_cast<unsigned>(all_.size()));
+    take_lock_.unlock();
 }
 
 // ---- Blocking and growing ------------------------------------------------------------------
@@ -303,14 +347,21 @@ void pool::did_block() noexcept {
 }
 
 bool pool::reinforce() noexcept {
-    return (sleeping_.load(std::memory_order_seq_cst) > 0 && wake_one()) || add_worker();
+    const bool any = has_waiting_work() || !is_distressed();
+    return (sleeping_.load(std::memory_order_seq_cst) > 0 && wake_one(any)) || add_worker();
+}
+
+// More than there are processors for are needed only after much has blocked.
+std::chrono::nanoseconds pool::patience() const noexcept {
+    return sleeping_.load(std::memory_order_relaxed) > kSpare * processors_ ? kRetireSparesAfter
+                                                                            : kRetireAfter;
 }
 
 pool::progress pool::look() noexcept {
     progress seen{};
     seen.taken = taken_.load(std::memory_order_relaxed);
     seen.polled = polled_.load(std::memory_order_relaxed);
-    seen.waiting = has_waiting_work();
+    seen.waiting = has_waiting_work() || has_deferred_work();
     scoped_lock guard(idle_lock_);
     seen.sleeping = static_cast<unsigned>(sleepers_.size());
     seen.poller = poller_;
@@ -328,19 +379,72 @@ void pool::look_at_workers(std::vector<view>& seen) noexcept {
     }
 }
 
+bool pool::is_runnable(const worker& one) noexcept {
+    char path[64];
+    std::snprintf(path, sizeof path, "/proc/self/task/%d/stat", one.thread);
+    char state = '?';
+    if (std::FILE* file = std::fopen(path, "re")) {
+        if (std::fscanf(file, "%*d (%*[^)]) %c", &state) != 1)
+            state = '?';
+        std::fclose(file);
+    }
+    return state == 'R';
+}
+
 unsigned pool::runnable_workers() noexcept {
     scoped_lock guard(all_lock_);
-    return static_cast<unsigned>(std::count_if(all_.begin(), all_.end(), [](const worker* each) {
-        char path[64];
-        std::snprintf(path, sizeof path, "/proc/self/task/%d/stat", each->thread);
-        char state = '?';
-        if (std::FILE* file = std::fopen(path, "re")) {
-            if (std::fscanf(file, "%*d (%*[^)]) %c", &state) != 1)
-                state = '?';
-            std::fclose(file);
-        }
-        return state == 'R';
+    return static_cast<unsigned>(std::count_if(
+        all_.begin(), all_.end(), [](const worker* each) { return is_runnable(*each); }));
+}
+
+unsigned pool::unstuck_workers() noexcept {
+    scoped_lock guard(all_lock_);
+    return static_cast<unsigned>(std::count_if(all_.begin(), all_.end(), [](worker* each) {
+        const std::uint64_t step = each->doing->steps.load(std::memory_order_relaxed);
+        const bool idle = !each->doing->queue.load(std::memory_order_relaxed);
+        if (idle || each->blocked_at == step)
+            return false;
+        if (is_runnable(*each))
+            return true;
+        each->blocked_at = step;
+        return false;
     }));
+}
+
+// The queues of workers that are stuck are not quick; a reserved worker that is stuck
+// makes place for another.
+void pool::distress() noexcept {
+    std::vector<const queue_core*> slow;
+    {
+        scoped_lock guard(all_lock_);
+        scoped_lock taking(take_lock_);
+        distressed_.store(true, std::memory_order_relaxed);
+        slow.reserve(all_.size());
+        for (worker* each : all_) {
+            const std::uint64_t step = each->doing->steps.load(std::memory_order_relaxed);
+            if (each->blocked_at != step || each->slow_at == step)
+                continue;
+            each->slow_at = step;
+            slow.push_back(each->doing->queue.load(std::memory_order_relaxed));
+            if (each->reserved.exchange(false, std::memory_order_relaxed))
+                --reserved_;
+        }
+    }
+    for (const queue_core* each : slow)
+        queue_cells::if_live(each, [](queue_core& found) { found.was_slow(); });
+}
+
+void pool::relax() noexcept {
+    if (!is_distressed())
+        return;
+    scoped_lock guard(all_lock_);
+    scoped_lock taking(take_lock_);
+    if (has_waiting_work() || has_deferred_work())
+        return;
+    distressed_.store(false, std::memory_order_relaxed);
+    reserved_ = 0;
+    for (worker* each : all_)
+        each->reserved.store(false, std::memory_order_relaxed);
 }
 
 // A worker that was woken is runnable from then on, though it may still be listed as

@@ -4,6 +4,7 @@
 
 #include <array>
 #include <atomic>
+#include <chrono>
 #include <cstdint>
 #include <vector>
 
@@ -24,6 +25,12 @@
 // nobody, because that worker comes for it next. The deputy (deputy.h) mends what that leaves open:
 // it wakes or adds workers when work waits and none is taken.
 //
+// Distress: when work waits and workers block where the library cannot see it, the
+// deputy adds workers, and work of queues that were quick so far goes first; as many
+// workers as there are processors are reserved for it. So queues that block do not
+// hold up others, also when there are more of them than there may be workers. A
+// queue is quick that was once drained without the deputy finding its worker stuck.
+//
 // No wake-up is lost: who pushes publishes the work and then looks for sleepers;
 // who goes to sleep publishes itself and then looks for work (all seq_cst).
 namespace dispatch::detail {
@@ -32,7 +39,11 @@ struct worker {
     std::atomic<std::uint32_t> wake{0};
     bool polling = false;  // under pool::idle_lock_
     pid_t thread = 0;
-    const activity* doing = nullptr;  // its thread's
+    const activity* doing = nullptr;    // its thread's
+    std::atomic<bool> reserved{false};  // changes under pool::take_lock_
+    // The deputy's: at this piece of work it was seen waiting for something.
+    std::uint64_t blocked_at = ~std::uint64_t{0};
+    std::uint64_t slow_at = ~std::uint64_t{0};  // and its queue was told
 };
 
 class pool {
@@ -85,6 +96,15 @@ class pool {
     bool reinforce() noexcept;
     // Workers that the system has on a processor or in its run queue.
     [[nodiscard]] unsigned runnable_workers() noexcept;
+    // The same, but for those that were seen waiting in their present piece of work:
+    // these cost nothing again. The deputy only.
+    [[nodiscard]] unsigned unstuck_workers() noexcept;
+    // Distress begins or goes on; is over if nothing waits.
+    void distress() noexcept;
+    void relax() noexcept;
+    [[nodiscard]] bool is_distressed() const noexcept {
+        return distressed_.load(std::memory_order_relaxed);
+    }
 
     // For those who look on: a picture of each worker, into `seen`, which has room
     // for kMaximumWorkers.
@@ -107,10 +127,19 @@ class pool {
 
     void run(worker& self) noexcept;
     static void execute(item* work, priority level) noexcept;
-    [[nodiscard]] item* take(priority& level) noexcept;
+    [[nodiscard]] item* take(worker& self, priority& level) noexcept;
+    [[nodiscard]] item* take_quick(priority& level) noexcept PLR_REQUIRES(take_lock_);
+    [[nodiscard]] item* take_first(std::array<run_list, 3>& from, priority& level) noexcept
+        PLR_REQUIRES(take_lock_);
+    [[nodiscard]] bool has_deferred_work() const noexcept {
+        return !deferred_[0].empty() || !deferred_[1].empty() || !deferred_[2].empty();
+    }
     [[nodiscard]] bool sleep(worker& self) noexcept;
     void notify() noexcept;
-    bool wake_one() noexcept;
+    // A reserved one only if `any`.
+    bool wake_one(bool any = true) noexcept;
+    [[nodiscard]] static bool is_runnable(const worker& one) noexcept;
+    [[nodiscard]] std::chrono::nanoseconds patience() const noexcept;
     bool add_worker() noexcept;
     void remove_sleeper(worker& self) noexcept PLR_REQUIRES(idle_lock_);
 
@@ -119,6 +148,9 @@ class pool {
     std::array<run_list, 3> lists_;
     alignas(64) spin_lock take_lock_;
     std::atomic<std::uint64_t> taken_{0};
+    std::array<run_list, 3> deferred_;  // in distress: of queues not known to be quick
+    std::atomic<bool> distressed_{false};
+    unsigned reserved_ PLR_GUARDED_BY(take_lock_) = 0;  // workers
 
     alignas(64) std::atomic<unsigned> sleeping_{0};  // entries of sleepers_
     std::atomic<unsigned> searching_{0};             // awake, without work

@@ -359,6 +359,7 @@ bool queue_core::run_nested(item* work, unsigned& budget) noexcept {
 bool queue_core::run_owned(unsigned& budget) noexcept {
     switch (drain(budget)) {
         case outcome::idle:
+            was_drained();
             release_reference();
             return true;
         case outcome::parked:
@@ -502,6 +503,11 @@ bool queue_core::is_current() const noexcept {
         if (is_target_of(held->queue))
             return true;
     return false;
+}
+
+void queue_core::was_slow() noexcept {
+    for (queue_core* level = this; level; level = level->target_)
+        level->reputation_.store(reputation::slow, std::memory_order_relaxed);
 }
 
 // ---- Forks -----------------------------------------------------------------------------

@@ -142,6 +142,20 @@ class queue_core {
     // In the child of a fork: forgets what waits, and threads that are not there.
     void forked() noexcept;
 
+    // Whether its work is known to end soon, for the pool: drained, it is unless it
+    // was slow meanwhile, and then the next time.
+    [[nodiscard]] bool is_quick() const noexcept {
+        return reputation_.load(std::memory_order_relaxed) == reputation::quick;
+    }
+    void was_drained() noexcept {
+        const reputation before = reputation_.load(std::memory_order_relaxed);
+        if (before != reputation::quick) [[unlikely]]
+            reputation_.store(before == reputation::slow ? reputation::unknown : reputation::quick,
+                              std::memory_order_relaxed);
+    }
+    // It and its targets.
+    void was_slow() noexcept;
+
     // ---- Looking inside: any thread ---------------------------------------------
 
     void enable_statistics(bool on);
@@ -168,6 +182,8 @@ class queue_core {
     static queue_core* of(item* work) noexcept { return static_cast<place*>(work)->owner; }
 
   private:
+    enum class reputation : std::uint8_t { unknown, quick, slow };
+
     static constexpr std::uint8_t kGlobal = 1;
     static constexpr std::uint8_t kMeasured = 2;
     static constexpr std::uint8_t kPumped = 4;
@@ -254,6 +270,7 @@ class queue_core {
     std::atomic<std::uint32_t> suspension_{0};
     bool counted_ = false;  // ownership holds a reference
     std::atomic<bool> walked_{false};
+    std::atomic<reputation> reputation_{reputation::unknown};
     std::atomic<specific*> specifics_{nullptr};
     std::atomic<latencies*> statistics_{nullptr};
     const char* const label_;
