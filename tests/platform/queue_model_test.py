@@ -15,7 +15,7 @@ MODEL, COMPILER = sys.argv[1:3]
 del sys.argv[1:]
 
 MEGABYTES = 2000
-SECONDS = 250  # on a machine that does much else; a few without
+SECONDS = 400  # on a machine that does much else; a few without
 
 ONE_PRODUCER = "CHILDREN=0 PRODUCER0=ROOT ITEMS0=2"
 
@@ -42,7 +42,8 @@ FAULTS = {
 
 
 def check(macros):
-    """The checker's output for one configuration."""
+    """The checker's output for one configuration. A fault is found before optimising pays."""
+    level = "-O0" if "FAULT" in macros else "-O2"
     with tempfile.TemporaryDirectory() as folder:
         def run(*command):
             done = subprocess.run(command, cwd=folder, capture_output=True, text=True, timeout=SECONDS)
@@ -51,7 +52,7 @@ def check(macros):
             return done.stdout
 
         run("spin", "-a", *(f"-D{each}" for each in macros.split()), MODEL)
-        run(COMPILER, "-O2", "-w", "-DSAFETY", f"-DMEMLIM={MEGABYTES}", "-o", "pan", "pan.c")
+        run(COMPILER, level, "-w", "-DSAFETY", f"-DMEMLIM={MEGABYTES}", "-o", "pan", "pan.c")
         return run("./pan", "-m10000")
 
 
