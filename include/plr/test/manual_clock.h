@@ -36,9 +36,10 @@ class ManualClock {
     }
 
   private:
-    static std::int64_t& start(dispatch::clock on) noexcept {
-        static std::int64_t starts[2];
-        return starts[on == dispatch::clock::boot];
+    // Threads may still be reading by the clock of the test before.
+    static std::atomic<std::int64_t>& start(dispatch::clock on) noexcept {
+        static std::atomic<std::int64_t> starts[2];
+        return starts[on == dispatch::clock::boot ? 1 : 0];
     }
     static std::int64_t read(dispatch::clock on) noexcept { return start(on) + elapsed_; }
 
