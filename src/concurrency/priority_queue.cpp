@@ -48,7 +48,7 @@ struct HighestWork {
 PriorityQueue::PriorityQueue(const std::string& name)
     // A target is fixed when its queue is created, so the work queue is made
     // first; what the caller sees of failures is as if it were made last.
-    : normal_(), highest_(), work_(createOrNull(name, ".work", {})) {
+    : work_(createOrNull(name, ".work", {})) {
     normal_ = createOrNull(name, ".normal", work_);
     PLR_ASSERT(normal_, "fNormalQueue");
     highest_ = createOrNull(name, ".highest", work_);
