@@ -7,6 +7,7 @@ export PKG_CONFIG_PATH=$prefix/lib/pkgconfig LD_LIBRARY_PATH=$prefix/lib
 mkdir -p "$build"
 pkgconf --validate pelorin
 pkgconf --validate pelorin-platform
+pkgconf --validate pelorin-test
 link=()
 if [[ $kind == static ]]; then
     link=(--static)
@@ -17,3 +18,9 @@ gcc -std=c11 -Wall -Werror "${cflags[@]}" -c "$consumer/values.c" -o "$build/val
 g++ -std=c++20 -Wall -Werror "${link[@]/#--static/-static}" "${cflags[@]}" "$consumer/main.cpp" \
     "$build/values.o" "${libs[@]}" -o "$build/consumer"
 "$build/consumer"
+
+read -ra cflags < <(pkgconf --cflags pelorin-test)
+read -ra libs < <(pkgconf --libs "${link[@]}" pelorin-test)
+g++ -std=c++20 -Wall -Werror "${link[@]/#--static/-static}" "${cflags[@]}" "$consumer/test.cpp" \
+    "${libs[@]}" -o "$build/consumer_test"
+"$build/consumer_test"
