@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstdio>
+#include <cstdlib>
 #include <deque>
 #include <memory>
 #include <string_view>
@@ -28,6 +29,8 @@
 //   hop               work of queue A posts to B, that to A, …; ns a hop
 //   round_robin       one producer posts to 1,000 queues in turn; until all
 //                     ran; ns a closure
+//   many_queues       the same with 10,000 queues and 1,000 closures each, of which
+//                     each checks that it comes in its order
 //   create            create and destroy a queue without work; ns
 //   outside           post, the closure signals, the poster waits; all threads
 //                     on one processor; us
@@ -38,6 +41,8 @@ inline constexpr std::uint64_t kHops = 1'000'000;
 inline constexpr std::uint64_t kCreations = 1'000'000;
 inline constexpr std::uint64_t kWaits = 100'000;
 inline constexpr std::size_t kQueues = 1'000;
+inline constexpr std::size_t kManyQueues = 10'000;
+inline constexpr std::uint32_t kEach = 1'000;
 
 // Signals once it was counted down to 0.
 class Countdown {
@@ -138,6 +143,33 @@ std::int64_t roundRobin(Peer& peer, std::uint64_t posts) {
 }
 
 template <class Peer>
+int manyQueues(Peer& peer) {
+    struct Line {
+        explicit Line(Peer& on) : queue(on) {}
+        typename Peer::Queue queue;
+        std::uint32_t next = 0;
+        std::uint32_t faults = 0;
+    };
+    std::deque<Line> lines;
+    for (std::size_t i = 0; i < kManyQueues; ++i)
+        lines.emplace_back(peer);
+    Countdown done(kManyQueues);
+    const std::int64_t start = nowNs();
+    for (std::uint32_t n = 0; n < kEach; ++n)
+        for (Line& line : lines)
+            line.queue.post([&line, n] { line.faults += line.next++ != n; });
+    for (Line& line : lines)
+        line.queue.post([&done] { done(); });
+    done.wait();
+    const std::int64_t taken = nowNs() - start;
+    for (const Line& line : lines)
+        if (line.next != kEach || line.faults != 0)
+            fail("work was lost or came out of its order");
+    result("ns", static_cast<double>(taken) / static_cast<double>(kManyQueues * kEach));
+    return 0;
+}
+
+template <class Peer>
 std::int64_t create(Peer& peer, std::uint64_t count) {
     const std::int64_t start = nowNs();
     for (std::uint64_t n = 0; n < count; ++n) {
@@ -168,24 +200,30 @@ int report(std::uint64_t operations, Measure measure) {
     return 0;
 }
 
-// Runs the case that the command line names.
+// Runs the case that the command line names; a second argument is the number of
+// operations, in place of the usual one.
 template <class Peer>
 int run(int argc, char** argv) {
-    const std::string_view name = argc == 2 ? argv[1] : "";
+    const std::string_view name = argc >= 2 ? argv[1] : "";
+    const auto usual = [&](std::uint64_t operations) {
+        return argc == 3 ? std::strtoull(argv[2], nullptr, 10) : operations;
+    };
     const bool pinned = name == "outside";
     if (pinned)
         pinTo(1);
     Peer peer(pinned ? 1 : 2);
     if (name == "post_drain_1")
-        return report(kPosts, [&](std::uint64_t n) { return postDrain(peer, 1, n); });
+        return report(usual(kPosts), [&](std::uint64_t n) { return postDrain(peer, 1, n); });
     if (name == "post_drain_2")
-        return report(kPosts, [&](std::uint64_t n) { return postDrain(peer, 2, n); });
+        return report(usual(kPosts), [&](std::uint64_t n) { return postDrain(peer, 2, n); });
     if (name == "hop")
-        return report(kHops, [&](std::uint64_t n) { return hop(peer, n); });
+        return report(usual(kHops), [&](std::uint64_t n) { return hop(peer, n); });
     if (name == "round_robin")
-        return report(kPosts, [&](std::uint64_t n) { return roundRobin(peer, n); });
+        return report(usual(kPosts), [&](std::uint64_t n) { return roundRobin(peer, n); });
+    if (name == "many_queues")
+        return manyQueues(peer);
     if (name == "create")
-        return report(kCreations, [&](std::uint64_t n) { return create(peer, n); });
+        return report(usual(kCreations), [&](std::uint64_t n) { return create(peer, n); });
     if (name == "outside")
         return report(kWaits, [&](std::uint64_t n) { return outside(peer, n); });
     std::fprintf(stderr, "unknown case\n");

@@ -1,7 +1,8 @@
 // The plain reference: a mutex and a deque a queue, swapped whole by the worker
 // that empties it, on a pool that is a mutex, a condition variable and a deque.
-// Also `mutex`: lock and unlock of an uncontended std::mutex, which idle sync()
-// is held against.
+// Also `bound`: a closure is allocated, linked, called and freed on one thread,
+// which post and drain is held against; and `mutex`: lock and unlock of an uncontended std::mutex,
+// which idle sync() is held against.
 
 #include <condition_variable>
 #include <deque>
@@ -108,6 +109,41 @@ struct MutexPeer {
     Pool pool;
 };
 
+struct Node {
+    virtual ~Node() = default;
+    virtual void call() = 0;
+    Node* next = nullptr;
+};
+template <class Callable>
+struct Made final : Node {
+    explicit Made(Callable given) : work(given) {}
+    void call() override { work(); }
+    Callable work;
+};
+
+// In batches, as many as a queue has waiting when its worker keeps up.
+int onOneThread() {
+    constexpr std::uint64_t kBatch = 256;
+    std::uint64_t ran = 0;
+    return bench::dispatch_cases::report(10'000'000, [&](std::uint64_t count) {
+        const std::int64_t start = bench::nowNs();
+        for (std::uint64_t n = 0; n < count; n += kBatch) {
+            Node* first = nullptr;
+            Node** last = &first;
+            for (std::uint64_t i = 0; i < kBatch; ++i) {
+                auto work = [&ran] { ++ran; };
+                *last = new Made<decltype(work)>(work);
+                last = &(*last)->next;
+            }
+            while (first) {
+                const std::unique_ptr<Node> done(std::exchange(first, first->next));
+                done->call();
+            }
+        }
+        return bench::nowNs() - start;
+    });
+}
+
 int lockAndUnlock() {
     // A second thread exists, so that the C library does not leave the lock's
     // atomic operations out.
@@ -130,5 +166,7 @@ int lockAndUnlock() {
 int main(int argc, char** argv) {
     if (argc == 2 && std::string_view(argv[1]) == "mutex")
         return lockAndUnlock();
+    if (argc == 2 && std::string_view(argv[1]) == "bound")
+        return onOneThread();
     return bench::dispatch_cases::run<MutexPeer>(argc, argv);
 }
