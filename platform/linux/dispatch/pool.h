@@ -146,9 +146,9 @@ class pool {
     static std::atomic<pool*> shared_;
 
     std::array<run_list, 3> lists_;
+    std::array<run_list, 3> deferred_;  // in distress: of queues not known to be quick
     alignas(64) spin_lock take_lock_;
     std::atomic<std::uint64_t> taken_{0};
-    std::array<run_list, 3> deferred_;  // in distress: of queues not known to be quick
     std::atomic<bool> distressed_{false};
     unsigned reserved_ PLR_GUARDED_BY(take_lock_) = 0;  // workers
 
