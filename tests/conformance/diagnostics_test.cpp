@@ -64,7 +64,7 @@ TEST(Dump, ShowsWhatRunsWaitsAndIsSuspended) {
         EXPECT_THAT(text, ContainsRegex("\"the target\": .*1 waits\n"));
         EXPECT_THAT(text, HasSubstr("\"suspended one\": not running, 1 waits, suspended 2\n"));
         EXPECT_THAT(text, Not(HasSubstr("idle one")));
-        EXPECT_THAT(text, ContainsRegex("[1-9] boot, first in (59.9 min|3[56][0-9]+[.][0-9] s)"));
+        EXPECT_THAT(text, ContainsRegex("[1-9] boot, first in 3[56][0-9]+[.][0-9] s"));
     }
     suspended.resume();
     suspended.resume();
@@ -76,6 +76,7 @@ TEST(Dump, ShowsWhatRunsWaitsAndIsSuspended) {
 TEST(Dump, MayLookAtAnyTime) {
     std::atomic<bool> stop{false};
     std::vector<std::jthread> threads;
+    threads.reserve(3);
     const auto shared = queue::create("shared");
     for (int i = 0; i < 3; ++i)
         threads.emplace_back([&] {
