@@ -356,6 +356,7 @@ pelorin_component(log_values LEVEL 2 LIBRARY pelorin
   SOURCES
     src/log/log_level.cpp
     src/log/log_message.cpp
+    src/log/log_message_lock.h
     src/log/log_message_buffer.cpp
     src/log/log_tag.cpp)
 
@@ -415,6 +416,8 @@ pelorin_component(log_core LEVEL 3 LIBRARY pelorin
     src/log/level_table.h
     src/log/log_delivery.cpp
     src/log/log_delivery.h
+    src/log/log_forks.cpp
+    src/log/log_forks.h
     src/log/log_file.cpp
     src/log/log_file.h
     src/log/log_server.cpp

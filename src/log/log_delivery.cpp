@@ -12,6 +12,7 @@
 #include "plr/log/log_writer.h"
 #include "plr/log/memory_buffered_log_writer.h"
 #include "plr/log/static_logger.h"
+#include "src/log/log_forks.h"
 
 namespace plr {
 namespace {
@@ -59,14 +60,19 @@ LogDelivery::LogDelivery(LogServer& server, const std::string& name,
                          std::unique_ptr<MemoryBufferedLogWriter> startupBuffer)
     : server_(server),
       writersQueue_(dispatch::queue::create("logmaster::" + name + "::writers")),
-      startupBuffer_(std::move(startupBuffer)) {}
+      startupBuffer_(std::move(startupBuffer)) {
+    log_forks::add(*this);
+}
 
-LogDelivery::~LogDelivery() = default;
+LogDelivery::~LogDelivery() {
+    log_forks::remove(*this);
+}
 
 template <class Work>
 auto LogDelivery::syncOnWriters(Work&& work) {
     return writersQueue_.queue().sync([&] {
         writersQueue_.assertCurrent();
+        const detail::BriefLock writing(writing_);
         deliverPending();
         return work();
     });
@@ -205,10 +211,43 @@ vox::array LogDelivery::describeWriters(Report report) {
     });
 }
 
+// ---- Around a fork ----
+
+void LogDelivery::beforeFork() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
+    forksInWriter_ = writersQueue_.queue().is_current();
+    if (!forksInWriter_)
+        writing_.lock();
+    lock_.lock();
+}
+
+void LogDelivery::afterForkInParent() noexcept PLR_NO_THREAD_SAFETY_ANALYSIS {
+    lock_.unlock();
+    if (!forksInWriter_)
+        writing_.unlock();
+}
+
+// The queue is idle here, whatever it was at in the parent, and the timer is gone.
+void LogDelivery::afterForkInChild() PLR_NO_THREAD_SAFETY_ANALYSIS {
+    pending_.messages.clear();
+    for (Operation& operation : pending_.operations)
+        operation.position = 0;
+    dropped_ = 0;
+    timerIsSet_ = false;
+    state_ = pending_.empty() ? State::Idle : State::Scheduled;
+    const bool wake = state_ == State::Scheduled;
+    afterForkInParent();
+    if (wake)
+        schedule();
+}
+
 // ---- On the writers queue ----
 
 void LogDelivery::deliverScheduled() {
-    const bool delivered = deliverPending();
+    bool delivered = false;
+    {
+        const detail::BriefLock writing(writing_);
+        delivered = deliverPending();
+    }
     State next{};
     {
         const detail::BriefLock guard(lock_);

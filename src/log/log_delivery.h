@@ -26,6 +26,8 @@
 //          Scheduled: a delivery is queued or running.
 //          Lingering: a delivery has just run; a timer looks again soon, so
 //          that messages that follow each other wake nobody, one by one.
+// fork():  waits for the writer call that is under way. The child goes on with the
+//          writers as they are; what waits is its parent's to write.
 namespace plr {
 
 class BatchLogWriter;
@@ -53,6 +55,11 @@ class LogDelivery {
     // In a signal handler of a dying process: stops the writers queue and writes
     // what it did not get to. Async-signal-safe.
     void drainInCrash() noexcept;
+
+    // Around a fork, on the thread that forks.
+    void beforeFork() noexcept;
+    void afterForkInParent() noexcept;
+    void afterForkInChild();
 
   private:
     // Runs before the message at `position`.
@@ -111,6 +118,8 @@ class LogDelivery {
     };
 
     Progress progress_;
+    detail::BriefMutex writing_;  // held while writers are called; taken before lock_
+    bool forksInWriter_ = false;  // the thread that forks holds writing_ already
     LogServer& server_;
     const QueueRole writersQueue_;
 

@@ -5,6 +5,7 @@
 
 #include "plr/log/log_message_buffer.h"
 #include "src/base/magazines.h"
+#include "src/log/log_message_lock.h"
 
 namespace plr {
 
@@ -36,6 +37,8 @@ class LogMessageStore {
         }
         return {&record->message, Empty{}, Place<std::byte>{record}};
     }
+
+    static detail::BriefMutex& lock() noexcept { return Records::depotLock(); }
 
   private:
     static constexpr std::size_t kCounts = 64;      // bytes; more than any implementation takes
@@ -110,6 +113,10 @@ class LogMessageStore {
             delete record;
     }
 };
+
+detail::BriefMutex& detail::logMessageLock() noexcept {
+    return LogMessageStore::lock();
+}
 
 void LogMessage::takeFrom(LogMessageBuffer& buffer) {
     metaData_.swap(buffer.metaData_);

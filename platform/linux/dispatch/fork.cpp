@@ -42,7 +42,7 @@ void in_child() noexcept {
 
 void expect() noexcept {
     // Out of memory: then a child may only call exec.
-    static_cast<void>(::pthread_atfork(&before, &in_parent, &in_child));
+    [[maybe_unused]] static const int added = ::pthread_atfork(&before, &in_parent, &in_child);
 }
 
 }  // namespace dispatch::detail::forks

@@ -7,8 +7,9 @@
 // the queues it has, without work, workers and descriptors of the parent.
 namespace dispatch::detail::forks {
 
-// Called when the pool is made: the handlers are there from then on (POSIX
-// pthread_atfork).
+// Called when the first queue or the pool is made: the handlers are there from
+// then on (POSIX pthread_atfork). Whoever has a queue may then add handlers of his
+// own, whose locks a fork takes before those of this folder.
 void expect() noexcept;
 
 // Of the files that have locks of their own.

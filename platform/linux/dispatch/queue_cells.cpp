@@ -34,6 +34,7 @@ static_assert(sizeof(page) == 64);
 class register_of_pages {
   public:
     page* make(std::size_t count, std::align_val_t alignment) {
+        forks::expect();
         void* memory = ::operator new(sizeof(page) + count * sizeof(queue_cell), alignment);
         page* made = ::new (memory) page;
         made->count = count;
