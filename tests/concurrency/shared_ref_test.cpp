@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "plr/concurrency/qf_shared_ref.h"
+#include "support/qf_balance.h"
 
 namespace {
 

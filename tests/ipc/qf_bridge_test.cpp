@@ -7,6 +7,7 @@
 #include <string>
 
 #include "plr/ipc/values.h"
+#include "support/qf_balance.h"
 #include "support/vox_values.h"
 
 namespace {

@@ -44,8 +44,8 @@ class CountingWriter : public plr::LogWriter {
 // While threads log, a child that forks logs too, and does not write what its
 // parent has to write.
 TEST(LogFork, TheChildLogsWhateverTheParentsThreadsWereAt) {
-    if (plr::test::kThreadSanitized)
-        GTEST_SKIP() << "ThreadSanitizer has no threads in a child that forked";
+    if (plr::test::kSanitized)
+        GTEST_SKIP() << "sanitizers' heaps stay locked when other threads allocate at a fork";
     int ends[2];
     ASSERT_EQ(::pipe(ends), 0);
     const auto server = plr::LogServer::create("s", nullptr);
@@ -65,8 +65,7 @@ TEST(LogFork, TheChildLogsWhateverTheParentsThreadsWereAt) {
                     server->debugFlush();
             }
         });
-    const int rounds = plr::test::kSanitized ? 20 : 200;
-    for (int i = 0; i < rounds; ++i) {
+    for (int i = 0; i < 200; ++i) {
         const pid_t child = ::fork();
         if (child == 0) {
             ::prctl(PR_SET_PDEATHSIG, SIGKILL);

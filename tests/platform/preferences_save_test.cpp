@@ -14,6 +14,7 @@
 #include <functional>
 
 #include "preferences_support.h"
+#include "support/qf_balance.h"
 
 namespace plr::test {
 namespace {

@@ -8,6 +8,7 @@
 #include "platform/linux/qf/preferences_names.h"
 #include "platform/linux/qf/preferences_write.h"
 #include "preferences_support.h"
+#include "support/qf_balance.h"
 
 namespace plr::test {
 namespace {
