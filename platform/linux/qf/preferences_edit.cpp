@@ -128,7 +128,7 @@ class editor {
     bool add(const key_path& path, QfTypeRef value) {
         std::string lines;
         if (QfDictionaryRef table = as_dictionary(value)) {
-            lines = "\n";
+            lines += '\n';
             append_section(lines, path, table);
             replacements_.push_back({text_.size(), 0, std::move(lines)});
             return true;
