@@ -1,4 +1,5 @@
 #include <chrono>
+#include <cstddef>
 #include <cstdlib>
 #include <iostream>
 #include <memory>
@@ -64,9 +65,9 @@ class Poller : public plr::SharedLoggable<Poller> {
 };
 
 void expect(bool holds, const char* claim) {
-    std::cout << (holds ? "ok: " : "failed: ") << claim << '\n';
+    std::cout << (holds ? "ok: " : "failed: ") << claim << std::endl;
     if (!holds)
-        std::exit(1);
+        std::quick_exit(1);
 }
 
 }  // namespace
@@ -84,7 +85,7 @@ int main() {
         Poller::create(plr::DispatchTimerService::create(nullptr), server, service.tested());
     service.answerWith([](const vox::dict&, vox::dict&) { return true; });
     time.advance(24h);
-    expect(service.takeMessages().size() == 24 * 60, "asks every minute");
+    expect(service.takeMessages().size() == std::size_t{24} * 60, "asks every minute");
     expect(log->takeLines().empty(), "does not complain about a service that answers");
 
     service.answerWith({});

@@ -1,8 +1,11 @@
 #pragma once
 
+#include "qf/base.h"
+
+#ifdef __cplusplus
 #include "dispatch/block.h"
 #include "dispatch/queue.h"
-#include "qf/base.h"
+#endif
 
 // Preferences: settings of an application, which an administrator edits in TOML
 // files (toml.io, 1.0) and a program reads and writes here. docs/preferences.md
@@ -84,15 +87,16 @@ PLR_EXPORT QfDictionaryRef qf_preferences_copy_all(QfStringRef application, QfSt
 // or an error, after which the old content stands; the caller releases it. No file
 // can hold null, a URL, an error, a locale or formatter, an unsigned number past
 // 2^63 - 1, text that is not UTF-8, or a dictionary whose only key is "base64".
-[[nodiscard]] PLR_EXPORT QfErrorRef qf_preferences_set_value(QfStringRef key, QfTypeRef value,
-                                                             QfStringRef application,
-                                                             QfStringRef user, QfStringRef host);
+PLR_EXPORT QfErrorRef qf_preferences_set_value(QfStringRef key, QfTypeRef value,
+                                               QfStringRef application, QfStringRef user,
+                                               QfStringRef host)
+    __attribute__((warn_unused_result));
 // Several at once: all of `values` are set and all of `removed` (array of
 // strings, may be null) go, in one write.
-[[nodiscard]] PLR_EXPORT QfErrorRef qf_preferences_set_multiple(QfDictionaryRef values,
-                                                                QfArrayRef removed,
-                                                                QfStringRef application,
-                                                                QfStringRef user, QfStringRef host);
+PLR_EXPORT QfErrorRef qf_preferences_set_multiple(QfDictionaryRef values, QfArrayRef removed,
+                                                  QfStringRef application, QfStringRef user,
+                                                  QfStringRef host)
+    __attribute__((warn_unused_result));
 
 // What is wrong with the files of these layers now: an array of errors, empty
 // when nothing is.

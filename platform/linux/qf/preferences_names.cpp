@@ -152,10 +152,11 @@ file_list files_of(QfStringRef application, QfStringRef user, QfStringRef host) 
     const std::string on = host_name(host);
     file_list result;
     for (const std::string& folder : folders) {
-        const std::string stem = folder + "/" + std::string(view(application));
+        std::string stem = folder + '/';
+        stem += view(application);
         result.paths.push_back(stem + ".toml");
         if (is_name(on))
-            result.paths.push_back(stem + "@" + on + ".toml");
+            result.paths.push_back(stem.append("@").append(on).append(".toml"));
     }
     return result;
 }
