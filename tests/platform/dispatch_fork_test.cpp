@@ -69,13 +69,14 @@ struct Load {
     std::vector<std::jthread> threads;
 };
 
-#define SKIP_WITHOUT_THREADS_AFTER_FORK() \
-    if (plr::test::kThreadSanitized)      \
-    GTEST_SKIP() << "ThreadSanitizer has no threads in a child that forked"
+// Other threads allocate at the fork, and sanitizers' heaps stay locked then;
+// ThreadSanitizer has no threads in the child either.
+#define SKIP_UNDER_SANITIZERS() \
+    if (plr::test::kSanitized)  \
+    GTEST_SKIP() << "sanitizers do not survive a fork with threads"
 
 TEST(Fork, TheChildsQueuesWorkWhateverTheParentsThreadsWereAt) {
-    if (plr::test::kSanitized)
-        GTEST_SKIP() << "sanitizers' heaps stay locked when other threads allocate at a fork";
+    SKIP_UNDER_SANITIZERS();
     const int rounds = 1'000;
     const Load load;
     for (int i = 0; i < rounds; ++i)
@@ -89,7 +90,7 @@ TEST(Fork, TheChildsQueuesWorkWhateverTheParentsThreadsWereAt) {
 }
 
 TEST(Fork, WorkTimersAndSourcesStayWithTheParent) {
-    SKIP_WITHOUT_THREADS_AFTER_FORK();
+    SKIP_UNDER_SANITIZERS();
     const auto serial = queue::create("serial");
     int pipes[2];
     ASSERT_EQ(::pipe2(pipes, O_CLOEXEC), 0);
@@ -122,7 +123,7 @@ TEST(Fork, WorkTimersAndSourcesStayWithTheParent) {
 }
 
 TEST(Fork, AWorkersChildGoesOnWithItsPresentWorkOnly) {
-    SKIP_WITHOUT_THREADS_AFTER_FORK();
+    SKIP_UNDER_SANITIZERS();
     const auto serial = queue::create("serial");
     const auto nested = queue::create("nested", serial);
     for (const queue& on : {serial, nested, queue::global()}) {
