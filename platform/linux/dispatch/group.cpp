@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <cstdint>
+#include <utility>
 #include <vector>
 
 #include "platform/linux/dispatch/futex.h"
@@ -42,12 +43,15 @@ class group_core {
 
     // Whether the count is not 0; then the bit is set.
     [[nodiscard]] bool await() noexcept PLR_REQUIRES(lock_);
+    // Counts the calling worker unless `epoch` is over: then returns false.
+    [[nodiscard]] bool rest(std::uint32_t epoch, int more) noexcept;
 
     std::atomic<std::uint32_t> references_{1};
     std::atomic<std::uint64_t> state_{0};
     spin_lock lock_;
     std::vector<notification> notifications_ PLR_GUARDED_BY(lock_);
-    std::atomic<std::uint32_t> epoch_{0};  // futex of the waiters
+    std::atomic<std::uint32_t> epoch_{0};    // futex of the waiters
+    int resting_ PLR_GUARDED_BY(lock_) = 0;  // workers among them, see pool::rest()
 };
 
 bool group_core::await() noexcept {
@@ -75,6 +79,8 @@ void group_core::leave() noexcept {
         state_.fetch_and(~kAwaited, std::memory_order_acq_rel);
         released.swap(notifications_);
         epoch_.fetch_add(1, std::memory_order_release);
+        if (resting_ != 0)
+            pool::shared().rest(-std::exchange(resting_, 0));
     }
     futex_wake_all(epoch_);
     for (notification& each : released)
@@ -92,13 +98,23 @@ long group_core::wait(time until) {
     if (until == immediately)
         return 1;
     blocking_section blocked;
-    bool in_time = true;
-    while (epoch_.load(std::memory_order_acquire) == epoch) {
-        if (!in_time)
-            return 1;
-        in_time = futex_wait(epoch_, epoch, until);
+    if (!rest(epoch, 1))
+        return 0;
+    while (futex_wait(epoch_, epoch, until))
+        if (epoch_.load(std::memory_order_acquire) != epoch)
+            return 0;
+    return rest(epoch, -1) ? 1 : 0;
+}
+
+bool group_core::rest(std::uint32_t epoch, int more) noexcept {
+    scoped_lock guard(lock_);
+    if (epoch_.load(std::memory_order_relaxed) != epoch)
+        return false;
+    if (pool::is_worker()) {
+        resting_ += more;
+        pool::shared().rest(more);
     }
-    return 0;
+    return true;
 }
 
 void group_core::notify(const queue& on, block<void()>&& work) {

@@ -319,11 +319,16 @@ void pool::forked() noexcept {
     sleeping_.store(0);
     searching_.store(0);
     blocked_.store(0);
+    resting_.store(0);
     workers_.store(static_cast<unsigned>(all_.size()));
     take_lock_.unlock();
 }
 
 // ---- Blocking and growing ------------------------------------------------------------------
+
+bool pool::is_worker() noexcept {
+    return current_worker;
+}
 
 void pool::will_block() noexcept {
     if (!current_worker)
@@ -451,9 +456,9 @@ void pool::relax() noexcept {
 // asleep; one that did something in between the two looks has changed their counts.
 bool pool::is_quiet() noexcept {
     const progress before = look();
-    const unsigned blocked = blocked_.load(std::memory_order_seq_cst);
+    const unsigned resting = resting_.load(std::memory_order_seq_cst);
     if (before.waiting || searching_.load(std::memory_order_seq_cst) > 0 ||
-        before.sleeping + blocked != workers_.load(std::memory_order_seq_cst))
+        before.sleeping + resting != workers_.load(std::memory_order_seq_cst))
         return false;
     return runnable_workers() == 0 && look() == before;
 }

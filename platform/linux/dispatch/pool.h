@@ -67,6 +67,12 @@ class pool {
     // no more. Nothing on other threads.
     void will_block() noexcept;
     void did_block() noexcept;
+    // Workers sleep in such a section and have not been woken: counted by whoever wakes
+    // them, so that nobody who is about to go on counts as one at rest.
+    void rest(int more) noexcept {
+        resting_.fetch_add(static_cast<unsigned>(more), std::memory_order_seq_cst);
+    }
+    [[nodiscard]] static bool is_worker() noexcept;
 
     // There is something to poll for: somebody must exist to do it.
     void ensure_poller() noexcept {
@@ -156,6 +162,7 @@ class pool {
     std::atomic<unsigned> searching_{0};             // awake, without work
     std::atomic<unsigned> workers_{0};
     std::atomic<unsigned> blocked_{0};  // in will_block()
+    std::atomic<unsigned> resting_{0};  // these, while they sleep
     std::atomic<std::uint64_t> polled_{0};
     spin_lock idle_lock_;
     std::vector<worker*> sleepers_ PLR_GUARDED_BY(idle_lock_);  // last slept, first woken

@@ -73,18 +73,28 @@ bool frame::more_to_do() noexcept {
 
 void waiter::wait() noexcept {
     for (unsigned spins = 0; spins < 100 && pool::shared().processors() > 1; ++spins) {
-        if (granted.load(std::memory_order_acquire))
+        if (is_granted())
             return;
         cpu_relax();
     }
     blocking_section blocked;
-    while (!granted.load(std::memory_order_acquire))
-        futex_wait(granted, 0);
+    const std::uint32_t asleep = pool::is_worker() ? kWorkerAsleep : kAsleep;
+    std::uint32_t seen = kAwake;
+    if (!state.compare_exchange_strong(seen, asleep, std::memory_order_acq_rel))
+        return;
+    if (asleep == kWorkerAsleep)
+        pool::shared().rest(1);
+    while (!is_granted())
+        futex_wait(state, asleep);
 }
 
 void waiter::grant() noexcept {
-    granted.store(1, std::memory_order_release);
-    futex_wake(granted, 1);
+    const std::uint32_t before = state.exchange(kGranted, std::memory_order_acq_rel);
+    if (before == kAwake)
+        return;
+    if (before == kWorkerAsleep)
+        pool::shared().rest(-1);
+    futex_wake(state, 1);
 }
 
 // ---- Life -------------------------------------------------------------------------

@@ -62,10 +62,12 @@ struct waiter : item {
     void wait() noexcept;
     void grant() noexcept;
     [[nodiscard]] bool is_granted() const noexcept {
-        return granted.load(std::memory_order_acquire) != 0;
+        return state.load(std::memory_order_acquire) == kGranted;
     }
 
-    std::atomic<std::uint32_t> granted{0};
+    // Who sleeps is to be woken.
+    enum : std::uint32_t { kAwake, kAsleep, kWorkerAsleep, kGranted };
+    std::atomic<std::uint32_t> state{kAwake};
 };
 
 // What the calling thread runs: innermost queue first.
