@@ -14,7 +14,7 @@ endif()
 set(sanitizer_options
   "ASAN_OPTIONS=detect_leaks=1:detect_stack_use_after_return=1:check_initialization_order=1:strict_string_checks=1"
   "UBSAN_OPTIONS=print_stacktrace=1"
-  "TSAN_OPTIONS=halt_on_error=1:second_deadlock_stack=1")
+  "TSAN_OPTIONS=halt_on_error=1:atexit_sleep_ms=50:second_deadlock_stack=1")
 function(pelorin_add_test name)
   cmake_parse_arguments(T "" "TIMEOUT" "LABELS;COMMAND" ${ARGN})
   if(NOT T_TIMEOUT)

@@ -142,6 +142,7 @@ pelorin_component(vox_connections LEVEL 1 LIBRARY platform
     platform/linux/vox/names.cpp
     platform/linux/vox/names.h
     platform/linux/vox/notify.cpp
+    platform/linux/vox/now.h
     platform/linux/vox/output.cpp
     platform/linux/vox/output.h
     platform/linux/vox/passed_sockets.cpp
@@ -682,6 +683,7 @@ pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
     src/rest/property_path.cpp
     src/rest/property_path.h
     src/rest/property_resource.cpp
+  src/rest/request_resource.cpp
     src/rest/request_provider.cpp
     src/rest/request_provider.h
     src/rest/request_resource.cpp
@@ -720,3 +722,15 @@ pelorin_component(test LEVEL 10 LIBRARY test
     src/test/scripted_modem.cpp
     src/test/virtual_time.cpp
     src/test/vox_peer.cpp)
+
+# With names of their own that others of their component have, too: not compiled together.
+set_source_files_properties(
+  platform/linux/dispatch/pump_core.cpp platform/linux/dispatch/queue_core.cpp platform/linux/dispatch/timer_queue.cpp
+  platform/linux/qf/dictionary.cpp platform/linux/qf/preferences_write.cpp platform/linux/qf/url.cpp
+  platform/linux/serial/baud.cpp
+  platform/linux/vox/dictionary.cpp platform/linux/vox/listener_api.cpp
+  src/io/tap_transport.cpp src/io/uart_timeout_transport.cpp src/io/uart_transport.cpp src/log/crash_drain.cpp
+  src/rest/map_resource.cpp src/rest/property_path.cpp src/rest/property_resource.cpp
+  src/rest/request_resource.cpp
+  src/text/gsm7_stages.cpp src/text/octet_transforms.cpp src/text/read_chars.cpp src/text/ussd_text.cpp
+  PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

@@ -75,9 +75,9 @@ TEST(Dump, ShowsWhatRunsWaitsAndIsSuspended) {
 // On queues that come and go, are filled, drained, handed over and nested at the time.
 TEST(Dump, MayLookAtAnyTime) {
     std::atomic<bool> stop{false};
+    const auto shared = queue::create("shared");
     std::vector<std::jthread> threads;
     threads.reserve(3);
-    const auto shared = queue::create("shared");
     for (int i = 0; i < 3; ++i)
         threads.emplace_back([&] {
             while (!stop) {

@@ -9,9 +9,10 @@
 
 #include "Pelorin"
 #include "support/failing_allocations.h"
+#include "support/sanitized.h"
 
 // The C library's functions count here too, but where a sanitizer needs them.
-#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
+#if !PLR_SANITIZED
 extern "C" {
 void* __libc_malloc(std::size_t size);
 void* __libc_calloc(std::size_t count, std::size_t size);

@@ -14,14 +14,6 @@
 #include "support/unix_socket.h"
 #include "support/vox_service.h"
 
-#ifdef __SANITIZE_THREAD__
-// Else each service takes a second to end.
-extern "C" PLR_EXPORT const char* __tsan_default_options();  // NOLINT(bugprone-reserved-identifier)
-const char* __tsan_default_options() {
-    return "atexit_sleep_ms=0";
-}
-#endif
-
 namespace {
 
 using namespace plr::test;

@@ -6,6 +6,7 @@
 
 #include "dispatch/source.h"
 #include "platform/linux/vox/lock.h"
+#include "platform/linux/vox/now.h"
 #include "platform/linux/vox/transactions.h"
 #include "plr/base/assert.h"
 #include "vox/service.h"
@@ -94,10 +95,6 @@ class idle_exit {
     leaving_stage stage_ PLR_GUARDED_BY(lock_) = leaving_stage::none;
     nanoseconds wait_ PLR_GUARDED_BY(lock_) = kShortestWait;
 };
-
-std::int64_t now() noexcept {
-    return dispatch::time::now().nanoseconds();
-}
 
 // What belongs to no single connection.
 bool has_activities() noexcept {

@@ -6,17 +6,10 @@
 #include <utility>
 
 #include "platform/linux/vox/hello.h"
+#include "platform/linux/vox/now.h"
 #include "platform/linux/vox/peer_connection.h"
 
 namespace vox_link {
-namespace {
-
-std::int64_t now() noexcept {
-    return dispatch::time::now().nanoseconds();
-}
-
-}  // namespace
-
 // ---- Of this side --------------------------------------------------------------------
 
 std::uint64_t peer_connection::send_request(vox_object_t message, std::uint32_t timeout_ms,

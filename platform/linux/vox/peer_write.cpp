@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "platform/linux/vox/hello.h"
+#include "platform/linux/vox/now.h"
 #include "platform/linux/vox/peer_connection.h"
 #include "platform/linux/vox/send_turn.h"
 #include "platform/linux/vox/socket_io.h"
@@ -28,10 +29,6 @@ constexpr unsigned kMostWrites = 64;
 // The kernel is short of memory or of room for descriptors under way.
 constexpr std::chrono::milliseconds kShortageDelay(10);
 constexpr std::uint32_t kReading = EPOLLIN | EPOLLRDHUP;
-
-std::int64_t now() noexcept {
-    return dispatch::time::now().nanoseconds();
-}
 
 void discard_descriptors(vox_wire::encoded& made) noexcept {
     for (const int descriptor : made.descriptors)

@@ -8,6 +8,7 @@
 
 #include "dispatch/dispatch.h"
 #include "platform/linux/vox/lock.h"
+#include "platform/linux/vox/now.h"
 #include "platform/linux/vox/peer_connection.h"
 
 namespace vox_link {
@@ -19,10 +20,6 @@ namespace {
 constexpr std::int64_t kDelay = 100'000;             // ns
 constexpr std::int64_t kDelayForEachSender = 1'000;  // ns
 constexpr std::chrono::milliseconds kSweep(1);       // and never longer
-
-std::int64_t now() noexcept {
-    return dispatch::time::now().nanoseconds();
-}
 
 // The senders of one thread's turns. Others look at it when they wait too long.
 struct sender_list {

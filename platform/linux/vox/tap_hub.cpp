@@ -42,7 +42,7 @@ tap_kind kind_of(frame_type type) noexcept {
     }
 }
 
-std::int64_t now() noexcept {
+std::int64_t wall_clock() noexcept {
     timespec time{};
     ::clock_gettime(CLOCK_REALTIME, &time);
     return std::int64_t{time.tv_sec} * 1'000'000'000 + time.tv_nsec;
@@ -93,7 +93,7 @@ struct tap_hub::tap {
     void start() {
         if (std::exchange(started, true))
             return;
-        const vox_object_t value = describe({.time = now()}, nullptr);
+        const vox_object_t value = describe({.time = wall_clock()}, nullptr);
         to->send_entry(value, 0);
         vox_release(value);
     }
@@ -151,7 +151,7 @@ void tap_hub::async(dispatch::block<void()> work) {
 // ---- Entries -------------------------------------------------------------------------
 
 void tap_hub::publish(tapped_client& about, tap_entry entry, std::span<const std::uint8_t> body) {
-    entry.time = now();
+    entry.time = wall_clock();
     {
         const lock_guard guard(lock_);
         if (!about.open_.exchange(entry.kind != tap_kind::close, std::memory_order_relaxed)) {
