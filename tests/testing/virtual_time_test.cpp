@@ -113,6 +113,7 @@ TEST(VirtualTime, WaitsForAllThatFollowsFromATimer) {
         ASSERT_EQ(second.sync([&] { return messages; }), round);
     }
     peer.hangUp();
+    time.settle();  // the handler above hears of it
 }
 
 TEST(VirtualTime, MovesAllClocks) {
