@@ -19,7 +19,8 @@ namespace {
 
 constexpr unsigned kBatch = 256;       // items a queue runs before others get their turn
 constexpr unsigned kLingerAfter = 64;  // a drain that ran that many waits a moment for more
-constexpr unsigned kLingerSpins = 64;
+constexpr unsigned kLingerSpins = 16;
+constexpr unsigned kLingerLooks = 4;
 
 // The producer of the successor is between its two stores.
 item* wait_for_next(item* last) noexcept {
@@ -38,10 +39,12 @@ item* wait_for_next(item* last) noexcept {
 item* linger(item* last, unsigned ran) noexcept {
     if (ran < kLingerAfter || pool::shared().processors() == 1)
         return nullptr;
-    for (unsigned spins = 0; spins < kLingerSpins; ++spins) {
+    // Seldom: each look takes the line from the producer.
+    for (unsigned look = 0; look < kLingerLooks; ++look) {
+        for (unsigned spins = 0; spins < kLingerSpins; ++spins)
+            cpu_relax();
         if (item* next = last->next.load(std::memory_order_acquire))
             return next;
-        cpu_relax();
     }
     return nullptr;
 }
@@ -275,6 +278,7 @@ void queue_core::count_ownership() noexcept {
 queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
     const frame here(this, true);
     const working_on seen(this);
+    const queue_core* const above = target_;  // beside tail_, which is the producers'
     item* work = head_.load(std::memory_order_relaxed);
     running_.store(work, std::memory_order_release);
     for (unsigned ran = 0;; ++ran) {
@@ -284,7 +288,7 @@ queue_core::outcome queue_core::drain(unsigned& budget) noexcept {
                 return outcome::parked;
             running_.store(work, std::memory_order_release);
         }
-        if (target_ && target_->is_held_back()) [[unlikely]] {
+        if (above && above->is_held_back()) [[unlikely]] {
             put_back(work);
             return outcome::more;
         }
