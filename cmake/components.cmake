@@ -47,6 +47,7 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/poller.h
     platform/linux/dispatch/pool.cpp
     platform/linux/dispatch/pool.h
+    platform/linux/dispatch/pool_relief.cpp
     platform/linux/dispatch/pump.cpp
     platform/linux/dispatch/pump_core.cpp
     platform/linux/dispatch/pump_core.h
@@ -56,7 +57,9 @@ pelorin_component(dispatch LEVEL 1 LIBRARY platform
     platform/linux/dispatch/queue_core.cpp
     platform/linux/dispatch/queue_core.h
     platform/linux/dispatch/queue_inspection.cpp
+    platform/linux/dispatch/queue_life.cpp
     platform/linux/dispatch/queue_specific.cpp
+    platform/linux/dispatch/queue_sync.cpp
     platform/linux/dispatch/run_list.h
     platform/linux/dispatch/source.cpp
     platform/linux/dispatch/source_core.cpp

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "dispatch/dispatch.h"
+#include "dispatch/pump.h"
 #include "support/waiting.h"
 
 namespace {
@@ -136,6 +137,21 @@ TEST(Watchdog, NamesTheQueueOfWorkThatTakesTooLongOnce) {
         ASSERT_TRUE(overruns.reported.wait());
         EXPECT_EQ(overruns.label, "longer one");
     }
+}
+
+TEST(Watchdog, CoversTheThreadThatServesAPump) {
+    Overruns overruns(5ms);
+    const dispatch::pump pump("served");
+    std::string text;
+    pump.queue().async([&] {
+        EXPECT_TRUE(overruns.reported.wait());
+        text = dispatch::dump();
+    });
+    pump.process();
+    EXPECT_EQ(overruns.label, "served");
+    const std::string thread = "pump's thread " + std::to_string(::gettid());
+    EXPECT_THAT(text, HasSubstr(thread + ": runs \"served\""));
+    EXPECT_THAT(dispatch::dump(), HasSubstr(thread + ": is elsewhere"));
 }
 
 TEST(Watchdog, IsSilentOnceEndedAlsoByItsOwnHandler) {

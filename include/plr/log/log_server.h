@@ -25,6 +25,8 @@
 //          when it starts, what follows within 100 microseconds after that, or
 //          when 256 messages wait or an Error came.
 // Memory:  what waits for the writers is not bounded unless limitPending() says so.
+// Fork:    fork(2) waits for the writer call that is under way. In the child, what is
+//          logged from then on is written; what waited is the parent's to write.
 namespace plr {
 
 class LevelTable;

@@ -22,12 +22,14 @@
 //          (bench/dispatch_cases.h).
 namespace dispatch {
 
-// Text for people, some lines: the workers with what each of them runs, live
-// queues with what waits on them, pending timers, watched descriptors.
+// Text for people, some lines: the workers, and the threads that serve pumps (pump.h),
+// with what each of them runs, live queues with what waits on them, pending timers,
+// watched descriptors.
 //
 //   dispatch: 3 workers, 2 processors
 //     worker 4711: runs "modem" for up to 12.3 s
 //     worker 4712: polls
+//     pump's thread 4700: is elsewhere
 //   queues: 17, of which 15 are idle
 //     "modem": running, 3 wait, oldest 12.2 s, suspended 1, for "radio"
 //   timers: 12 monotonic, first in 3.2 s
@@ -37,9 +39,8 @@ namespace dispatch {
 // "for up to" counts from when the worker last looked at the clock, which is at
 // most some hundred pieces of work ago; with a watchdog it is as exact as that
 // one. "oldest", the time since the submission of what waits longest, is known of
-// queues that keep statistics. What runs while it looks makes
-// the picture a little uneven; a queue is held up while what waits on it is
-// counted. Throws std::bad_alloc.
+// queues that keep statistics. What runs while it looks makes the picture a little
+// uneven; a queue is held up while what waits on it is counted. Throws std::bad_alloc.
 [[nodiscard]] PLR_EXPORT std::string dump();
 
 // ---- Watchdog ---------------------------------------------------------------------
@@ -47,18 +48,19 @@ namespace dispatch {
 // A piece of work that runs longer than the limit.
 struct overrun {
     std::string_view label;             // its queue's; a loan for the call
-    pid_t thread;                       // the worker that runs it, gettid(2)
+    pid_t thread;                       // that runs it, gettid(2)
     std::chrono::nanoseconds at_least;  // it has run for so long, at the least
 };
 
 // From now on, `handler` is called once for each piece of work that runs on a
-// worker for longer than `limit` (at least 1 ms), between `limit` and a quarter
-// more after its begin: on the watchdog's own thread, one call at a time, while
-// the work still runs. Without a handler it is reported through the report hook
-// (plr/base/report.h). A later call replaces both; a limit of zero ends it, and
-// no call of the former handler is under way when this returns, unless it was the
-// handler that called. Work counts as running while it waits in sync() or blocks;
-// what sync() runs on threads that are not the pool's is not watched.
+// worker, or on a thread that serves a pump, for longer than `limit` (at least
+// 1 ms), between `limit` and a quarter more after its begin: on the watchdog's own
+// thread, one call at a time, while the work still runs. Without a handler it is
+// reported through the report hook (plr/base/report.h). A later call replaces both;
+// a limit of zero ends it, and no call of the former handler is under way when this
+// returns, unless it was the handler that called. Work counts as running while it
+// waits in sync() or blocks; what sync() runs in place on other threads is not
+// watched.
 PLR_EXPORT void set_watchdog(std::chrono::nanoseconds limit,
                              block<void(const overrun&)> handler = nullptr);
 

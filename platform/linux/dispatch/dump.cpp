@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <cstdarg>
 #include <cstdio>
+#include <functional>
 #include <mutex>
 #include <unordered_map>
 #include <vector>
@@ -56,15 +57,15 @@ struct queue_view {
 class picture {
   public:
     picture() {
-        workers_.reserve(kMaximumWorkers);
-        pool::shared().look_at_workers(workers_);
+        threads_.reserve(pool::kMostSeen);
+        pool::shared().look_at_threads(threads_);
         detail::queue_cells::for_each([this](queue_core& each) { add(each); });
         now_ = time::now().nanoseconds();
     }
 
     [[nodiscard]] std::string text() {
         std::string result;
-        append_workers(result);
+        append_threads(result);
         append_queues(result);
         append_timers(result);
         append_descriptors(result);
@@ -74,7 +75,7 @@ class picture {
   private:
     void add(queue_core& each) {
         labels_.emplace(&each, each.label());
-        const bool running = std::any_of(workers_.begin(), workers_.end(),
+        const bool running = std::any_of(threads_.begin(), threads_.end(),
                                          [&](const auto& one) { return one.queue == &each; });
         if (each.is_global() && !each.keeps_statistics())
             return;
@@ -101,17 +102,23 @@ class picture {
         append_one("ran", counted.run);
     }
 
-    void append_workers(std::string& result) {
-        append(result, "dispatch: %zu workers, %u processors%s\n", workers_.size(),
-               pool::shared().processors(),
+    void append_threads(std::string& result) {
+        using role = pool::view::role;
+        const auto is_server = [](const pool::view& each) { return each.as == role::server; };
+        append(result, "dispatch: %td workers, %u processors%s\n",
+               std::ranges::count_if(threads_, std::not_fn(is_server)), pool::shared().processors(),
                pool::shared().has_waiting_work() ? ", work waits for a worker" : "");
-        for (const pool::view& each : workers_) {
-            append(result, "  worker %d: ", each.thread);
+        for (const pool::view& each : threads_) {
+            append(result, "  %s %d: ", is_server(each) ? "pump's thread" : "worker", each.thread);
             if (const auto found = labels_.find(each.queue); found != labels_.end())
                 append(result, "runs \"%.400s\" for up to %s\n", found->second.c_str(),
                        duration(now_ - each.since).c_str());
             else
-                append(result, "%s\n", each.queue ? "runs" : each.polling ? "polls" : "sleeps");
+                append(result, "%s\n",
+                       each.queue                ? "runs"
+                       : is_server(each)         ? "is elsewhere"
+                       : each.as == role::poller ? "polls"
+                                                 : "sleeps");
         }
     }
 
@@ -166,7 +173,7 @@ class picture {
             append(result, "  fd %d: for \"%.400s\"\n", each.fd, each.label.c_str());
     }
 
-    std::vector<pool::view> workers_;
+    std::vector<pool::view> threads_;
     std::unordered_map<const queue_core*, std::string> labels_;
     std::vector<queue_view> queues_;
     std::int64_t now_ = 0;

@@ -5,7 +5,9 @@
 #include <array>
 #include <atomic>
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
+#include <span>
 #include <vector>
 
 #include "dispatch/queue.h"
@@ -112,16 +114,24 @@ class pool {
         return distressed_.load(std::memory_order_relaxed);
     }
 
-    // For those who look on: a picture of each worker, into `seen`, which has room
-    // for kMaximumWorkers.
+    // The calling thread serves a pump: those who look on look at it as well. Of very
+    // many such threads the first kMaximumServers are looked at.
+    void add_server() noexcept;
+    void remove_server() noexcept;
+
+    // For those who look on: a picture of each thread, into `seen`, which has room for
+    // kMostSeen.
     struct view {
+        enum class role : std::uint8_t { worker, poller, server };
         pid_t thread;
+        role as;
         const queue_core* queue;  // to look up; null when it runs nothing
         std::uint64_t steps;
         std::int64_t since;  // see activity
-        bool polling;
     };
-    void look_at_workers(std::vector<view>& seen) noexcept;
+    static constexpr std::size_t kMaximumServers = 64;
+    static constexpr std::size_t kMostSeen = kMaximumWorkers + kMaximumServers;
+    void look_at_threads(std::vector<view>& seen) noexcept;
     // Nothing waits, and no worker is at anything but waiting. For threads that are no
     // workers.
     [[nodiscard]] bool is_quiet() noexcept;
@@ -169,6 +179,18 @@ class pool {
     bool poller_ PLR_GUARDED_BY(idle_lock_) = false;
     spin_lock all_lock_;
     std::vector<worker*> all_ PLR_GUARDED_BY(all_lock_);
+    struct server {
+        pid_t thread;
+        const activity* doing;
+    };
+    [[nodiscard]] std::span<server> servers() noexcept PLR_REQUIRES(all_lock_) {
+        return {servers_.data(), server_count_};
+    }
+    template <class Predicate>
+    void drop_servers(Predicate which) noexcept PLR_REQUIRES(all_lock_);
+    void keep_only_this_server() noexcept PLR_REQUIRES(all_lock_);
+    std::array<server, kMaximumServers> servers_ PLR_GUARDED_BY(all_lock_){};
+    std::size_t server_count_ PLR_GUARDED_BY(all_lock_) = 0;
     unsigned processors_;
 };
 

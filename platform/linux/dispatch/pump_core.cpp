@@ -9,6 +9,8 @@
 #include <system_error>
 #include <utility>
 
+#include "platform/linux/dispatch/activity.h"
+#include "platform/linux/dispatch/pool.h"
 #include "platform/linux/dispatch/queue_core.h"
 
 namespace dispatch::detail {
@@ -17,6 +19,13 @@ namespace {
 constexpr unsigned kBatch = 256;  // pieces of work until the event loop gets its turn
 
 thread_local const char this_thread = 0;
+
+struct announced_server {
+    announced_server() noexcept { pool::shared().add_server(); }
+    ~announced_server() { pool::shared().remove_server(); }
+    announced_server(const announced_server&) = delete;
+    announced_server& operator=(const announced_server&) = delete;
+};
 
 int make_descriptor() {
     const int made = ::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC);
@@ -78,6 +87,7 @@ bool pump_core::process(queue_core& served) noexcept {
     if (!state_.compare_exchange_strong(expected, state::idle, std::memory_order_acq_rel))
         return false;
     unsigned budget = kBatch;
+    activity::of_this_thread().stamp();
     served.run_owned(budget);
     return has(state::ready);
 }
@@ -126,9 +136,12 @@ void pump_core::await(queue_core& served, waiter& done) noexcept {
 
 void pump_core::claim(const queue_core& served) noexcept {
     const void* seen = nullptr;
-    if (!server_.compare_exchange_strong(seen, &this_thread, std::memory_order_acq_rel) &&
-        seen != &this_thread)
+    if (server_.compare_exchange_strong(seen, &this_thread, std::memory_order_acq_rel)) {
+        static thread_local const announced_server here;
+        static_cast<void>(&here);
+    } else if (seen != &this_thread) {
         served.stop("served by a second thread");
+    }
 }
 
 bool pump_core::is_server() const noexcept {

@@ -2,20 +2,15 @@
 
 #include <sched.h>
 
-#include <cstring>
-#include <new>
+#include <cstddef>
 #include <utility>
 
 #include "platform/linux/dispatch/activity.h"
 #include "platform/linux/dispatch/pool.h"
-#include "platform/linux/dispatch/queue_cells.h"
 #include "plr/base/assert.h"
-#include "plr/base/report.h"
 
 namespace dispatch::detail {
 namespace {
-
-[[gnu::tls_model("initial-exec")]] thread_local frame* top_frame = nullptr;
 
 constexpr unsigned kBatch = 256;       // items a queue runs before others get their turn
 constexpr unsigned kLingerAfter = 64;  // a drain that ran that many waits a moment for more
@@ -54,156 +49,33 @@ item* linger(item* last, unsigned ran) noexcept {
 
 }  // namespace
 
-static_assert(sizeof(queue_core) <= queue_cell::kCore);
-
 void queue_tag(item*) noexcept {}
 void waiter_tag(item*) noexcept {}
 void embedded_tag(item*) noexcept {}
 
-frame::frame(const queue_core* entered, bool draining) noexcept
-    : queue(entered), up(top_frame), drains(draining) {
-    top_frame = this;
-}
-frame::~frame() {
-    top_frame = up;
-}
-frame* frame::top() noexcept {
-    return top_frame;
-}
 bool frame::more_to_do() noexcept {
-    for (const frame* each = top_frame; each; each = each->up)
+    for (const frame* each = top(); each; each = each->up)
         if (each->drains && each->queue->has_more())
             return true;
     return false;
 }
 
-void waiter::wait() noexcept {
-    for (unsigned spins = 0; spins < 100 && pool::shared().processors() > 1; ++spins) {
-        if (is_granted())
-            return;
-        cpu_relax();
-    }
-    blocking_section blocked;
-    const std::uint32_t asleep = pool::is_worker() ? kWorkerAsleep : kAsleep;
-    std::uint32_t seen = kAwake;
-    if (!state.compare_exchange_strong(seen, asleep, std::memory_order_acq_rel))
-        return;
-    if (asleep == kWorkerAsleep)
-        pool::shared().rest(1);
-    while (!is_granted())
-        futex_wait(state, asleep);
+bool queue_core::is_target_of(const queue_core* level) const noexcept {
+    while (level && level != this)
+        level = level->target_;
+    return level != nullptr;
 }
 
-void waiter::grant() noexcept {
-    const std::uint32_t before = state.exchange(kGranted, std::memory_order_acq_rel);
-    if (before == kAwake)
-        return;
-    if (before == kWorkerAsleep)
-        pool::shared().rest(-1);
-    futex_wake(state, 1);
+bool queue_core::is_current() const noexcept {
+    for (const frame* held = frame::top(); held; held = held->up)
+        if (is_target_of(held->queue))
+            return true;
+    return false;
 }
 
-// ---- Life -------------------------------------------------------------------------
-
-queue_core* queue_core::create(std::string_view label, queue_core* target,
-                               std::unique_ptr<pump_core> served) {
-    const bool on_pool = !target || target->is_global();
-    pump_core* const pump = on_pool ? served.get() : target->pump_;
-    auto* made = make(label, on_pool ? nullptr : target, pump,
-                      target ? target->level() : priority::normal, false);
-    static_cast<void>(served.release());
-    if (!on_pool)
-        target->retain();
-    return made;
-}
-
-queue_core* queue_core::make(std::string_view label, queue_core* target, pump_core* pump,
-                             priority level, bool global) {
-    queue_cell* cell = queue_cells::take();
-    char* text = cell->label;
-    if (label.size() >= sizeof cell->label) {
-        text = new (std::nothrow) char[label.size() + 1];
-        if (!text) {
-            queue_cells::give(cell);
-            throw std::bad_alloc();
-        }
-    }
-    std::memcpy(text, label.data(), label.size());
-    text[label.size()] = '\0';
-    auto* made =
-        ::new (static_cast<void*>(cell->bytes)) queue_core(text, target, pump, level, global);
-    cell->begin();
-    return made;
-}
-
-queue_core* queue_core::global(priority level) noexcept {
-    static constexpr const char* kLabels[] = {"global.high", "global.normal", "global.low"};
-    static queue_core* const* const queues = [] {
-        auto* made = new queue_core*[3];
-        for (unsigned i = 0; i < 3; ++i)
-            made[i] = make(kLabels[i], nullptr, nullptr, static_cast<priority>(i), true);
-        return made;
-    }();
-    return queues[static_cast<unsigned>(level)];
-}
-
-queue_core::queue_core(const char* label, queue_core* target, pump_core* pump, priority level,
-                       bool global) noexcept
-    : target_(target),
-      pump_(pump),
-      priority_(level),
-      kind_(global ? kGlobal
-            : pump ? kPumped
-                   : std::uint8_t{0}),
-      label_(label) {
-    place_.run = &queue_tag;
-    place_.owner = this;
-}
-
-queue_core::~queue_core() {
-    specific* entry = specifics_.load(std::memory_order_acquire);
-    while (entry) {
-        void* value = entry->value.load(std::memory_order_relaxed);
-        if (value && entry->destructor)
-            entry->destructor(value);
-        delete std::exchange(entry, entry->next);
-    }
-    if (target_)
-        target_->release();
-    else
-        delete pump_;
-    delete statistics();
-}
-
-void queue_core::release() noexcept {
-    if (is_global())
-        return;
-    // The only handle has no rival.
-    if (handles_.load(std::memory_order_acquire) != 1 &&
-        handles_.fetch_sub(1, std::memory_order_acq_rel) != 1)
-        return;
-    if (is_suspended())
-        stop("the last handle of a suspended queue went");
-    release_reference();
-}
-
-void queue_core::release_reference() noexcept {
-    if (references_.load(std::memory_order_acquire) != 1 &&
-        references_.fetch_sub(1, std::memory_order_acq_rel) != 1)
-        return;
-    queue_cell* const cell = queue_cell::of(this);
-    cell->end();
-    const char* const text = label_;
-    this->~queue_core();
-    if (text != cell->label)
-        delete[] text;
-    queue_cells::give(cell);
-}
-
-void queue_core::stop(const char* why) const noexcept {
-    plr::report("dispatch: queue '%s': %s", label(), why);
-    PLR_ASSERT(false, why);
-    __builtin_unreachable();
+void queue_core::was_slow() noexcept {
+    for (queue_core* level = this; level; level = level->target_)
+        level->reputation_.store(reputation::slow, std::memory_order_relaxed);
 }
 
 // ---- The list -----------------------------------------------------------------------
@@ -389,164 +261,6 @@ bool queue_core::run_owned(unsigned& budget) noexcept {
             return false;
     }
     __builtin_unreachable();
-}
-
-// ---- sync ---------------------------------------------------------------------------
-
-// Takes an idle queue, suspended or not.
-bool queue_core::try_lock() noexcept {
-    item* expected = nullptr;
-    if (!tail_.compare_exchange_strong(expected, &stub_, std::memory_order_acq_rel))
-        return false;
-    counted_ = false;
-    begin_list_at(&stub_, nullptr);
-    return true;
-}
-
-// Hot path when idle: one compare-exchange to enter and one to leave;
-// bench/dispatch_cases.h.
-void queue_core::run_sync(void (*function)(void*) noexcept, void* context) {
-    if (has(kGlobal | kMeasured | kPumped)) [[unlikely]]
-        run_sync_specially(function, context);
-    else
-        run_sync_here(function, context);
-}
-
-void queue_core::run_sync_specially(void (*function)(void*) noexcept, void* context) {
-    if (has(kMeasured)) {
-        measured_sync measured{*statistics(), function, context};
-        run_sync_unmeasured(&measured_sync::run, &measured);
-    } else {
-        run_sync_unmeasured(function, context);
-    }
-}
-
-void queue_core::run_sync_unmeasured(void (*function)(void*) noexcept, void* context) {
-    if (pump_) {
-        hand_over(function, context);
-    } else if (is_global()) {
-        const frame here(this);
-        function(context);
-    } else {
-        run_sync_here(function, context);
-    }
-}
-
-void queue_core::run_sync_here(void (*function)(void*) noexcept, void* context) {
-    const frame here(this);
-    lock_from_here();
-    function(context);
-    unlock_chain();
-}
-
-// Owns this queue and all its targets, none of them suspended, when it returns.
-void queue_core::lock_from_here() noexcept {
-    queue_core* level = this;
-    while (level && level->try_lock())
-        level = level->target_;
-    if (level) [[unlikely]]
-        level->wait_for_ownership();
-    // `level` and its targets were looked at when they were handed over, the others
-    // not since they are ours.
-    for (queue_core* below = this; below != level;) {
-        if (!below->is_suspended()) [[likely]] {
-            below = below->target_;
-            continue;
-        }
-        below->wait_for_resume();
-        level = std::exchange(below, this);
-    }
-}
-
-// Comes with the ownership of the targets.
-void queue_core::wait_for_ownership() noexcept {
-    // The innermost frame is the sync() that waits here. What one of our targets
-    // runs keeps us from running.
-    for (const queue_core* level = this; level; level = level->target_)
-        for (const frame* held = top_frame->up; held; held = held->up)
-            if (level->is_target_of(held->queue))
-                stop("sync() from its own work would wait for ever");
-    waiter self;
-    push(&self);
-    self.wait();
-}
-
-// For the owner of a suspended queue and its targets: lets others have the
-// targets, and is the first to run when the queue goes on.
-void queue_core::wait_for_resume() noexcept {
-    waiter self;
-    attach(&self);
-    count_ownership();
-    if (target_)
-        target_->unlock_chain();
-    activate();
-    self.wait();
-}
-
-void queue_core::unlock_chain() noexcept {
-    for (queue_core* level = this; level;) {
-        queue_core* above = level->target_;
-        level->unlock();
-        level = above;
-    }
-}
-
-void queue_core::unlock() noexcept {
-    const bool counted = counted_;  // not ours to read once the list is empty
-    item* next = head_.load(std::memory_order_relaxed);
-    if (!next)
-        next = take_after_stub();
-    if (!next) {
-        if (counted)
-            release_reference();
-        return;
-    }
-    begin_list_at(&stub_, next);
-    count_ownership();
-    if (next->run == &waiter_tag && !target_ && !is_suspended()) {
-        grant(next);
-        return;
-    }
-    activate();
-}
-
-bool queue_core::is_target_of(const queue_core* level) const noexcept {
-    while (level && level != this)
-        level = level->target_;
-    return level != nullptr;
-}
-
-bool queue_core::is_current() const noexcept {
-    for (const frame* held = top_frame; held; held = held->up)
-        if (is_target_of(held->queue))
-            return true;
-    return false;
-}
-
-void queue_core::was_slow() noexcept {
-    for (queue_core* level = this; level; level = level->target_)
-        level->reputation_.store(reputation::slow, std::memory_order_relaxed);
-}
-
-// ---- Forks -----------------------------------------------------------------------------
-
-void queue_core::forked() noexcept {
-    if (pump_ && !target_)
-        pump_->forked();
-    walked_.store(false, std::memory_order_relaxed);
-    suspension_.fetch_and(~kParked, std::memory_order_relaxed);
-    stub_.next.store(nullptr, std::memory_order_relaxed);
-    if (!is_current()) {
-        references_.store(1, std::memory_order_relaxed);
-        begin_list_at(&stub_, nullptr);
-        tail_.store(nullptr, std::memory_order_relaxed);
-    } else if (!is_global()) {
-        // This thread's own: what it runs at present is all there is.
-        item* const last = running_.load(std::memory_order_relaxed);
-        begin_list_at(last, nullptr);
-        last->next.store(nullptr, std::memory_order_relaxed);
-        tail_.store(last, std::memory_order_relaxed);
-    }
 }
 
 // ---- Suspension ------------------------------------------------------------------------

@@ -70,13 +70,21 @@ struct waiter : item {
     std::atomic<std::uint32_t> state{kAwake};
 };
 
+struct frame;
+namespace frames {
+[[gnu::tls_model("initial-exec")]] inline constinit thread_local frame* top = nullptr;
+}
+
 // What the calling thread runs: innermost queue first.
 struct frame {
-    explicit frame(const queue_core* entered, bool drains = false) noexcept;
-    ~frame();
+    explicit frame(const queue_core* entered, bool drains_it = false) noexcept
+        : queue(entered), up(frames::top), drains(drains_it) {
+        frames::top = this;
+    }
+    ~frame() { frames::top = up; }
     frame(const frame&) = delete;
     frame& operator=(const frame&) = delete;
-    static frame* top() noexcept;
+    static frame* top() noexcept { return frames::top; }
     // Whether this thread has more to run when the present work is done.
     static bool more_to_do() noexcept;
 

@@ -22,8 +22,8 @@ namespace {
 using detail::pool;
 using std::chrono::nanoseconds;
 
-// A thread that looks at what every worker runs, four times within the limit: a
-// worker that is at the same piece of work as before has been so for the time
+// A thread that looks at what every worker and server runs, four times within the
+// limit: one that is at the same piece of work as before has been so for the time
 // between. It is made when first wanted, and sleeps without a tick when not.
 class watchdog {
   public:
@@ -72,8 +72,8 @@ class watchdog {
     }
 
     [[noreturn]] void watch() noexcept {
-        std::vector<pool::view> workers;
-        workers.reserve(kMaximumWorkers);
+        std::vector<pool::view> threads;
+        threads.reserve(pool::kMostSeen);
         std::unique_lock guard(lock_);
         thread_ = ::pthread_self();
         for (;;) {
@@ -81,19 +81,19 @@ class watchdog {
                 changed_.wait(guard);
                 continue;
             }
-            workers.clear();
-            pool::shared().look_at_workers(workers);
-            look_at(workers, guard);
+            threads.clear();
+            pool::shared().look_at_threads(threads);
+            look_at(threads, guard);
             changed_.wait_for(guard, limit_ / kLooks);
         }
     }
 
-    void look_at(const std::vector<pool::view>& workers, std::unique_lock<std::mutex>& guard) {
+    void look_at(const std::vector<pool::view>& threads, std::unique_lock<std::mutex>& guard) {
         const std::int64_t now = time::now().nanoseconds();
         const std::uint64_t settings = settings_;
         std::unordered_map<pid_t, sight> before;
         before.swap(seen_);
-        for (const pool::view& each : workers) {
+        for (const pool::view& each : threads) {
             if (!each.queue)
                 continue;
             const auto found = before.find(each.thread);
@@ -109,18 +109,18 @@ class watchdog {
     }
 
     // Unlocked meanwhile, so that the handler may change the setting.
-    void report(const pool::view& worker, nanoseconds taken, std::unique_lock<std::mutex>& guard) {
+    void report(const pool::view& runner, nanoseconds taken, std::unique_lock<std::mutex>& guard) {
         std::string label;
         detail::queue_cells::if_live(
-            worker.queue, [&](const detail::queue_core& queue) { label = queue.label(); });
+            runner.queue, [&](const detail::queue_core& queue) { label = queue.label(); });
         const auto handler = handler_;
         calling_ = true;
         guard.unlock();
         if (handler)
-            handler(overrun{label, worker.thread, taken});
+            handler(overrun{label, runner.thread, taken});
         else
             plr::report("dispatch: work of queue '%s' runs for %.3f s already (thread %d)",
-                        label.c_str(), std::chrono::duration<double>(taken).count(), worker.thread);
+                        label.c_str(), std::chrono::duration<double>(taken).count(), runner.thread);
         guard.lock();
         calling_ = false;
         changed_.notify_all();

@@ -2,23 +2,29 @@
  * The state machine of a queue (queue_core.h) as a model that spin checks
  * exhaustively: every order in which the atomic steps of a few threads can
  * follow each other. tests/platform/queue_model_test.py runs it; each step names the
- * function of queue_core.cpp that it stands for. Who changes the one changes the
+ * function of queue_core.h that it stands for. Who changes the one changes the
  * other.
  *
  * What is there: push, drain in batches, queues with a target (ROOT is CHILD's),
- * sync, suspend and resume, the counts of handles and references, destruction.
- * A queue's target never changes in its life, so nothing here changes it.
+ * sync and the sleep of its waiters, suspend and resume, counting what waits, the
+ * counts of handles and references, destruction. A queue's target never changes in
+ * its life, so nothing here changes it.
  *
  * What is not: orders weaker than sequential consistency (ThreadSanitizer's
- * build has the tests for those), the sleeping and waking of workers (pool.h;
- * here a worker comes whenever the pool has work), pumps, diagnostics, lingering.
+ * build has the tests for those; one who counts has a barrier on all threads),
+ * the sleeping and waking of workers (pool.h; here a worker comes whenever the pool
+ * has work, and a waiter that is a worker sleeps as others do), pumps, forks,
+ * statistics and reputations, lingering. What the owner alone looks at may change in
+ * one step with what comes before.
  *
  * A configuration is given by macros:
  *   CHILDREN          0: ROOT alone; 1: ROOT and CHILD
- *   PRODUCER0/1       the queue to which it submits; ITEMS0/1: how many pieces
+ *   PRODUCER0/1       the queue to which it submits; ITEMS0/1: how many pieces, those
+ *                     of 0 closures, those of 1 embedded
  *   SYNCED            the queue on which SYNCS threads, 1 or 2, make a sync() each;
  *                     SUBMITS_BEFORE: the only one submits a piece before
  *   SUSPENDED         the queue that one thread suspends and resumes
+ *   WALKED            the queue on which one thread counts what waits
  * and one of the faults below may be put in, by FAULT_…, to see that the checks
  * find it.
  *
@@ -29,7 +35,8 @@
  *   - the pieces of one producer run in their order, once each; a sync() after
  *     what its thread submitted before;
  *   - once suspend() has returned, only a piece that is next may still start;
- *   - everything submitted has run when nothing moves any more: no wake-up is lost;
+ *   - everything submitted has run when nothing moves any more: no wake-up is lost,
+ *     neither of the pool nor of a waiter, and nobody waits for the one who counts;
  *   - nobody touches a queue after its destruction or an item after its end, and
  *     all queues are destroyed once, when the last handle and the last work went.
  */
@@ -53,6 +60,7 @@
 #define MY_WAITER     (_pid + FIRST_WAITER - 1)
 #define THREAD_OF(x)  ((x) - FIRST_WAITER + 1)
 #define is_waiter(x)  (x >= FIRST_WAITER && x < FIRST_CLOSURE)
+#define is_embedded(x) (x >= CLOSURE(1, 0))
 
 #define BATCH QUEUES
 
@@ -67,7 +75,18 @@ bit counted[QUEUES];
 
 byte successor[ALL_ITEMS];
 bit pooled;  /* ROOT's place is in the pool's list */
-bit granted[ALL_ITEMS]; /* the waiters' */
+
+/* waiter::state, and whether its thread is in futex_wait(). */
+#define AWAKE   0
+#define ASLEEP  1
+#define GRANTED 2
+byte state[ALL_ITEMS];
+bit sleeps[ALL_ITEMS];
+
+#ifdef WALKED
+byte running[QUEUES];
+bit walked; /* WALKED's */
+#endif
 
 /* What the checks remember. */
 byte owner[QUEUES];
@@ -98,18 +117,23 @@ inline begin_piece(q) {
 #endif
 }
 
-/* item::run of a closure. */
+/* item::run of a closure, or an embedded item's function, which may delete it. */
 inline call(q, x) {
     d_step {
         begin_piece(q);
         assert(live[x] && ran[PRODUCER(x)] == NUMBER(x));
-        ran[PRODUCER(x)]++
+        ran[PRODUCER(x)]++;
+        if
+        :: is_embedded(x) -> live[x] = 0
+        :: else
+        fi
     }
 }
 
 /* ---- Life ---- */
 
-/* release_reference() and ~queue_core() */
+/* release_reference() and ~queue_core(). Who finds the count at 1 does not write it,
+   and has no rival then: looking and counting down are one step. */
 inline release_root() {
     d_step {
         alive(ROOT);
@@ -157,7 +181,13 @@ inline release_reference(q) {
 
 /* release(): a handle goes */
 inline release(q) {
-    d_step { alive(q); handles[q]--; answer = handles[q] == 0 };
+    d_step {
+        alive(q);
+        assert(handles[q] > 0);
+        handles[q]--;
+        answer = handles[q] == 0;
+        assert(!answer || suspensions[q] == 0)
+    };
     if
     :: answer -> release_reference(q)
     :: else
@@ -235,6 +265,24 @@ inline resume(q) {
 
 /* ---- The list ---- */
 
+#ifdef WALKED
+inline begin_list_at(q, item, first) {
+    head[q] = first;
+    running[q] = item
+}
+#define now_runs(q, x) running[q] = x
+/* let_walk() and wait_for_walk() */
+#ifdef FAULT_NOBODY_LETS_WALK
+#define let_walk(q)
+#else
+#define let_walk(q) (q != WALKED || !walked)
+#endif
+#else
+#define begin_list_at(q, item, first) head[q] = first
+#define now_runs(q, x)
+#define let_walk(q)
+#endif
+
 /* push()'s exchange; who finds null is the owner and sets its fields */
 inline exchange_tail(q, x) {
     d_step {
@@ -244,7 +292,13 @@ inline exchange_tail(q, x) {
         previous = tail[q];
         tail[q] = x;
         if
-        :: previous == 0 -> assert(owner[q] == NOBODY); owner[q] = ME; head[q] = x; counted[q] = 1
+        :: previous == 0 ->
+            assert(owner[q] == NOBODY);
+            owner[q] = ME;
+            counted[q] = 1;
+#ifndef WALKED
+            head[q] = x
+#endif
         :: else
         fi;
 #if CHILDREN
@@ -273,7 +327,12 @@ inline push_root(x) {
     exchange_tail(ROOT, x);
     if
     :: previous -> link(x)
-    :: else -> add_reference(ROOT); activate_root()
+    :: else ->
+#ifdef WALKED
+        begin_list_at(ROOT, 0, x);
+#endif
+        add_reference(ROOT);
+        activate_root()
     fi
 }
 
@@ -303,7 +362,12 @@ inline push(q, x) {
 #ifdef FAULT_EVERY_PUSH_ACTIVATES
         ; activate(q)
 #endif
-    :: else -> add_reference(q); activate(q)
+    :: else ->
+#ifdef WALKED
+        begin_list_at(q, 0, x);
+#endif
+        add_reference(q);
+        activate(q)
     fi
 }
 
@@ -312,7 +376,8 @@ inline wait_for_next(x) {
     d_step { successor[x] != 0 -> following = successor[x] }
 }
 
-/* detach(): head_ is the successor of `x`, or null with the stub in its place */
+/* detach(), and the list begins with the successor of `x`, or null with the stub in
+   its place */
 inline detach(q, x) {
     following = successor[x];
     if
@@ -331,7 +396,7 @@ inline detach(q, x) {
         :: else -> wait_for_next(x)
         fi
     fi;
-    head[q] = following
+    begin_list_at(q, STUB(q), following)
 }
 
 /* attach() of the caller's waiter */
@@ -354,12 +419,12 @@ inline attach(q) {
         fi
     fi;
     d_step {
-        head[q] = MY_WAITER;
         if
         :: following -> successor[MY_WAITER] = following
         :: else
         fi
-    }
+    };
+    begin_list_at(q, STUB(q), MY_WAITER)
 }
 
 /* The compare-exchange of the tail to null: `answer` when ownership was given up */
@@ -376,6 +441,31 @@ inline give_up(q, last) {
         :: else
         fi
     }
+}
+
+/* leave(): `following` is 0 when ownership was given up */
+inline leave(q, last) {
+#ifdef WALKED
+    do
+    :: begin_list_at(q, STUB(q), 0);
+        if
+        :: q != WALKED || !walked -> break
+        :: else
+        fi;
+#ifndef FAULT_LEAVER_IS_WAITED_FOR
+        begin_list_at(q, last, 0);
+#endif
+        let_walk(q)
+    od;
+#else
+    begin_list_at(q, STUB(q), 0);
+#endif
+    following = 0;
+    give_up(q, last);
+    if
+    :: answer
+    :: else -> wait_for_next(last)
+    fi
 }
 
 /* take_after_stub(): `following` is 0 when ownership was given up */
@@ -396,6 +486,8 @@ inline take_after_stub(q) {
     fi
 }
 
+#define put_back(q, work) begin_list_at(q, 0, work)
+
 /* head_, or what comes after the stub */
 inline take_next(q) {
     following = head[q];
@@ -407,15 +499,38 @@ inline take_next(q) {
 
 /* ---- sync ---- */
 
-/* grant(): with the queue come its targets */
-inline grant(q, x) {
+/* waiter::grant(): with the queue come its targets. The waiter may be gone before it
+   is woken. */
+inline grant_to(q, x) {
+#ifdef FAULT_GRANTS_TO_WHO_WAS_AWAKE
+    answer = state[x] == ASLEEP;
+#endif
     d_step {
         exists(x);
-        assert(!granted[x] && owner[q] == ME && owner[ROOT] == ME);
-        granted[x] = 1;
+        assert(state[x] != GRANTED && owner[q] == ME && owner[ROOT] == ME);
+#ifndef FAULT_GRANTS_TO_WHO_WAS_AWAKE
+        answer = state[x] == ASLEEP;
+#endif
+        state[x] = GRANTED;
         owner[q] = THREAD_OF(x);
         owner[ROOT] = THREAD_OF(x)
-    }
+    };
+    if
+    :: answer -> sleeps[x] = 0
+    :: else
+    fi
+}
+
+/* grant() */
+inline grant(q, x) {
+#ifdef FAULT_GRANTS_BEFORE_DETACHING
+    grant_to(q, x);
+    detach(q, x)
+#else
+    detach(q, x);
+    let_walk(q);
+    grant_to(q, x)
+#endif
 }
 
 /* try_lock() */
@@ -424,15 +539,46 @@ inline try_lock(q) {
         alive(q);
         answer = tail[q] == 0;
         if
-        :: answer -> assert(owner[q] == NOBODY); tail[q] = STUB(q); owner[q] = ME; counted[q] = 0; head[q] = 0
+        :: answer ->
+            assert(owner[q] == NOBODY);
+            tail[q] = STUB(q);
+            owner[q] = ME;
+            counted[q] = 0;
+#ifndef WALKED
+            head[q] = 0
+#endif
         :: else
         fi
-    }
+    };
+#ifdef WALKED
+    if
+    :: answer -> begin_list_at(q, STUB(q), 0)
+    :: else
+    fi
+#endif
 }
 
-/* waiter::wait(), and the end of the waiter's life */
+/* waiter::wait(), and the end of the waiter's life. Its spinning is coming late to the
+   first step. */
 inline wait_until_granted() {
-    d_step { granted[MY_WAITER] -> granted[MY_WAITER] = 0; live[MY_WAITER] = 0; assert(owner[ROOT] == ME) }
+    d_step {
+        answer = state[MY_WAITER] == AWAKE;
+        if
+        :: answer -> state[MY_WAITER] = ASLEEP
+        :: else
+        fi
+    };
+    do
+    :: !answer -> break
+    :: else ->
+        sleeps[MY_WAITER] = state[MY_WAITER] == ASLEEP; /* futex_wait() */
+        d_step { !sleeps[MY_WAITER] -> answer = state[MY_WAITER] != GRANTED }
+    od;
+    atomic {
+        assert(state[MY_WAITER] == GRANTED && owner[ROOT] == ME);
+        state[MY_WAITER] = AWAKE;
+        live[MY_WAITER] = 0
+    }
 }
 
 /* wait_for_ownership() */
@@ -473,12 +619,11 @@ inline unlock_root() {
         :: else
         fi
     :: else ->
-        head[ROOT] = following;
+        begin_list_at(ROOT, STUB(ROOT), following);
         count_ownership(ROOT);
         if
         :: is_waiter(following) && suspensions[ROOT] == 0 ->
             granted_next = following;
-            detach(ROOT, granted_next);
             grant(ROOT, granted_next)
         :: else -> activate_root()
         fi
@@ -496,7 +641,7 @@ inline unlock_child() {
         :: else
         fi
     :: else ->
-        head[CHILD] = following;
+        begin_list_at(CHILD, STUB(CHILD), following);
         count_ownership(CHILD);
         activate(CHILD)
     fi
@@ -619,62 +764,74 @@ drain:
         owner[queue] = ME;
         work = head[queue]
     };
+    now_runs(queue, work);
 
 next_piece:
     if
     :: suspensions[queue] > 0 ->
-        head[queue] = work;
+        put_back(queue, work);
         park(queue);
         if
         :: answer -> goto parked_or_idle
-        :: else
+        :: else -> now_runs(queue, work)
         fi
     :: else
     fi;
 #if CHILDREN && !defined(FAULT_TARGETS_SUSPENSION_WAITS_FOR_THE_CHILD)
-    if
-    :: queue == CHILD && suspensions[ROOT] > 0 -> head[CHILD] = work; goto more
+    if /* is_held_back() of what is above */
+    :: queue == CHILD && suspensions[ROOT] > 0 -> goto more
     :: else
     fi;
 #endif
     if
     :: budget > 0 -> budget--
-    :: budget == 0 -> head[queue] = work; goto more
+    :: budget == 0 -> goto more
     :: budget == 0 -> budget = BATCH - 1
     fi;
     if
     :: is_waiter(work) ->
-#ifdef FAULT_GRANTS_BEFORE_DETACHING
         grant(queue, work);
-        detach(queue, work);
-#else
-        detach(queue, work);
-        grant(queue, work);
-#endif
         goto end
 #if CHILDREN
     :: work == PLACE -> /* run_nested() */
         detach(ROOT, PLACE);
+        let_walk(ROOT);
         queue = CHILD;
         goto drain
 #endif
-    :: work >= FIRST_CLOSURE ->
+    :: is_embedded(work) -> /* run_nested() */
+        detach(queue, work);
+        let_walk(queue);
+        call(queue, work);
+        goto nested_done
+    :: work >= FIRST_CLOSURE && !is_embedded(work) ->
         call(queue, work);
         following = successor[work];
         if
         :: following
         :: else ->
-            give_up(queue, work);
+            leave(queue, work);
             if
-            :: answer -> goto idle
-            :: else -> wait_for_next(work)
+            :: following
+            :: else -> goto idle
             fi
         fi;
+        now_runs(queue, following);
+        let_walk(queue);
         d_step { live[work] = 0; work = following };
         goto next_piece
     fi;
 
+nested_done:
+    take_next(queue);
+    work = following;
+    if
+    :: work -> now_runs(queue, work); goto next_piece
+    :: else -> goto idle
+    fi;
+
 more:
+    put_back(queue, work);
     activate(queue);
     goto parked_or_idle;
 
@@ -684,19 +841,64 @@ idle:
 parked_or_idle: /* on with ROOT's list after a piece that was CHILD's */
 #if CHILDREN
     if
-    :: queue == CHILD ->
-        queue = ROOT;
-        take_next(ROOT);
-        work = following;
-        if
-        :: work -> goto next_piece
-        :: else -> goto idle
-        fi
+    :: queue == CHILD -> queue = ROOT; goto nested_done
     :: else
     fi;
 #endif
     goto end
 }
+
+#ifdef WALKED
+/* count_waiting(). Its handle is here for what keeps the queue alive. */
+proctype walker() {
+    bit answer;
+    byte first;
+    byte last;
+    byte from;
+    byte from_head;
+    walked = 1;
+first_waiting:
+    last = tail[WALKED];
+    from = running[WALKED];
+    from_head = 0;
+    if
+    :: last == 0 || last == from -> goto walk
+    :: else
+    fi;
+    if
+    :: from && from != STUB(WALKED)
+    :: else -> from_head = head[WALKED]; first = from_head
+    fi;
+    if
+    :: from_head
+    :: else ->
+        d_step {
+            exists((from -> from : STUB(WALKED)));
+            first = successor[(from -> from : STUB(WALKED))]
+        }
+    fi;
+    if
+    :: first
+    :: else -> /* once it does not find the same again */
+        (tail[WALKED] != last || running[WALKED] != from || head[WALKED] != from_head ||
+         successor[(from -> from : STUB(WALKED))] != 0);
+        goto first_waiting
+    fi;
+walk:
+    last = tail[WALKED];
+    do
+    :: first == 0 -> break
+    :: else ->
+        d_step {
+            assert(first >= PLACE);
+            exists(first);
+            first = (first == last -> 0 : successor[first])
+        }
+    od;
+    walked = 0;
+    release(WALKED)
+}
+#endif
 
 /* Starts the threads, and looks once none of them can go on: each is at its end, or
    waits for what nobody will do. */
@@ -725,6 +927,14 @@ init {
 #ifdef SUSPENDED
         handles[SUSPENDED]++;
         run suspender();
+#endif
+#ifdef WALKED
+        running[ROOT] = STUB(ROOT);
+#if CHILDREN
+        running[CHILD] = STUB(CHILD);
+#endif
+        handles[WALKED]++;
+        run walker();
 #endif
         run worker();
         run worker()
