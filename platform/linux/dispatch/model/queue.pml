@@ -23,7 +23,8 @@
  *                     of 0 closures, those of 1 embedded
  *   SYNCED            the queue on which SYNCS threads, 1 or 2, make a sync() each;
  *                     SUBMITS_BEFORE: the only one submits a piece before
- *   SUSPENDED         the queue that one thread suspends and resumes
+ *   SUSPENDED         the queue that one thread suspends and resumes, or two with
+ *                     SUSPENDERS=2
  *   WALKED            the queue on which one thread counts what waits
  * and one of the faults below may be put in, by FAULT_…, to see that the checks
  * find it.
@@ -80,8 +81,15 @@ bit pooled;  /* ROOT's place is in the pool's list */
 #define AWAKE   0
 #define ASLEEP  1
 #define GRANTED 2
-byte state[ALL_ITEMS];
-bit sleeps[ALL_ITEMS];
+/* With as many threads, those that fall asleep meanwhile are too many states: a waiter
+   spins until it is granted. */
+#if CHILDREN && defined(SUSPENDED)
+#define STAYS_AWAKE
+#endif
+byte states[2];
+bit sleeping[2];
+#define state(x)  states[(x) - FIRST_WAITER]
+#define sleeps(x) sleeping[(x) - FIRST_WAITER]
 
 #ifdef WALKED
 byte running[QUEUES];
@@ -98,6 +106,8 @@ byte synced;
 
 #define alive(q) assert(!destroyed[q])
 #define exists(x) assert(x < FIRST_WAITER || live[x])
+/* Nobody reads what is in it then: one state for whatever it was. */
+#define ends(x) live[x] = 0; successor[x] = 0
 
 /* ---- Pieces of work ---- */
 
@@ -124,7 +134,7 @@ inline call(q, x) {
         assert(live[x] && ran[PRODUCER(x)] == NUMBER(x));
         ran[PRODUCER(x)]++;
         if
-        :: is_embedded(x) -> live[x] = 0
+        :: is_embedded(x) -> ends(x)
         :: else
         fi
     }
@@ -248,7 +258,9 @@ inline resume(q) {
     :: answer ->
         d_step {
             alive(q);
+#ifndef FAULT_RESUME_LOOKS_ONCE
             answer = suspensions[q] == 0 && parked[q];
+#endif
             if
             :: answer -> assert(owner[q] == NOBODY); owner[q] = ME; parked[q] = 0
             :: else
@@ -422,9 +434,14 @@ inline attach(q) {
         if
         :: following -> successor[MY_WAITER] = following
         :: else
-        fi
+        fi;
+#ifndef WALKED
+        head[q] = MY_WAITER
+#endif
     };
+#ifdef WALKED
     begin_list_at(q, STUB(q), MY_WAITER)
+#endif
 }
 
 /* The compare-exchange of the tail to null: `answer` when ownership was given up */
@@ -437,7 +454,13 @@ inline give_up(q, last) {
         answer = tail[q] == last;
 #endif
         if
-        :: answer -> tail[q] = 0; owner[q] = NOBODY; live[last] = 0
+        :: answer ->
+            tail[q] = 0;
+            owner[q] = NOBODY;
+            live[last] = 0;
+#ifndef WALKED
+            head[q] = 0
+#endif
         :: else
         fi
     }
@@ -457,13 +480,10 @@ inline leave(q, last) {
 #endif
         let_walk(q)
     od;
-#else
-    begin_list_at(q, STUB(q), 0);
 #endif
-    following = 0;
     give_up(q, last);
     if
-    :: answer
+    :: answer -> following = 0
     :: else -> wait_for_next(last)
     fi
 }
@@ -503,20 +523,20 @@ inline take_next(q) {
    is woken. */
 inline grant_to(q, x) {
 #ifdef FAULT_GRANTS_TO_WHO_WAS_AWAKE
-    answer = state[x] == ASLEEP;
+    answer = state(x) == ASLEEP;
 #endif
     d_step {
         exists(x);
-        assert(state[x] != GRANTED && owner[q] == ME && owner[ROOT] == ME);
+        assert(state(x) != GRANTED && owner[q] == ME && owner[ROOT] == ME);
 #ifndef FAULT_GRANTS_TO_WHO_WAS_AWAKE
-        answer = state[x] == ASLEEP;
+        answer = state(x) == ASLEEP;
 #endif
-        state[x] = GRANTED;
+        state(x) = GRANTED;
         owner[q] = THREAD_OF(x);
         owner[ROOT] = THREAD_OF(x)
     };
     if
-    :: answer -> sleeps[x] = 0
+    :: answer -> sleeps(x) = 0
     :: else
     fi
 }
@@ -559,26 +579,26 @@ inline try_lock(q) {
 }
 
 /* waiter::wait(), and the end of the waiter's life. Its spinning is coming late to the
-   first step. */
+   first step; futex_wait() that finds another state is the next look at it. */
 inline wait_until_granted() {
+#ifndef STAYS_AWAKE
     d_step {
-        answer = state[MY_WAITER] == AWAKE;
         if
-        :: answer -> state[MY_WAITER] = ASLEEP
+        :: state(MY_WAITER) == AWAKE -> state(MY_WAITER) = ASLEEP
         :: else
         fi
     };
+#endif
     do
-    :: !answer -> break
-    :: else ->
-        sleeps[MY_WAITER] = state[MY_WAITER] == ASLEEP; /* futex_wait() */
-        d_step { !sleeps[MY_WAITER] -> answer = state[MY_WAITER] != GRANTED }
-    od;
-    atomic {
-        assert(state[MY_WAITER] == GRANTED && owner[ROOT] == ME);
-        state[MY_WAITER] = AWAKE;
-        live[MY_WAITER] = 0
-    }
+    :: d_step { !sleeps(MY_WAITER) && state(MY_WAITER) == ASLEEP -> sleeps(MY_WAITER) = 1 }
+    :: atomic {
+            !sleeps(MY_WAITER) && state(MY_WAITER) == GRANTED ->
+            assert(owner[ROOT] == ME);
+            state(MY_WAITER) = AWAKE;
+            ends(MY_WAITER)
+        };
+        break
+    od
 }
 
 /* wait_for_ownership() */
@@ -677,6 +697,9 @@ proctype producer1() {
 #endif
 
 #ifdef SUSPENDED
+#ifndef SUSPENDERS
+#define SUSPENDERS 1
+#endif
 proctype suspender() {
     LOCALS;
     suspend(SUSPENDED);
@@ -818,7 +841,7 @@ next_piece:
         fi;
         now_runs(queue, following);
         let_walk(queue);
-        d_step { live[work] = 0; work = following };
+        d_step { ends(work); work = following };
         goto next_piece
     fi;
 
@@ -925,8 +948,11 @@ init {
         run producer1();
 #endif
 #ifdef SUSPENDED
-        handles[SUSPENDED]++;
+        handles[SUSPENDED] = handles[SUSPENDED] + SUSPENDERS;
         run suspender();
+#if SUSPENDERS == 2
+        run suspender();
+#endif
 #endif
 #ifdef WALKED
         running[ROOT] = STUB(ROOT);
