@@ -196,12 +196,13 @@ def log():
 
 
 def timers():
-    programs = {OURS: "timers_pelorin", LIBUV: "timers_libuv", LIBEVENT: "timers_libevent", ASIO_TIMERS: "timers_asio"}
+    programs = {OURS: "timers_pelorin", LIBUV: "timers_libuv", LIBEVENT: "timers_libevent", ASIO_TIMERS: "timers_asio",
+                GLIB: "timers_glib"}
 
     def cells(key, *arguments):
         return {peer: Cell(program, arguments, key) for peer, program in programs.items()}
 
-    first = (Bar((LIBUV, LIBEVENT, ASIO_TIMERS), 1.0, "first"),)
+    first = (Bar((LIBUV, LIBEVENT, ASIO_TIMERS, GLIB), 1.0, "first"),)
     for count in ("0", "100000"):
         others = f"{int(count):,} waiting"
         service = {TIMER_SERVICE: Cell("timers_pelorin", ("service", count), "ns")}
