@@ -686,7 +686,6 @@ pelorin_component(rest_resources LEVEL 6 LIBRARY pelorin
     src/rest/property_path.cpp
     src/rest/property_path.h
     src/rest/property_resource.cpp
-  src/rest/request_resource.cpp
     src/rest/request_provider.cpp
     src/rest/request_provider.h
     src/rest/request_resource.cpp
