@@ -67,6 +67,7 @@ class timer_source final : public timer_setting, timer_entry {
         auto* self = static_cast<timer_source*>(entry);
         self->lock_.assert_held();
         self->add_events(firings);
+        self->fetch_handler();
     }
     void set() noexcept PLR_REQUIRES(lock_) {
         timers().lock().assert_held();

@@ -73,6 +73,8 @@ class source_core {
 
     // Something happened `count` times.
     void add_events(std::uint64_t count) noexcept PLR_REQUIRES(lock_);
+    // The handler runs soon: has it fetched. The source is armed and not cancelled.
+    void fetch_handler() const noexcept PLR_REQUIRES(lock_) { __builtin_prefetch(on_event_.get()); }
     // Something else keeps a pointer to the source.
     void hold() noexcept PLR_REQUIRES(lock_) { change(kHeld, 0); }
     // May destroy the source.

@@ -117,6 +117,10 @@ void timer_wheel::open(unsigned place) noexcept {
     while (entry) {
         wheel_entry* next = forwards ? entry->next_ : entry->previous_;
         __builtin_prefetch(entry->ahead_, 1);
+        if (place < kSoon) {
+            __builtin_prefetch(entry - 1, 1);
+            __builtin_prefetch(entry - 2, 1);
+        }
         this->place(*entry, forwards ? end::back : end::front);
         entry = next;
     }

@@ -20,7 +20,9 @@
 //
 // Opening a slot of very many entries would be one cache miss after the other, so
 // each entry knows the address of one that was added some places before it, and
-// a slot is run through against the order in which it was filled.
+// a slot is run through against the order in which it was filled. What is due
+// within microseconds has the two cache lines in front of it fetched as well: the
+// objects that fire in great numbers end with their entry.
 //
 // Cost:    inserting and removing are a few instructions at any number of
 //          entries, and allocate nothing; an entry moves at most once a level
@@ -81,6 +83,7 @@ class timer_wheel {
     static constexpr std::size_t kPlaces = std::size_t{kLevels} * kSlots;
 
     static constexpr unsigned kAhead = 8;
+    static constexpr std::size_t kSoon = std::size_t{3} * kSlots;  // places of levels 0 to 2
 
     // Meaningless while its bit in occupied_ is clear.
     struct slot {
