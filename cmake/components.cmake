@@ -561,6 +561,7 @@ pelorin_component(timers LEVEL 5 LIBRARY pelorin
 pelorin_component(text LEVEL 5 LIBRARY pelorin
   HEADERS
     include/plr/text/alpha_identifier.h
+    include/plr/text/cell_broadcast.h
     include/plr/text/gsm7.h
     include/plr/text/octet_source_buffer.h
     include/plr/text/sms_encoding.h
@@ -570,6 +571,7 @@ pelorin_component(text LEVEL 5 LIBRARY pelorin
     include/plr/text/ussd_text.h
   SOURCES
     src/text/alpha_identifier.cpp
+    src/text/cell_broadcast.cpp
     src/text/combining_marks.h
     src/text/conversion_chain.cpp
     src/text/conversion_chain.h

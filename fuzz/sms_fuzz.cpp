@@ -7,11 +7,13 @@
 
 #include "examples/sms_pdu.h"
 #include "plr/text/alpha_identifier.h"
+#include "plr/text/cell_broadcast.h"
 #include "plr/text/sms_user_data.h"
 #include "plr/text/ussd_text.h"
 #include "src/text/conversion_chain.h"
 
-// Messages from outside, read as PDUs, as user data, as USSD strings and as names of a SIM:
+// Messages from outside, read as PDUs, as user data, as USSD strings, as pages of cell
+// broadcast and as names of a SIM:
 // what comes out is well-formed text. The same octets as a text: what is sent of it
 // reads back. The input: data coding scheme, length, choices, octets.
 namespace {
@@ -51,6 +53,10 @@ void readOthers(Octets octets, std::uint8_t scheme) {
     if (const auto text = plr::decodeUssd(octets, scheme)) {
         checkWellFormed(text->text);
         checkWellFormed(text->language);
+    }
+    if (const auto page = plr::decodeCellBroadcastPage(octets)) {
+        checkWellFormed(page->content.text);
+        check(page->number >= 1 && page->number <= page->total && page->total <= 15);
     }
     if (const auto name = plr::decodeAlphaIdentifier(octets))
         checkWellFormed(*name);

@@ -1,14 +1,16 @@
 #include <gtest/gtest.h>
 
+#include <map>
 #include <string>
 #include <vector>
 
 #include "plr/format/hex.h"
 #include "plr/text/alpha_identifier.h"
+#include "plr/text/cell_broadcast.h"
 #include "plr/text/ussd_text.h"
 
-// Strings of USSD and names in phone books, against octets of another codec and of the
-// standards' examples; both ways.
+// Strings of USSD, pages of cell broadcast and names in phone books, against octets of another
+// codec and of the standards' examples; both ways.
 namespace plr {
 namespace {
 
@@ -67,6 +69,42 @@ TEST(Ussd, TextsComeBack) {
     EXPECT_TRUE(encodeUssd(std::string(182, 'x')));
     EXPECT_FALSE(encodeUssd(std::string(183, 'x')));
     EXPECT_FALSE(encodeUssd("x", "english"));
+}
+
+TEST(CellBroadcast, PagesAreReadWithTheirPlace) {
+    const struct {
+        const char* name;
+        std::string rest;  // hex; behind the message identifier
+        int number;
+        int total;
+        const char* text;
+        const char* language;
+    } rows[] = {
+        {"filled with CRs", "0123e874a301", 2, 3, "hi", "en"},
+        {"full", "4823" + std::string(41 * 4, '4'), 2, 3, "䑄", ""},
+        {"language first", "10116577039d6e341a", 1, 1, "hi", "en"},
+        {"no number", "0103e874a301", 1, 1, "hi", "en"},
+        {"no total", "0120e874a301", 1, 1, "hi", "en"},
+        {"no content", "0fff", 15, 15, "", ""},
+    };
+    for (const auto& row : rows) {
+        const auto page = decodeCellBroadcastPage(octetsOf(("6ab51112" + row.rest).c_str()));
+        ASSERT_TRUE(page) << row.name;
+        EXPECT_EQ(page->scope, CellBroadcastPage::Scope::kNetwork) << row.name;
+        EXPECT_EQ(page->messageCode, 0x2AB) << row.name;
+        EXPECT_EQ(page->updateNumber, 5) << row.name;
+        EXPECT_EQ(page->messageIdentifier, 0x1112) << row.name;
+        EXPECT_EQ(page->number, row.number) << row.name;
+        EXPECT_EQ(page->total, row.total) << row.name;
+        EXPECT_EQ(page->content.text.substr(0, 3), row.text) << row.name;
+        EXPECT_EQ(page->content.language, row.language) << row.name;
+    }
+    for (const auto& [name, page] :
+         std::map<std::string, std::string>{{"cut", "6ab5111201"},
+                                            {"too long", "6ab511120111" + std::string(83 * 2, '0')},
+                                            {"beyond the total", "6ab511120132"},
+                                            {"reserved", "6ab511121211"}})
+        EXPECT_FALSE(decodeCellBroadcastPage(octetsOf(page.c_str()))) << name;
 }
 
 TEST(AlphaIdentifier, IsReadInAllCodings) {
