@@ -33,7 +33,7 @@ class Docs(unittest.TestCase):
     def test_shown_code_is_built(self):
         examples = [path.read_text() for path in (PROJECT / "examples").iterdir() if path.suffix in (".c", ".cpp", ".h")]
         for document in documents():
-            for shown in re.findall(r"```(?:c|cpp)\n(.*?)```", document.read_text(), re.S):
+            for shown in re.findall(r"```(?:c|cpp)\n(.*?)^```$", document.read_text(), re.S | re.M):
                 with self.subTest(document=document.name, shown=shown):
                     self.assertTrue(any(shown in example for example in examples))
 
