@@ -10,11 +10,11 @@ mended) stay.
 import pathlib
 import sys
 
-ROOT = pathlib.Path(__file__).resolve().parents[1]
-sys.path.insert(0, str(ROOT / "tests" / "support"))
+import wire_vectors
+
 sys.dont_write_bytecode = True
 
-import wire_vectors  # noqa: E402
+ROOT = pathlib.Path(__file__).resolve().parents[1]
 
 
 def array(items):

@@ -65,7 +65,7 @@ class Activation(unittest.TestCase):
             self.assertLess(time.monotonic(), end)
             time.sleep(0.01)
         frames = ((HELLO, LIMITS), (MESSAGE, message("set", value)), (REQUEST, message("get"), 1))
-        connected.sendall(b"".join(frame(*parts)[0] for parts in frames))
+        connected.sendall(b"".join(frame(*parts) for parts in frames))
         return connected
 
     def assert_answered(self, connected, value):

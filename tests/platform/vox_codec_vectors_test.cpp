@@ -11,7 +11,6 @@
 #include "support/vox_values.h"
 
 // The examples of docs/wire-protocol.md, held against our codec.
-// tests/platform/vox_client_test.py holds their bytes against another.
 namespace {
 
 using namespace plr::test;
