@@ -1,6 +1,5 @@
 #pragma once
 
-#include <algorithm>
 #include <span>
 
 #include "src/text/octet_pull.h"
@@ -53,20 +52,25 @@ class BitStage : public OctetStage<Derived> {
 struct LowBitFirst;
 struct HighBitFirst;
 
+// As many bits reach as far into a septet as p of them, also below 0.
+constexpr int fillBitsOf(int p) noexcept {
+    return (p % 7 + 7) % 7;
+}
+
 class SmsUnpacker final : public BitStage<SmsUnpacker, LowBitFirst, 8, 7> {
   public:
     // The first octet begins at bit (7 - fillBits) mod 7 of the septet grid.
-    explicit SmsUnpacker(int fillBits) noexcept : BitStage(std::max(fillBits, 0) % 7) {}
+    explicit SmsUnpacker(int fillBits) noexcept : BitStage(fillBitsOf(fillBits)) {}
 };
 
 class SmsPacker final : public BitStage<SmsPacker, LowBitFirst, 7, 8> {
   public:
-    explicit SmsPacker(int fillBits) noexcept : BitStage(-(std::max(fillBits, 0) % 7)) {}
+    explicit SmsPacker(int fillBits) noexcept : BitStage(-fillBitsOf(fillBits)) {}
 };
 
 class UssdPacker final : public BitStage<UssdPacker, LowBitFirst, 7, 8> {
   public:
-    explicit UssdPacker(int fillBits) noexcept : BitStage(-(std::max(fillBits, 0) % 7)) {}
+    explicit UssdPacker(int fillBits) noexcept : BitStage(-fillBitsOf(fillBits)) {}
     void addPadding() noexcept;
 };
 

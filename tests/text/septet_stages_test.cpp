@@ -42,7 +42,7 @@ int offsetOf(const Packing& packing, int p) {
         case kC2KSmsUnpackedToPacked:
             return 0;
         default:
-            return p < 0 ? 0 : packing.in == 8 ? p % 7 : -(p % 7);
+            return packing.in == 8 ? (p + 70) % 7 : -((p + 70) % 7);
     }
 }
 

@@ -75,9 +75,9 @@ class PLR_EXPORT TextConverter {
         // mark.
         kUcs2ToUtf8 = 3,
         // Octets of packed septets (3GPP TS 23.038, 6.1.2.1) -> septets. p: the fill bits in
-        // front (3GPP TS 23.040, 9.2.3.24), of which 7 are 0; negative is 0. Bits that are left
-        // behind the last whole septet are dropped; callers limit the septets to those there
-        // are. Of a code above 0xFF the low 8 bits count, and it marks.
+        // front (3GPP TS 23.040, 9.2.3.24), modulo 7, below 0 too: 7 are none, and -1 are 6. Bits
+        // that are left behind the last whole septet are dropped; callers limit the septets to
+        // those there are. Of a code above 0xFF the low 8 bits count, and it marks.
         kSmsUnpack = 4,
         // Septets -> octets, packed. p: fill bits, as above; they are 0, and so are the bits
         // behind the last septet. A code above 0x7F is cut to 7 bits and marks.
@@ -105,8 +105,9 @@ class PLR_EXPORT TextConverter {
         kUcs2ToOctet = 10,
         // Units and pairs -> octets of an alpha identifier (3GPP TS 31.102, annex A: the body
         // behind the header 0x81 or 0x82). p: the base, of which 16 bits count. Characters of
-        // the default alphabet, and of its extension behind 0x1B, are their septets; those
-        // from the base on to base + 0x7F are 0x80 and more. Others become '?' and mark.
+        // the default alphabet are their septets; others from the base on to base + 0x7F are
+        // 0x80 and more; of the rest those of the extension are septets behind 0x1B. What is
+        // left becomes '?' and marks.
         kUcs2ToAdn8 = 11,
         // The reverse -> units, with the rules of kGsm7ToUcs2 below 0x80. p: the base. A code
         // above 0xFF becomes U+FFFD and marks.
