@@ -28,9 +28,10 @@ void readConcatenation(std::uint16_t reference, Octets place, SmsHeader& header)
         header.concatenation = read;
 }
 
-// Of languages that are not known the default tables are what a receiver has.
-Language languageOf(std::uint8_t id) {
-    return id <= static_cast<int>(Language::kPortuguese) ? Language{id} : Language::kNone;
+// Skips what is no language, or none that is known: it is as if the element was not there.
+void readLanguage(std::uint8_t id, Language& language) {
+    if (isSet(Language{id}) && id <= static_cast<int>(Language::kPortuguese))
+        language = Language{id};
 }
 
 void readElement(std::uint8_t identifier, Octets data, SmsHeader& header) {
@@ -43,9 +44,9 @@ void readElement(std::uint8_t identifier, Octets data, SmsHeader& header) {
     else if (identifier == kPorts16Bit && data.size() == 4)
         header.ports = SmsPorts{numberAt(data), numberAt(data.subspan(2))};
     else if (identifier == kSingleShift && data.size() == 1)
-        header.single = languageOf(data[0]);
+        readLanguage(data[0], header.single);
     else if (identifier == kLockingShift && data.size() == 1)
-        header.locking = languageOf(data[0]);
+        readLanguage(data[0], header.locking);
 }
 
 }  // namespace

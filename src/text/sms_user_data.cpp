@@ -116,15 +116,17 @@ const char* asString(SmsUserDataError error) noexcept {
 SmsUserData decodeSmsUserData(Octets userData, std::uint8_t codingScheme, std::uint8_t length,
                               bool hasHeader) {
     SmsUserData result;
-    if (!readCodingScheme(codingScheme, result))
-        result.error = Error::kReservedCoding;
-    else if (length > (hasSeptets(result) ? kMostSmsSeptets : kMostSmsOctets))
+    const bool isReserved = !readCodingScheme(codingScheme, result);
+    if (length > (hasSeptets(result) ? kMostSmsSeptets : kMostSmsOctets))
         result.error = Error::kTooLong;
     else if (const std::size_t octets = hasSeptets(result) ? octetsOver(length) : length;
              octets > userData.size())
         result.error = Error::kCutShort;
     else
         result.error = readUserData(userData.first(octets), length, hasHeader, result);
+    // Receivers are to take it for the default alphabet (3GPP TS 23.038, chapter 4), as was done.
+    if (isReserved && result.error == Error::kNone)
+        result.error = Error::kReservedCoding;
     return result;
 }
 

@@ -38,6 +38,7 @@ const Row kRows[] = {
      SmsConcatenation{0xA5, 3, 2}},
     {"Spanish single shift", "03240102d884378926", 0x00, 10, kHeader, "áçM"},
     {"languages that are not known", "0625010d24010d9b3201", 0x00, 11, kHeader, "€è"},
+    {"a language, then none", "062401012401209b33", 0x00, 10, kHeader, "ğ"},
     {"16-bit reference", "0608041234020178", 0x00, 9, kHeader, "x", SmsConcatenation{0x1234, 2, 1}},
     {"elements twice, one not known", "0e0003010201000307030370020909001e", 0x00, 19, kHeader, "x",
      SmsConcatenation{7, 3, 3}},
@@ -93,7 +94,7 @@ TEST(SmsUserData, BadLengthsAreRefused) {
         bool hasHeader;
         Error error;
     } rows[] = {
-        {"reserved scheme", {}, 0x80, 0, kNoHeader, Error::kReservedCoding},
+        {"reserved scheme", {0x61, 0xF1, 0x18}, 0x80, 3, kNoHeader, Error::kReservedCoding},
         {"161 septets", std::vector<std::uint8_t>(200), 0x00, 161, kNoHeader, Error::kTooLong},
         {"141 octets", std::vector<std::uint8_t>(200), 0x08, 141, kNoHeader, Error::kTooLong},
         {"an octet less", std::vector<std::uint8_t>(139), 0x00, 160, kNoHeader, Error::kCutShort},
@@ -109,6 +110,7 @@ TEST(SmsUserData, BadLengthsAreRefused) {
             decodeSmsUserData(row.userData, row.codingScheme, row.length, row.hasHeader);
         EXPECT_STREQ(asString(read.error), asString(row.error)) << row.name;
     }
+    EXPECT_EQ(decodeSmsUserData(rows[0].userData, 0x80, 3, kNoHeader).text, "abc");
 }
 
 TEST(SmsUserData, IsWrittenAsAnotherCodecDoes) {

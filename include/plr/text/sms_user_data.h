@@ -50,17 +50,18 @@ struct SmsHeader {
 
 enum class SmsUserDataError {
     kNone,
-    kReservedCoding,  // a data coding scheme that means nothing
+    kReservedCoding,  // a data coding scheme that means nothing; read as septets
     kTooLong,         // more than 160 septets or 140 octets
     kCutShort,        // fewer octets than its length tells
     kHeaderTooLong,   // the header goes beyond the user data
-    kHeaderElements,  // the elements do not fill the header
+    kHeaderElements,  // the elements do not fill the header; it counts as empty
 };
 // "none", "reserved data coding scheme", …. Static.
 [[nodiscard]] PLR_EXPORT const char* asString(SmsUserDataError error) noexcept;
 
 struct SmsUserData {
-    SmsUserDataError error = SmsUserDataError::kNone;  // if any, nothing else counts
+    // With kReservedCoding and kHeaderElements the rest counts, too; with others nothing else.
+    SmsUserDataError error = SmsUserDataError::kNone;
     TextConverter::MessageEncoding encoding = TextConverter::MessageEncoding::kGSM7;
     TextConverter::MessageClass messageClass = TextConverter::MessageClass::kClassNone;
     bool isCompressed = false;
