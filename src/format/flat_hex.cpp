@@ -17,7 +17,7 @@ constexpr std::uint32_t kGreatest = std::numeric_limits<std::uint32_t>::max();
 std::uint32_t readLoneDigit(std::uint8_t* out, const char* text, std::size_t textLength) {
     if (textLength % 2 == 0)
         return 0;
-    *out = PelorinDecodeHexWithDefault(*text, 0);
+    *out = static_cast<std::uint8_t>(PelorinDecodeHexWithDefault(*text, 0));
     return 1;
 }
 
@@ -35,12 +35,12 @@ void PelorinEncodeHexWithLowerCase(std::uint8_t byte, char* high, char* low, boo
     *low = digits[byte & 15];
 }
 
-std::uint8_t PelorinDecodeHexWithDefault(char character, std::uint8_t otherwise) {
+std::uint32_t PelorinDecodeHexWithDefault(char character, std::uint32_t otherwise) {
     if (character >= '0' && character <= '9')
-        return static_cast<std::uint8_t>(character - '0');
+        return static_cast<std::uint32_t>(character - '0');
     const int lower = character | 0x20;
     if (lower >= 'a' && lower <= 'f')
-        return static_cast<std::uint8_t>(lower - 'a' + 10);
+        return static_cast<std::uint32_t>(lower - 'a' + 10);
     return otherwise;
 }
 

@@ -22,8 +22,8 @@ using plr::test::print;
 TEST(FlatHex, OneDigitBothWays) {
     for (int i = 0; i < 256; ++i) {
         const auto at = std::string_view("0123456789abcdefABCDEF").find(static_cast<char>(i));
-        ASSERT_EQ(PelorinDecodeHexWithDefault(static_cast<char>(i), 77),
-                  at == std::string_view::npos ? 77
+        ASSERT_EQ(PelorinDecodeHexWithDefault(static_cast<char>(i), 0xFFFFFFFF),
+                  at == std::string_view::npos ? 0xFFFFFFFF
                   : at < 16                    ? at
                                                : at - 6);
         const auto byte = static_cast<std::uint8_t>(i);
