@@ -31,6 +31,8 @@ bool SecretMask::add(std::string_view text) {
     Pattern pattern;
     States here = kStart;
     for (std::size_t i = 0; i < text.size(); ++i) {
+        if (endsLine(static_cast<std::uint8_t>(text[i])))
+            return false;
         if (i > 0 && text[i - 1] == '#' && text[i] != '#')
             pattern.stayOnDigit |= here;
         if (text[i] == '*') {

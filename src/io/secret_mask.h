@@ -10,8 +10,9 @@
 // Hides the secret digits of a stream of text lines, however the stream is cut.
 //
 // Patterns say where they are: "#" n times stands for n digits and all that follow
-// them, which are secret; "*" for any text within the line; every other character
-// for itself, in either case. CR and LF end lines.
+// them, which are secret; "*" for any text within the line (behind a "#" its digits are
+// hidden, too: more than need be, never less); every other character for itself, in
+// either case. CR and LF end lines.
 //
 // A pattern is an automaton whose states are the places between its characters, and
 // a set of states is the bits of a word. What came of a line is kept as such a set,
@@ -28,7 +29,8 @@ class SecretMask {
     static constexpr std::size_t kLongestPattern = 63;  // characters, without "*"
     static constexpr std::size_t kMostAtOnce = 512;     // bytes
 
-    // False for a pattern that is too long, or without "#". Throws std::bad_alloc.
+    // False for a pattern that is too long, without "#", or with a line's end. Throws
+    // std::bad_alloc.
     [[nodiscard]] bool add(std::string_view pattern);
 
     // The stream goes on with `known`. Writes its first `count` bytes (at most

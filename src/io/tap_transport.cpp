@@ -214,8 +214,9 @@ bool addSecrets(SecretMask& mask, const PelorinTransportTapConfig& config) {
     for (const char* secret : std::span(secrets, count)) {
         if (mask.add(secret))
             continue;
-        PelorinDebugPrint(kCreate, "Pattern \"%s\" has no # or exceeds %zu characters\n", secret,
-                          SecretMask::kLongestPattern);
+        PelorinDebugPrint(kCreate,
+                          "Pattern \"%s\" has no #, has a line's end or exceeds %zu characters\n",
+                          secret, SecretMask::kLongestPattern);
         return false;
     }
     return true;

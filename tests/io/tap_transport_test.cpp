@@ -109,6 +109,7 @@ TEST(TapTransport, RefusesWhatItCannotShowOrHide) {
     EXPECT_TRUE(takes(&TapRecords::sink, longest.c_str()));
     EXPECT_FALSE(takes(&TapRecords::sink, tooLong.c_str()));
     EXPECT_FALSE(takes(&TapRecords::sink, "nothing secret*"));
+    EXPECT_FALSE(takes(&TapRecords::sink, "PIN #\r")) << "no line has its end in it";
     EXPECT_FALSE(takes(nullptr, "#"));
 }
 
