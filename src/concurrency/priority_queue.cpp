@@ -99,9 +99,10 @@ void PriorityQueue::notifyOn(const dispatch::group& group, dispatch::block<void(
         group.notify(normal_, std::move(block));
         return;
     }
+    // Handed on, not copied: the work queue is to release the block.
     group.notify(dispatch::queue::global(dispatch::priority::high),
-                 dispatch::block<void()>([queue = *this, block = std::move(block)] {
-                     queue.addHighestPriorityBlock(block);
+                 dispatch::block<void()>([queue = *this, block = std::move(block)]() mutable {
+                     queue.addHighestPriorityBlock(std::move(block));
                  }));
 }
 
