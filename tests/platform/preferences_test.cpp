@@ -55,6 +55,7 @@ TEST(PreferencesText, IsReadAndWrittenByType) {
         {"true", owned_value::retain(kQfBooleanTrue)},
         {"1970-01-01T01:00:00.000000001+01:00", date(1)},
         {"1969-12-31 23:59:59.999999999Z", date(-1)},
+        {"1677-09-21T00:12:43.145224192Z", date(INT64_MIN)},
         {"1970-01-01T02:00:01", date(kSecond)},  // local
         {"2024-02-29", text("2024-02-29")},
         {"07:05:00.25", text("07:05:00.25")},
@@ -127,6 +128,8 @@ TEST(PreferencesText, IsEditedInPlace) {
          "[t] # t\na = 5 # a\nc = 3\n[u]\n"},
         {"a new table in a table", "[t]\na = 1\n# end\n", "[t]\na = 1\n[t.u]\nb = 2",
          "[t]\na = 1\n# end\n\n[t.u]\nb = 2\n"},
+        {"a table before a key", "[t]\na = 1 # a\n", "[t]\na = 1\nn = 3\n[t.b]\n[t.c]",
+         "[t]\na = 1 # a\nn = 3\n\n[t.b]\n\n[t.c]\n"},
         {"a removed table", "[t]\na = 1\n[[t.l]]\nb = 1\n[u]\n", "[u]", "[u]\n"},
         {"a dotted key", "t.a.b = 1 # b\nt.a.c = 2\n", "t = {a = {b = 5, c = 2}}",
          "t.a.b = 5 # b\nt.a.c = 2\n"},

@@ -17,6 +17,7 @@ struct replacement {
     std::size_t at = 0;
     std::size_t length = 0;
     std::string by;
+    bool is_section = false;
 };
 
 bool is_within(const key_path& path, const key_path& outer) {
@@ -50,9 +51,12 @@ class editor {
     }
 
     [[nodiscard]] std::string result() {
-        std::stable_sort(
-            replacements_.begin(), replacements_.end(),
-            [](const replacement& left, const replacement& right) { return left.at < right.at; });
+        // At the text's end pairs come first: behind a new header they would be its.
+        std::stable_sort(replacements_.begin(), replacements_.end(),
+                         [](const replacement& left, const replacement& right) {
+                             return std::pair(left.at, left.is_section) <
+                                    std::pair(right.at, right.is_section);
+                         });
         std::string out;
         std::size_t at = 0;
         for (const replacement& next : replacements_) {
@@ -130,7 +134,7 @@ class editor {
         if (QfDictionaryRef table = as_dictionary(value)) {
             lines += '\n';
             append_section(lines, path, table);
-            replacements_.push_back({text_.size(), 0, std::move(lines)});
+            replacements_.push_back({text_.size(), 0, std::move(lines), true});
             return true;
         }
         const std::optional<std::size_t> place = place_for_pair(path);

@@ -160,10 +160,15 @@ class converter {
     }
 
     owned_value convert_date(const toml::node& node, const toml::date_time& from) {
-        const std::optional<std::time_t> seconds = seconds_of(from);
+        std::optional<std::time_t> seconds = seconds_of(from);
+        std::int64_t fraction = from.time.nanosecond;
+        if (seconds && *seconds < 0) {  // the range begins within a second
+            ++*seconds;
+            fraction -= kNanoseconds;
+        }
         std::int64_t nanoseconds = 0;
         if (!seconds || __builtin_mul_overflow(*seconds, kNanoseconds, &nanoseconds) ||
-            __builtin_add_overflow(nanoseconds, std::int64_t{from.time.nanosecond}, &nanoseconds))
+            __builtin_add_overflow(nanoseconds, fraction, &nanoseconds))
             return complain(node, "a date out of range (years 1678 to 2261)");
         return adopt(qf_date_create(nanoseconds));
     }

@@ -67,7 +67,7 @@ void append_number(std::string& out, QfNumberRef number) {
 void append_date(std::string& out, QfDateRef date) {
     const std::int64_t nanoseconds = qf_date_get_nanoseconds(date);
     const std::int64_t fraction = (nanoseconds % kNanoseconds + kNanoseconds) % kNanoseconds;
-    const std::time_t seconds = (nanoseconds - fraction) / kNanoseconds;
+    const std::time_t seconds = nanoseconds / kNanoseconds - (nanoseconds % kNanoseconds < 0);
     std::tm fields{};
     ::gmtime_r(&seconds, &fields);
     std::array<char, 40> text{};
