@@ -144,17 +144,23 @@ TEST_F(PreferencesSave, KeepsModeAndLinksAndMakesFolders) {
     EXPECT_EQ(text_of(set("a", toml("= 1"))), "");
     EXPECT_EQ(mode_of("USER/app.toml"), perms(0600));
     EXPECT_EQ(mode_of("USER"), perms(0700));
+    const mode_t usual = ::umask(077);
     EXPECT_EQ(text_of(set("a", toml("= 1"), kQfPreferencesAnyUser, make_string("h").get())), "");
+    ::umask(usual);
     EXPECT_EQ(mode_of("SYSTEM/app@h.toml"), perms(0644));
+    EXPECT_EQ(mode_of("SYSTEM"), perms(0755));
 
     write("elsewhere/real.toml", "a = 1\n");
     std::filesystem::permissions(at("elsewhere/real.toml"), perms(0640));
     std::filesystem::remove(at("USER/app.toml"));
     std::filesystem::create_symlink(at("elsewhere/real.toml"), at("USER/app.toml"));
     EXPECT_EQ(text_of(set("a", toml("= 2"))), "");
-    EXPECT_TRUE(std::filesystem::is_symlink(at("USER/app.toml")));
     EXPECT_EQ(read("elsewhere/real.toml"), "a = 2\n");
     EXPECT_EQ(mode_of("elsewhere/real.toml"), perms(0640));
+    std::filesystem::remove(at("elsewhere/real.toml"));
+    EXPECT_EQ(text_of(set("a", toml("= 2"))), "");
+    EXPECT_EQ(read("elsewhere/real.toml"), "a = 2\n");
+    EXPECT_TRUE(std::filesystem::is_symlink(at("USER/app.toml")));
     EXPECT_TRUE(qf_equal(value_of("a").get(), toml("= 2").get()));
 }
 

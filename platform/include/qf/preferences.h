@@ -44,9 +44,10 @@
 //          takes no lock and no system call.
 // Changes: files are watched (inotify) once they were read; a change is seen
 //          by readers, and told to observers, without a restart. Where the
-//          system has no more watches to give, that is one of the errors, and files
-//          are looked at once a second. In a child after fork() reading
-//          and writing work, other processes' changes are not noticed.
+//          system has no more watches to give, or a folder may not be listed, that
+//          is one of the errors, and files are looked at once a second. In a child
+//          after fork() reading and writing work, other processes' changes are not
+//          noticed.
 // Memory:  what was read stays for the life of the process.
 // Errors:  a file that cannot be read or is malformed is left out, its layer
 //          keeps the values last read, and the error names file, line and
@@ -86,7 +87,7 @@ PLR_EXPORT QfDictionaryRef qf_preferences_copy_all(QfStringRef application, QfSt
 // for other writers. This process reads the new value when it returns. Returns null,
 // or an error, after which the old content stands; the caller releases it. No file
 // can hold null, a URL, an error, a locale or formatter, an unsigned number past
-// 2^63 - 1, text that is not UTF-8, or a dictionary whose only key is "base64".
+// 2^63 - 1, text that is not UTF-8, or a dictionary of nothing but a string "base64".
 PLR_EXPORT QfErrorRef qf_preferences_set_value(QfStringRef key, QfTypeRef value,
                                                QfStringRef application, QfStringRef user,
                                                QfStringRef host)

@@ -2,9 +2,8 @@
 
 #include <array>
 #include <cerrno>
-#include <cstdlib>
+#include <climits>
 #include <ctime>
-#include <memory>
 
 #include "platform/linux/qf/preferences_parse.h"
 
@@ -42,12 +41,12 @@ std::string base_of(const std::string& path) {
 }
 
 std::string link_target(const std::string& path) {
-    struct stat state {};
-    if (::lstat(path.c_str(), &state) != 0 || !S_ISLNK(state.st_mode))
+    std::array<char, PATH_MAX> memory;
+    const ssize_t length = ::readlink(path.c_str(), memory.data(), memory.size());
+    if (length <= 0)
         return {};
-    const std::unique_ptr<char, void (*)(void*)> target(::realpath(path.c_str(), nullptr),
-                                                        std::free);
-    return target ? target.get() : std::string();
+    const std::string target(memory.data(), static_cast<std::size_t>(length));
+    return target.front() == '/' ? target : folder_of(path) + '/' + target;
 }
 
 bool stamp::is_same(const stamp& other) const noexcept {

@@ -35,8 +35,11 @@ class descriptor {
 
 [[nodiscard]] std::string folder_of(const std::string& path);
 [[nodiscard]] std::string base_of(const std::string& path);
-// What a symbolic link leads to; empty for what is no link, or leads nowhere.
+// What the symbolic link at `path` says, whether that is there or not; empty for
+// what is no link.
 [[nodiscard]] std::string link_target(const std::string& path);
+// Links that follow one another at most, as in the kernel.
+inline constexpr int kMaximumLinks = 40;
 
 // Tells one content of a file from another, as far as stat() can.
 struct stamp {

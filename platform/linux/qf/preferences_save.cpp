@@ -4,6 +4,7 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <utility>
 
 #include "platform/linux/qf/preferences_edit.h"
 #include "platform/linux/qf/preferences_file.h"
@@ -26,10 +27,16 @@ int sync_folder(const std::string& path) {
     return ::fsync(folder.get()) == 0 || errno == EINVAL ? 0 : errno;
 }
 
+// Of at least that mode, whatever the process's umask: other users read the system's.
 int make_folder(const std::string& path, unsigned mode) {
-    if (::mkdir(path.c_str(), mode) == 0)
-        return sync_folder(folder_of(path));
-    return errno == EEXIST ? 0 : errno;
+    if (::mkdir(path.c_str(), mode) != 0)
+        return errno == EEXIST ? 0 : errno;
+    struct stat made {};
+    if (::stat(path.c_str(), &made) != 0)
+        return errno;
+    if ((made.st_mode & mode) != mode && ::chmod(path.c_str(), (made.st_mode | mode) & 07777) != 0)
+        return errno;
+    return sync_folder(folder_of(path));
 }
 
 int make_folders(const std::string& path, unsigned mode) {
@@ -110,6 +117,17 @@ int replace(const std::string& path, std::string_view text, const struct stat* l
     return error != 0 ? error : sync_folder(folder);
 }
 
+// The file that `path` leads to, there or not.
+std::string behind_links(std::string path) {
+    for (int links = 0; links < kMaximumLinks; ++links) {
+        std::string target = link_target(path);
+        if (target.empty())
+            break;
+        path = std::move(target);
+    }
+    return path;
+}
+
 owned_dictionary changed(QfDictionaryRef old, QfDictionaryRef values, QfArrayRef removed) {
     const auto result = owned<QfMutableDictionaryRef>::adopt(qf_dictionary_create_mutable());
     const auto set = [&result](QfStringRef key, QfTypeRef value) {
@@ -167,8 +185,7 @@ owned_error save(const target_file& target, QfDictionaryRef values, QfArrayRef r
     const folder_lock lock(folder);
     if (lock.error() != 0)
         return system_error(lock.error(), folder + "/.lock");
-    const std::string linked = link_target(target.path);
-    return save_locked(linked.empty() ? target.path : linked, target.file_mode, values, removed);
+    return save_locked(behind_links(target.path), target.file_mode, values, removed);
 }
 
 }  // namespace qf::preferences

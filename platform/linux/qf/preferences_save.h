@@ -13,7 +13,7 @@ namespace qf::preferences {
 //   4. rename() over the file, fsync() of the folder
 //
 // A ".NAME.new" that a killed process left is removed in step 3. A symbolic link
-// stays, and the file that it leads to is replaced in its own folder. Nothing is
+// stays, and the file that it leads to is replaced, or made, in its own folder. Nothing is
 // written when the file says everything already. Waits for other writers.
 // Null, or an error after which the file is what it was; only after an error of
 // the last fsync() it is the new one, which a power failure may undo.

@@ -17,6 +17,14 @@ constexpr std::uint32_t kEvents = IN_CLOSE_WRITE | IN_CREATE | IN_DELETE | IN_MO
 // A folder may come while the one above it is being watched.
 constexpr int kAttempts = 8;
 
+// Whether a folder that could not be watched is one whose files may be read all
+// the same; else the one above it will do.
+bool is_final(int error, const std::string& folder) noexcept {
+    if (error != EACCES)
+        return error == ENOSPC || error == ENOMEM;
+    return ::faccessat(AT_FDCWD, folder.c_str(), X_OK, AT_EACCESS) == 0;
+}
+
 }  // namespace
 
 int folder_watch::open() {
@@ -29,9 +37,12 @@ int folder_watch::watch(const std::set<std::string>& files) {
     const std::map<int, std::vector<interest>> before = std::exchange(folders_, {});
     int result = 0;
     for (const std::string& file : files) {
-        int error = add(file, file);
-        if (const std::string target = link_target(file); error == 0 && !target.empty())
-            error = add(target, file);
+        int error = 0;
+        std::string place = file;
+        for (int links = 0; links <= kMaximumLinks && error == 0 && !place.empty(); ++links) {
+            error = add(place, file);
+            place = link_target(place);
+        }
         result = result != 0 ? result : error;
     }
     for (const auto& [number, interests] : before) {
@@ -48,15 +59,16 @@ int folder_watch::add(const std::string& place, const std::string& file) {
     for (int attempt = 0; attempt < kAttempts;) {
         const std::string folder = folder_of(entry);
         const int number = ::inotify_add_watch(inotify_.get(), folder.c_str(), kEvents);
-        if (number < 0 && (errno == ENOSPC || errno == ENOMEM || entry == "/"))
-            return errno;
+        const int error = number < 0 ? errno : 0;
+        if (is_final(error, folder) || (error != 0 && entry == "/"))
+            return error;
         if (number >= 0) {
             folders_[number].push_back({base_of(entry), file});
             if (!is_missing || !stamp_of(entry).exists)
                 return 0;
             ++attempt;
         } else {
-            is_missing = errno == ENOENT;
+            is_missing = error == ENOENT;
         }
         entry = number >= 0 ? place : folder;
     }

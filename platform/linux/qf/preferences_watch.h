@@ -12,7 +12,7 @@ namespace qf::preferences {
 // Tells which files came, changed or went, by inotify(7) on their folders:
 // editors put new files in the place of old ones. Of a folder that is not there
 // the nearest one above it is watched. Where a file is a symbolic link, what it
-// leads to is watched too. (Not noticed: a folder further up that is
+// leads to is watched too, there or not. (Not noticed: a folder further up that is
 // replaced as a whole.)
 //
 // Threads: whoever holds the store's lock.
