@@ -32,7 +32,7 @@ PLR_EXPORT QfTypeRef qf_dictionary_get_entry(QfDictionaryRef dictionary, size_t 
                                              QfStringRef* key);
 PLR_EXPORT void qf_dictionary_set_value(QfMutableDictionaryRef dictionary, QfStringRef key,
                                         QfTypeRef value);
-// Nothing for a missing key. Takes time with the number of entries behind it.
+// Nothing for a missing key. Takes time with the number of entries.
 PLR_EXPORT void qf_dictionary_remove_value(QfMutableDictionaryRef dictionary, QfStringRef key);
 
 #ifdef __cplusplus
