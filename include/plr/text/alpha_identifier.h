@@ -27,7 +27,8 @@ namespace plr {
     std::span<const std::uint8_t> octets);
 
 // A record of `capacity` octets with the UTF-8 text in the coding that takes the fewest, and
-// 0xFF behind it; of equal ones the first above. Nothing if it has no room.
+// 0xFF behind it; of equal ones the first above. A base is that of the lowest character that
+// septets have not. Nothing if it has no room.
 [[nodiscard]] PLR_EXPORT std::optional<std::vector<std::uint8_t>> encodeAlphaIdentifier(
     std::string_view text, std::size_t capacity);
 
