@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <poll.h>
 #include <pty.h>
 #include <sys/socket.h>
@@ -18,9 +17,8 @@
 
 namespace {
 
-using plr::ConsoleLogWriter;
-using plr::LogLevel;
-using plr::test::logMessage;
+using namespace plr;
+using namespace plr::test;
 using testing::HasSubstr;
 using testing::Not;
 using testing::StartsWith;
@@ -39,7 +37,7 @@ struct Ends {
         std::string all;
         char bytes[4096];
         pollfd ready{reader, POLLIN, 0};
-        const auto bound = std::chrono::milliseconds(plr::test::kBound).count();
+        const auto bound = std::chrono::milliseconds(kBound).count();
         while (!all.ends_with(last)) {
             if (::poll(&ready, 1, static_cast<int>(bound)) != 1) {
                 ADD_FAILURE() << "nothing more came behind " << all.size() << " bytes";
@@ -131,7 +129,7 @@ TEST(ConsoleLogWriter, DropsAndCountsForAReaderThatIsStalled) {
         EXPECT_EQ(::fcntl(ends.writer, F_GETFL) & O_NONBLOCK, 0);
 
         // A timer goes on by itself when there is room.
-        const auto texts = plr::test::textsOfRecords(ends.readTo("nobody read them\n"));
+        const auto texts = textsOfRecords(ends.readTo("nobody read them\n"));
         const std::int64_t missing = dropped(*writer);
         EXPECT_EQ(texts.back(),
                   "Note: " + std::to_string(missing) + " log messages dropped, nobody read them");
@@ -156,7 +154,7 @@ TEST(ConsoleLogWriter, OutlivesItsReader) {
             writer->write(logMessage("text"));
             writer->flush(dispatch::group_session(flushed));
         }
-        EXPECT_EQ(flushed.wait(dispatch::time::after(plr::test::kBound)), 0);
+        EXPECT_EQ(flushed.wait(dispatch::time::after(kBound)), 0);
         EXPECT_EQ(dropped(*writer), 3);
     }
 }

@@ -1,14 +1,11 @@
 #include "plr/log/crash_drain.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <unistd.h>
 
 #include <csignal>
 #include <exception>
-#include <functional>
 #include <stdexcept>
-#include <thread>
 
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
@@ -20,16 +17,13 @@
 
 namespace {
 
-using plr::LogLevel;
-using plr::LogMessage;
-using plr::LogServer;
-
+using namespace plr;
 void print(const std::string& text) noexcept {
     static_cast<void>(!::write(STDERR_FILENO, text.data(), text.size()));
 }
 
 // Prints "<text>" for every message; what it gathers goes out with the burst.
-class PrintingWriter : public plr::BatchLogWriter {
+class PrintingWriter : public BatchLogWriter {
   public:
     void close() override {}
     using LogWriter::write;
@@ -54,22 +48,22 @@ class PrintingWriter : public plr::BatchLogWriter {
 };
 
 // Logs "0" to "499", and ends the process in the given way on the way.
-void crashAfterLogging(const std::function<void(const plr::StaticLogger&)>& crash, bool start) {
+void crashAfterLogging(const std::function<void(const StaticLogger&)>& crash, bool start) {
     ::signal(SIGBUS, [](int) {
         print("the old handler");
         ::_exit(1);
     });
     const auto server =
-        LogServer::create("s", start ? nullptr : plr::MemoryBufferedLogWriter::create(-1, -1));
+        LogServer::create("s", start ? nullptr : MemoryBufferedLogWriter::create(-1, -1));
     server->addWriter(std::make_shared<PrintingWriter>());
     if (start)
         server->start();
     else
         server->debugFlush();
-    plr::drainLogsOnCrash(server);
-    const plr::StaticLogger logger(std::string("d"), server);
+    drainLogsOnCrash(server);
+    const StaticLogger logger(std::string("d"), server);
     for (int i = 0; i < 500; ++i)
-        logger.forceLog(LogLevel::Info, plr::LogMessageBuffer() << i);
+        logger.forceLog(LogLevel::Info, LogMessageBuffer() << i);
     crash(logger);
     ::pause();
 }
@@ -82,17 +76,16 @@ std::string allLines() {
 }
 
 TEST(CrashDrainDeathTest, WritesWhatWasLoggedBefore) {
-    struct Row {
+    const struct {
         const char* name;
-        std::function<void(const plr::StaticLogger&)> crash;
+        std::function<void(const StaticLogger&)> crash;
         bool start = true;
         const char* end = "";  // of what is printed
-    };
-    const Row rows[] = {
+    } rows[] = {
         {"abort", [](const auto&) { std::abort(); }},
         {"a failed assertion",
          [](const auto&) {
-             plr::setReportHook([](const char*) noexcept {});
+             setReportHook([](const char*) noexcept {});
              PLR_ASSERT(false, "as it should");
          }},
         {"a signal on another thread",
@@ -104,13 +97,13 @@ TEST(CrashDrainDeathTest, WritesWhatWasLoggedBefore) {
          }},
         {"a crash in a writer",
          [](const auto& logger) {
-             logger.forceLog(LogLevel::Error, plr::LogMessageBuffer() << "crash in the writer");
+             logger.forceLog(LogLevel::Error, LogMessageBuffer() << "crash in the writer");
          }},
         {"before the start", [](const auto&) { std::abort(); }, false},
         {"a handler from before", [](const auto&) { ::raise(SIGBUS); }, true, "the old handler"},
     };
     testing::FLAGS_gtest_death_test_style = "threadsafe";
-    for (const Row& row : rows) {
+    for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         EXPECT_DEATH(crashAfterLogging(row.crash, row.start),
                      testing::ContainsRegex(allLines() + row.end));

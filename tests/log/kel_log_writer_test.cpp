@@ -2,23 +2,13 @@
 
 #include <gtest/gtest.h>
 
-#include <chrono>
-#include <cstdint>
-#include <memory>
-#include <string>
-#include <utility>
-
 #include "plr/test/manual_calendar.h"
 #include "support/fake_log.h"
 
 namespace {
 
-using plr::KelLogWriter;
-using plr::LogLevel;
-using plr::LogMessage;
-using plr::test::FakeLog;
-using plr::test::JournalFields;
-
+using namespace plr;
+using namespace plr::test;
 constexpr std::int64_t kStart = 1'700'000'000'000'000'000;
 
 class KelLogWriterTest : public testing::Test {
@@ -28,7 +18,7 @@ class KelLogWriterTest : public testing::Test {
         return {time, level, "radio.sms", std::move(text), {}};
     }
 
-    plr::test::LogPlaces places_;
+    LogPlaces places_;
     FakeLog journal_{places_.journal()};
 };
 
@@ -64,7 +54,7 @@ TEST_F(KelLogWriterTest, EveryLevelHasItsPriority) {
 }
 
 TEST_F(KelLogWriterTest, ElapsedTimeIsSecondsAndMicrosecondsFromNowOn) {
-    const plr::test::ManualCalendar calendar{std::chrono::nanoseconds(kStart)};
+    const ManualCalendar calendar{std::chrono::nanoseconds(kStart)};
     const auto writer = KelLogWriter::create(nullptr, nullptr, -1);
     const std::pair<std::int64_t, const char*> rows[] = {
         {1'000'999, "     0.001000"},

@@ -1,58 +1,40 @@
-#include <gtest/gtest.h>
 #include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <csignal>
-#include <string>
-#include <thread>
-#include <vector>
 
 #include "plr/log/log_message_buffer.h"
 #include "plr/log/log_server.h"
-#include "plr/log/log_writer.h"
 #include "plr/log/memory_buffered_log_writer.h"
 #include "plr/log/static_logger.h"
+#include "support/function_log_writer.h"
 #include "support/sanitized.h"
 #include "support/waiting.h"
 
 namespace {
 
-using plr::LogLevel;
-using plr::LogMessage;
+using namespace plr;
+using namespace plr::test;
 
 constexpr std::string_view kOfChild = "child";
-
-// Counts what there is, and passes on what children say.
-class CountingWriter : public plr::LogWriter {
-  public:
-    explicit CountingWriter(int pipe) : pipe_(pipe) {}
-    void close() override {}
-    using LogWriter::write;
-    void write(const LogMessage& message) override {
-        ++written;
-        if (message.getText() == kOfChild)
-            static_cast<void>(!::write(pipe_, "c", 1));
-    }
-    std::atomic<std::uint64_t> written{0};
-
-  private:
-    const int pipe_;
-};
 
 // While threads log, a child that forks logs too, and does not write what its
 // parent has to write.
 TEST(LogFork, TheChildLogsWhateverTheParentsThreadsWereAt) {
-    if (plr::test::kSanitized)
+    if (kSanitized)
         GTEST_SKIP() << "sanitizers' heaps stay locked when other threads allocate at a fork";
     int ends[2];
     ASSERT_EQ(::pipe(ends), 0);
-    const auto server = plr::LogServer::create("s", nullptr);
-    const auto writer = std::make_shared<CountingWriter>(ends[1]);
-    server->addWriter(std::shared_ptr<CountingWriter>(writer));
+    std::atomic<std::uint64_t> written{0};
+    const auto server = LogServer::create("s", nullptr);
+    server->addWriter(std::make_shared<FunctionLogWriter>([&](const LogMessage& message) {
+        ++written;
+        if (message.getText() == kOfChild)
+            static_cast<void>(!::write(ends[1], "c", 1));
+    }));
     server->start();
-    const plr::StaticLogger logger(std::string("d"), server);
+    const StaticLogger logger(std::string("d"), server);
 
     std::atomic<bool> stop{false};
     std::atomic<std::uint64_t> logged{0};
@@ -60,7 +42,7 @@ TEST(LogFork, TheChildLogsWhateverTheParentsThreadsWereAt) {
     for (int i = 0; i < 2; ++i)
         threads.emplace_back([&] {
             while (!stop) {
-                logger.forceLog(LogLevel::Info, plr::LogMessageBuffer() << "parent");
+                logger.forceLog(LogLevel::Info, LogMessageBuffer() << "parent");
                 if (++logged % 64 == 0)
                     server->debugFlush();
             }
@@ -69,11 +51,11 @@ TEST(LogFork, TheChildLogsWhateverTheParentsThreadsWereAt) {
         const pid_t child = ::fork();
         if (child == 0) {
             ::prctl(PR_SET_PDEATHSIG, SIGKILL);
-            ::alarm(static_cast<unsigned>(plr::test::kBound.count()));
-            const std::uint64_t before = writer->written;
-            logger.forceLog(LogLevel::Info, plr::LogMessageBuffer() << kOfChild);
+            ::alarm(static_cast<unsigned>(kBound.count()));
+            const std::uint64_t before = written;
+            logger.forceLog(LogLevel::Info, LogMessageBuffer() << kOfChild);
             server->debugFlush();
-            ::_exit(writer->written == before + 1 ? 0 : 1);
+            ::_exit(written == before + 1 ? 0 : 1);
         }
         int status = -1;
         ASSERT_EQ(::waitpid(child, &status, 0), child);
@@ -84,7 +66,7 @@ TEST(LogFork, TheChildLogsWhateverTheParentsThreadsWereAt) {
     stop = true;
     threads.clear();
     server->debugFlush();
-    EXPECT_EQ(writer->written, logged) << "the parent lost nothing, and wrote nothing twice";
+    EXPECT_EQ(written, logged) << "the parent lost nothing, and wrote nothing twice";
     ::close(ends[0]);
     ::close(ends[1]);
 }

@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <unistd.h>
 
 #include "plr/ipc/dict.h"
@@ -18,92 +17,58 @@
 // What every writer promises. A new one gets a place of its own below.
 namespace {
 
-using plr::LogMessage;
-using plr::LogWriter;
-using plr::test::logMessage;
+using namespace plr;
+using namespace plr::test;
 using testing::ElementsAre;
 
 // A writer, and where its messages arrive.
-class Place {
-  public:
-    virtual ~Place() = default;
-    [[nodiscard]] LogWriter& writer() const { return *writer_; }
-    [[nodiscard]] plr::BatchLogWriter* batching() const {
-        return dynamic_cast<plr::BatchLogWriter*>(writer_.get());
-    }
+struct Place {
+    std::shared_ptr<LogWriter> writer;
     // The next texts that arrived, and all that did not ask for.
-    [[nodiscard]] virtual std::vector<std::string> texts(std::size_t expected) = 0;
-    // Whether it is for people, who see escapes.
-    [[nodiscard]] virtual bool escapes() const { return true; }
-    // A crash leaves a writer in a state of its own: it is not to be destroyed.
-    void abandon() {
-        static auto& abandoned = *new std::vector<std::shared_ptr<LogWriter>>;
-        abandoned.push_back(std::move(writer_));
-    }
-
-  protected:
-    std::shared_ptr<LogWriter> writer_;
+    std::function<std::vector<std::string>(std::size_t expected)> texts;
+    bool escapes = true;  // for people, who see escapes
 };
 
-class InMemory final : public Place {
-  public:
-    InMemory() { writer_ = plr::MemoryBufferedLogWriter::create(-1, -1); }
-    std::vector<std::string> texts(std::size_t /*expected*/) override {
-        std::vector<std::string> found;
-        for (const auto& message : static_cast<plr::MemoryBufferedLogWriter&>(writer()).drain())
-            found.push_back(message->getText());
-        return found;
-    }
-    bool escapes() const override { return false; }
-};
+Place inMemory() {
+    const std::shared_ptr<MemoryBufferedLogWriter> writer = MemoryBufferedLogWriter::create(-1, -1);
+    const auto drain = [writer](std::size_t) {
+        std::vector<std::string> texts;
+        for (const auto& message : writer->drain())
+            texts.push_back(message->getText());
+        return texts;
+    };
+    return {writer, drain, false};
+}
 
-class InFile final : public Place {
-  public:
-    InFile() { writer_ = plr::FileLogWriter::create({.path = folder_.at("log")}); }
-    std::vector<std::string> texts(std::size_t /*expected*/) override {
-        return plr::test::textsOfRecords(folder_.read("log"));
-    }
+Place inFile() {
+    const auto folder = std::make_shared<ScratchFolder>();
+    return {FileLogWriter::create({.path = folder->at("log")}),
+            [folder](std::size_t) { return textsOfRecords(folder->read("log")); }};
+}
 
-  private:
-    plr::test::ScratchFolder folder_;
-};
+Place onConsole() {
+    const auto folder = std::make_shared<ScratchFolder>();
+    const int fd = ::open(folder->at("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+    const std::shared_ptr<void> closer(nullptr, [fd](void*) { ::close(fd); });
+    return {ConsoleLogWriter::create({.descriptor = fd}),
+            [folder, closer](std::size_t) { return textsOfRecords(folder->read("log")); }};
+}
 
-class OnConsole final : public Place {
-  public:
-    OnConsole() : fd_(::open(folder_.at("log").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600)) {
-        writer_ = plr::ConsoleLogWriter::create({.descriptor = fd_});
-    }
-    ~OnConsole() override { ::close(fd_); }
-    std::vector<std::string> texts(std::size_t /*expected*/) override {
-        return plr::test::textsOfRecords(folder_.read("log"));
-    }
-
-  private:
-    plr::test::ScratchFolder folder_;
-    const int fd_;
-};
-
-class InJournal final : public Place {
-  public:
-    InJournal() { writer_ = plr::KelLogWriter::create("test", nullptr, -1); }
-    std::vector<std::string> texts(std::size_t expected) override {
-        std::vector<std::string> found;
-        while (found.size() < expected)
-            found.push_back(journal_.receiveField("MESSAGE"));
-        while (journal_.hasMore())
-            found.push_back(journal_.receiveField("MESSAGE"));
-        return found;
-    }
-    bool escapes() const override { return false; }
-
-  private:
-    plr::test::LogPlaces places_;
-    plr::test::FakeLog journal_{places_.journal()};
-};
+Place inJournal() {
+    const auto places = std::make_shared<LogPlaces>();
+    const auto journal = std::make_shared<FakeLog>(places->journal());
+    const auto receive = [places, journal](std::size_t expected) {
+        std::vector<std::string> texts;
+        while (texts.size() < expected || journal->hasMore())
+            texts.push_back(journal->receiveField("MESSAGE"));
+        return texts;
+    };
+    return {KelLogWriter::create("test", nullptr, -1), receive, false};
+}
 
 struct Kind {
     const char* name;
-    std::function<std::unique_ptr<Place>()> make;
+    Place (*make)();
 };
 
 class WriterContract : public testing::TestWithParam<Kind> {
@@ -111,29 +76,27 @@ class WriterContract : public testing::TestWithParam<Kind> {
     // True once the writer has passed everything on.
     bool flush() {
         dispatch::group sent;
-        place_->writer().flush(dispatch::group_session(sent));
-        return sent.wait(dispatch::time::after(plr::test::kBound)) == 0;
+        place_.writer->flush(dispatch::group_session(sent));
+        return sent.wait(dispatch::time::after(kBound)) == 0;
     }
 
-    const std::unique_ptr<Place> place_ = GetParam().make();
+    Place place_ = GetParam().make();
+    BatchLogWriter* const batching_ = dynamic_cast<BatchLogWriter*>(place_.writer.get());
 };
 
-INSTANTIATE_TEST_SUITE_P(
-    , WriterContract,
-    testing::Values(Kind{"Memory", [] { return std::make_unique<InMemory>(); }},
-                    Kind{"File", [] { return std::make_unique<InFile>(); }},
-                    Kind{"Console", [] { return std::make_unique<OnConsole>(); }},
-                    Kind{"Kel", [] { return std::make_unique<InJournal>(); }}),
-    [](const auto& kind) { return kind.param.name; });
+INSTANTIATE_TEST_SUITE_P(, WriterContract,
+                         testing::Values(Kind{"Memory", inMemory}, Kind{"File", inFile},
+                                         Kind{"Console", onConsole}, Kind{"Kel", inJournal}),
+                         [](const auto& kind) { return kind.param.name; });
 
 TEST_P(WriterContract, KeepsTheOrderOfMessagesAndFlushesThem) {
     for (const char* text : {"1", "2", "3", "4", "5", "6"}) {
-        place_->writer().write(std::make_shared<LogMessage>(logMessage(text)));
-        if (*text == '3' && place_->batching())
-            place_->batching()->endBatch();
+        place_.writer->write(std::make_shared<LogMessage>(logMessage(text)));
+        if (*text == '3' && batching_)
+            batching_->endBatch();
     }
     EXPECT_TRUE(flush());
-    EXPECT_THAT(place_->texts(6), ElementsAre("1", "2", "3", "4", "5", "6"));
+    EXPECT_THAT(place_.texts(6), ElementsAre("1", "2", "3", "4", "5", "6"));
 }
 
 TEST_P(WriterContract, PassesEveryTextOn) {
@@ -159,39 +122,40 @@ TEST_P(WriterContract, PassesEveryTextOn) {
     };
     std::vector<std::string> expected;
     for (const Row& row : rows) {
-        place_->writer().write(std::make_shared<LogMessage>(logMessage(row.text)));
-        expected.push_back(place_->escapes() ? row.escaped : row.text);
+        place_.writer->write(std::make_shared<LogMessage>(logMessage(row.text)));
+        expected.push_back(place_.escapes ? row.escaped : row.text);
     }
     EXPECT_TRUE(flush());
-    EXPECT_EQ(place_->texts(expected.size()), expected);
+    EXPECT_EQ(place_.texts(expected.size()), expected);
 }
 
 TEST_P(WriterContract, IgnoresWhatComesAfterItsClose) {
     if (GetParam().name == std::string("Memory"))
         GTEST_SKIP() << "its close() does nothing";
-    LogWriter& writer = place_->writer();
+    LogWriter& writer = *place_.writer;
     writer.write(logMessage("before"));
     writer.close();
     writer.write(logMessage("after"));
     writer.write(std::make_shared<LogMessage>(logMessage("after")));
     writer.close();
     EXPECT_TRUE(flush());
-    EXPECT_THAT(place_->texts(1), ElementsAre("before"));
+    EXPECT_THAT(place_.texts(1), ElementsAre("before"));
 }
 
 TEST_P(WriterContract, WritesInACrashBehindWhatItGathered) {
-    plr::BatchLogWriter* writer = place_->batching();
-    if (!writer)
+    if (!batching_)
         GTEST_SKIP() << "does nothing in a crash";
-    writer->write(logMessage("1"));
-    writer->write(logMessage("2"));
-    writer->flushInCrash();
-    writer->writeInCrash(logMessage(std::string(5000, '3') + "\x1b"));
-    writer->writeInCrash(logMessage("4"));
-    EXPECT_THAT(place_->texts(4),
-                ElementsAre("1", "2",
-                            std::string(5000, '3') + (place_->escapes() ? "\\x1b" : "\x1b"), "4"));
-    place_->abandon();
+    batching_->write(logMessage("1"));
+    batching_->write(logMessage("2"));
+    batching_->flushInCrash();
+    batching_->writeInCrash(logMessage(std::string(5000, '3') + "\x1b"));
+    batching_->writeInCrash(logMessage("4"));
+    EXPECT_THAT(
+        place_.texts(4),
+        ElementsAre("1", "2", std::string(5000, '3') + (place_.escapes ? "\\x1b" : "\x1b"), "4"));
+    // A crash leaves a writer in a state of its own: it is not to be destroyed.
+    static auto& abandoned = *new std::vector<std::shared_ptr<LogWriter>>;
+    abandoned.push_back(std::move(place_.writer));
 }
 
 }  // namespace

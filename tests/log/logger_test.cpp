@@ -1,11 +1,8 @@
 #include "plr/log/logger.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
-#include <functional>
 #include <latch>
-#include <thread>
 
 #include "plr/ipc/values.h"
 #include "plr/log/log_message.h"
@@ -17,29 +14,21 @@
 
 namespace {
 
-using enum plr::LogLevel;
-using plr::LoggerCommonBase;
-using plr::LogLevel;
-using plr::LogMessageBuffer;
-using plr::LogServer;
-using plr::MetaData;
-using plr::StagedLogger;
-using plr::StaticLogger;
-using plr::TrelContext;
-using plr::test::LogFixture;
+using namespace plr;
+using namespace plr::test;
+using enum LogLevel;
 using testing::ElementsAre;
 using testing::IsEmpty;
-using ServerLogger = plr::LoggerBase<std::shared_ptr<LogServer>>;
+using ServerLogger = LoggerBase<std::shared_ptr<LogServer>>;
 
 TEST(LoggerCommonBase, LetsThroughWhatIsAtLeastItsLevel) {
-    struct Row {
+    const struct {
         LogLevel local, inherited, effective;
-    };
-    const Row rows[] = {{Unset, Info, Info},     {Trace, Info, Trace},
-                        {Fatal, Info, Fatal},    {Unset, Unset, Unset},
-                        {Debug, Never, Never},   {Never, Debug, Never},
-                        {Unset, Always, Always}, {LogLevel{30}, Warn, LogLevel{30}}};
-    for (const Row& row : rows) {
+    } rows[] = {{Unset, Info, Info},     {Trace, Info, Trace},
+                {Fatal, Info, Fatal},    {Unset, Unset, Unset},
+                {Debug, Never, Never},   {Never, Debug, Never},
+                {Unset, Always, Always}, {LogLevel{30}, Warn, LogLevel{30}}};
+    for (const auto& row : rows) {
         SCOPED_TRACE(testing::Message() << row.local << " below " << row.inherited);
         LoggerCommonBase logger("domain", nullptr);
         logger.setLogLevel(row.local);
@@ -84,12 +73,11 @@ TEST(LoggerHandles, AreCountedOddly) {
     const auto count = [&] { return trel_get_reference_count(handle) - start; };
     const auto look = [&](const auto&...) { alive = count(); };
     const auto context = [] { return TrelContext("test", "counts"); };
-    struct Row {
+    const struct {
         const char* name;
         std::function<void()> run;
         long alive, gone;
-    };
-    const Row rows[] = {
+    } rows[] = {
         {"copied and moved contexts",
          [&] {
              TrelContext one = context();
@@ -127,7 +115,7 @@ TEST(LoggerHandles, AreCountedOddly) {
          },
          -1, -3},
     };
-    for (const Row& row : rows) {
+    for (const auto& row : rows) {
         start = trel_get_reference_count(handle);
         row.run();
         EXPECT_EQ(alive, row.alive) << row.name << ", alive";
@@ -138,7 +126,7 @@ TEST(LoggerHandles, AreCountedOddly) {
 using Loggers = LogFixture;
 
 TEST_F(Loggers, LogTheBuffersContentsWhateverTheLevel) {
-    const plr::test::ManualCalendar calendar(std::chrono::nanoseconds(1'234'567'890));
+    const ManualCalendar calendar(std::chrono::nanoseconds(1'234'567'890));
     StaticLogger logger("radio.modem", server_);
     const auto message =
         logger.buildMessage(Notice, LogMessageBuffer() << "cell " << 7 << MetaData("band=3"));
@@ -168,19 +156,18 @@ TEST_F(Loggers, WithoutAQueueLearnTheirLevelWhenMadeAndWhenTold) {
 }
 
 TEST_F(Loggers, StageLinesForOneMessageAtTheHighestLevel) {
-    struct Row {
+    const struct {
         const char* name;
         std::vector<std::pair<LogLevel, const char*>> lines;
         std::vector<std::string> logged;
-    };
-    const Row rows[] = {
+    } rows[] = {
         {"an empty one", {{Error, ""}}, {}},
         {"the highest first", {{Fatal, "x"}, {Trace, "y"}}, {"F radio x\ny"}},
         {"empty ones between",
          {{Info, ""}, {Info, "x"}, {Warn, ""}, {Info, "y"}},
          {"W radio x\ny"}},
     };
-    for (const Row& row : rows) {
+    for (const auto& row : rows) {
         {
             const StagedLogger logger("radio", server_);
             for (const auto& [level, text] : row.lines)
@@ -195,15 +182,15 @@ TEST_F(Loggers, WithAQueueAreTrackedThere) {
     configure("radio", Debug);
     const dispatch::queue queue = dispatch::queue::create("loggers");
     queue.suspend();
-    auto logger = plr::Logger::create(queue, server_, "first", TrelContext("test", "radio.modem"));
+    auto logger = Logger::create(queue, server_, "first", TrelContext("test", "radio.modem"));
     server_->debugFlush();
     EXPECT_EQ(logger->getInheritedLogLevel(), Unset) << "its queue has not run";
     queue.resume();
-    plr::test::drain(queue);
+    drain(queue);
     EXPECT_EQ(logger->getInheritedLogLevel(), Debug);
 
     configure("radio", Warn);
-    plr::test::drain(queue);
+    drain(queue);
     EXPECT_FALSE(logger->enabled(Notice));
     logger->setLogLevel(Trace);
     EXPECT_EQ(logger->getTrackedLoggerName(), "first");
@@ -213,7 +200,7 @@ TEST_F(Loggers, WithAQueueAreTrackedThere) {
     logger.reset();
     configure("radio", Error);  // nobody is there to be told
     EXPECT_TRUE(end.expired());
-    EXPECT_EQ(plr::Logger::create(queue, nullptr, "lone", TrelContext("test", "x"))->getLogLevel(),
+    EXPECT_EQ(Logger::create(queue, nullptr, "lone", TrelContext("test", "x"))->getLogLevel(),
               Unset);
 }
 

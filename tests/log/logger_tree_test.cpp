@@ -1,9 +1,7 @@
 #include "plr/log/logger_tree.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
-#include <map>
 #include <random>
 
 #include "plr/ipc/values.h"
@@ -11,10 +9,9 @@
 
 namespace {
 
-using enum plr::LogLevel;
-using plr::LoggerTree;
-using plr::LogLevel;
-using plr::test::FakeTrackedLogger;
+using namespace plr;
+using namespace plr::test;
+using enum LogLevel;
 using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Pair;
@@ -50,16 +47,15 @@ TEST(LoggerTree, SplitsThePath) {
         {"a.b.c", {"a", "b.c"}}, {"..a", {"a", ""}}, {"", {"", ""}},
         {"a..b", {"a", ".b"}},   {"a.", {"a", ""}},  {"...", {"", ""}}};
     for (const auto& [path, parts] : rows)
-        EXPECT_EQ(plr::splitPath(path), parts) << path;
+        EXPECT_EQ(splitPath(path), parts) << path;
 }
 
 TEST(LoggerTree, TakesOddConfigurationsLeniently) {
-    struct Row {
+    const struct {
         const char* name;
         vox::object config;
         LogLevel level;  // of "a", which was at Debug
-    };
-    const Row rows[] = {
+    } rows[] = {
         {"no dictionary", vox::string("a"), Debug},
         {"behind a dot", asDict({{".a", number(Warn)}}), Warn},
         {"the last key of a node's wins", asDict({{"a", number(Warn)}, {".a", number(Trace)}}),
@@ -68,7 +64,7 @@ TEST(LoggerTree, TakesOddConfigurationsLeniently) {
         {"cut to 8 bits", asDict({{"a", vox::int64(256 + 10)}}), Trace},
         {"a level without a name", asDict({{"a", vox::uint64(30)}}), LogLevel{30}},
     };
-    for (const Row& row : rows) {
+    for (const auto& row : rows) {
         LoggerTree root = infoRoot();
         root.updateLogLevels(asDict({{"a", number(Debug)}}));
         root.updateLogLevels(row.config);
@@ -160,10 +156,10 @@ TEST(LoggerTree, APathOfAHundredThousandNamesIsOneLikeOthers) {
 class Model {
   public:
     LogLevel effective(const std::string& path) const {
-        LogLevel level = plr::combine(Info, local(""));
+        LogLevel level = combine(Info, local(""));
         for (std::size_t end = 0; !path.empty() && end != std::string::npos;) {
             end = path.find('.', end + 1);
-            level = plr::combine(level, local(path.substr(0, end)));
+            level = combine(level, local(path.substr(0, end)));
         }
         return level;
     }

@@ -1,11 +1,9 @@
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <iomanip>
 #include <limits>
 #include <locale>
 #include <sstream>
-#include <thread>
 
 #include "plr/log/log_level.h"
 #include "plr/log/log_message.h"
@@ -14,31 +12,25 @@
 
 namespace {
 
-using plr::LogLevel;
-using plr::LogMessage;
-using plr::LogMessageBuffer;
-using plr::LogTag;
-using plr::MetaData;
+using namespace plr;
 using testing::ElementsAre;
 
 TEST(LogLevel, HasNamesLettersAndAnOrder) {
-    struct Row {
+    const struct {
         int value;
         const char* name;
         char letter;
-    };
-    const Row rows[] = {{0, "Unset", '?'},   {1, "Always", '?'}, {10, "Trace", 'T'},
-                        {20, "Debug", 'D'},  {40, "Info", 'I'},  {50, "Notice", 'N'},
-                        {70, "Warn", 'W'},   {80, "Error", 'E'}, {100, "Fatal", 'F'},
-                        {255, "Never", '?'}, {30, "???", '?'}};
-    for (const Row& row : rows) {
+    } rows[] = {{0, "Unset", '?'},   {1, "Always", '?'},  {10, "Trace", 'T'}, {20, "Debug", 'D'},
+                {40, "Info", 'I'},   {50, "Notice", 'N'}, {70, "Warn", 'W'},  {80, "Error", 'E'},
+                {100, "Fatal", 'F'}, {255, "Never", '?'}, {30, "???", '?'}};
+    for (const auto& row : rows) {
         EXPECT_STREQ(asString(static_cast<LogLevel>(row.value)), row.name);
         EXPECT_EQ(asChar(static_cast<LogLevel>(row.value)), row.letter) << row.name;
     }
     using enum LogLevel;
     EXPECT_EQ(combine(Never, Debug), Never);
     EXPECT_EQ(combine(Debug, Never), Never);
-    EXPECT_EQ(plr::max(Unset, Never), Never);
+    EXPECT_EQ(max(Unset, Never), Never);
 }
 
 struct Grouping : std::numpunct<char> {
@@ -98,9 +90,12 @@ TEST(LogMessageBuffer, GivesEachBufferAStreamWithoutAPast) {
         EXPECT_EQ(used.str(), "abc'def");
     }
     LogMessageBuffer buffer;
-    std::ostream& stream = buffer;
-    EXPECT_EQ(stream.iword(0), 0);
-    stream << 1234567 << ' ' << 0.5;
+    EXPECT_TRUE(buffer.empty());
+    EXPECT_EQ(static_cast<std::ostream&>(buffer).iword(0), 0);
+    EXPECT_FALSE(buffer.empty()) << "it has a stream";
+    EXPECT_EQ(buffer.str(), "");
+    EXPECT_TRUE(buffer.empty());
+    static_cast<std::ostream&>(buffer) << 1234567 << ' ' << 0.5;
     EXPECT_EQ(buffer.str(), "1234567 0.5");
 }
 
@@ -109,15 +104,6 @@ TEST(LogMessageBuffer, FormatsTextsOfAnyLength) {
         LogMessageBuffer buffer = LogMessageBuffer::createWithFormat("%*s", length, "");
         EXPECT_EQ(buffer.str(), std::string(static_cast<std::size_t>(length), ' '));
     }
-}
-
-TEST(LogMessageBuffer, CountsAsFilledOnceItHasAStream) {
-    LogMessageBuffer buffer;
-    EXPECT_TRUE(buffer.empty());
-    static_cast<void>(static_cast<std::ostream&>(buffer));
-    EXPECT_FALSE(buffer.empty());
-    buffer.str();
-    EXPECT_TRUE(buffer.empty());
 }
 
 TEST(LogMessageBuffer, CopiesMovesAndMergesTextAndMetadata) {
@@ -175,54 +161,55 @@ TEST(LogMessage, LeavesNothingToTheNextOne) {
     }
 }
 
-TEST(LogTag, NumbersQueuesInTheOrderOfTheCalls) {
-    const auto first = dispatch::queue::create("first");
-    const auto second = dispatch::queue::create("second");
+// Queues that are numbered 1 and 2.
+class LogTags : public testing::Test {
+  protected:
+    LogTags() {
+        reset_last_tag();
+        maybe_add_logging_tag(first);
+        add_logging_tag(second);
+    }
+    const dispatch::queue first = dispatch::queue::create("first");
+    const dispatch::queue second = dispatch::queue::create("second");
+};
+
+TEST_F(LogTags, NumberQueuesInTheOrderOfTheCalls) {
     const auto numberOf = [](const dispatch::queue& queue) {
-        return reinterpret_cast<std::uintptr_t>(queue.get_specific(plr::kLoggingTagKey));
+        return reinterpret_cast<std::uintptr_t>(queue.get_specific(kLoggingTagKey));
     };
-    plr::reset_last_tag();
-    plr::maybe_add_logging_tag(first);
-    plr::add_logging_tag(second);
-    plr::maybe_add_logging_tag(first);
+    maybe_add_logging_tag(first);
     EXPECT_EQ(numberOf(first), 1U);
     EXPECT_EQ(numberOf(second), 2U);
-    plr::last_tag = std::numeric_limits<std::uint32_t>::max();
-    plr::add_logging_tag(first);
+    last_tag = std::numeric_limits<std::uint32_t>::max();
+    add_logging_tag(first);
     EXPECT_EQ(numberOf(first), 1U) << "0 is no tag";
 }
 
-TEST(LogTag, ShowsTheQueuesThatAThreadIsIn) {
-    plr::reset_last_tag();
-    const auto queues = {dispatch::queue::create("1"), dispatch::queue::create("2")};
-    for (const auto& queue : queues)
-        plr::add_logging_tag(queue);
-    std::thread([&] {
-        queues.begin()[0].sync([&] {
+TEST_F(LogTags, ShowTheQueuesThatAThreadIsIn) {
+    std::thread([this] {
+        first.sync([this] {
             const LogTag outer;
-            queues.begin()[1].sync([] {
+            second.sync([] {
                 const LogTag inner;
-                EXPECT_EQ(plr::get_current_logging_tag(), "1+,2+");
-                EXPECT_EQ(plr::get_current_logging_tag(), "1,2");
+                EXPECT_EQ(get_current_logging_tag(), "1+,2+");
+                EXPECT_EQ(get_current_logging_tag(), "1,2");
                 const LogTag again;
-                EXPECT_EQ(plr::get_current_logging_tag(), "1,2,2+");
+                EXPECT_EQ(get_current_logging_tag(), "1,2,2+");
             });
-            EXPECT_EQ(plr::get_current_logging_tag(), "1");
+            EXPECT_EQ(get_current_logging_tag(), "1");
         });
-        EXPECT_EQ(plr::get_current_logging_tag(), "");
+        EXPECT_EQ(get_current_logging_tag(), "");
     }).join();
 }
 
-TEST(LogTag, LeavesItsEntryBehindWhenAnotherIsMovedIntoIt) {
-    const auto queue = dispatch::queue::create("tagged");
-    plr::add_logging_tag(queue);
+TEST_F(LogTags, LeaveTheirEntryBehindWhenAnotherIsMovedIntoThem) {
     std::thread([] {
         {
             LogTag kept;
             LogTag moved;
             kept = std::move(moved);
         }
-        EXPECT_EQ(plr::get_current_logging_tag(), "0+") << "outside of queues, and one too many";
+        EXPECT_EQ(get_current_logging_tag(), "0+") << "outside of queues, and one too many";
     }).join();
 }
 

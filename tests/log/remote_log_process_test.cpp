@@ -4,20 +4,15 @@
 #include <sys/mman.h>
 #include <sys/wait.h>
 
-#include <algorithm>
-#include <array>
-#include <atomic>
 #include <charconv>
 #include <csignal>
-#include <functional>
 #include <random>
 
-#include "plr/ipc/values.h"
 #include "plr/log/log_message_buffer.h"
 #include "plr/log/log_server.h"
-#include "plr/log/log_writer.h"
 #include "plr/log/vox_log_server.h"
 #include "plr/log/vox_logger.h"
+#include "support/function_log_writer.h"
 #include "support/runtime.h"
 #include "support/sanitized.h"
 #include "support/scratch_folder.h"
@@ -25,8 +20,8 @@
 
 namespace {
 
+using namespace plr;
 using namespace plr::test;
-using plr::LogLevel;
 
 constexpr const char* kName = "net.example.log";
 constexpr int kClients = 4;
@@ -65,51 +60,34 @@ class Process {
     const pid_t pid_;
 };
 
-// ---- The server ---------------------------------------------------------------
-
-class LineWriter : public plr::LogWriter {
-  public:
-    LineWriter(const std::string& file, std::atomic<int>& written)
-        : fd_(::open(file.c_str(), O_CREAT | O_WRONLY | O_APPEND | O_CLOEXEC, 0600)),
-          written_(written) {}
-    void close() override {}
-    using LogWriter::write;
-    void write(const plr::LogMessage& message) override {
-        const std::string line = message.getDomain() + " " + message.getText() + "\n";
-        if (::write(fd_, line.data(), line.size()) != static_cast<ssize_t>(line.size()))
-            std::abort();
-        if (message.getDomain().starts_with("client."))
-            ++written_;
-    }
-
-  private:
-    const int fd_;
-    std::atomic<int>& written_;
-};
-
 // Hands `level` down to the clients.
 [[noreturn]] void serve(const std::string& file, int level, Shared& shared) {
-    const auto log = plr::LogServer::create("server");
-    log->addWriter(std::make_shared<LineWriter>(file, shared.written));
+    const auto log = LogServer::create("server");
+    const int fd = ::open(file.c_str(), O_CREAT | O_WRONLY | O_APPEND | O_CLOEXEC, 0600);
+    log->addWriter(std::make_shared<FunctionLogWriter>([fd, &shared](const LogMessage& message) {
+        const std::string line = message.getDomain() + " " + message.getText() + "\n";
+        if (::write(fd, line.data(), line.size()) != static_cast<ssize_t>(line.size()))
+            std::abort();
+        if (message.getDomain().starts_with("client."))
+            ++shared.written;
+    }));
     log->start();
     const vox::dict levels = vox::dict::create(), config = vox::dict::create();
     levels["client"] = vox::int64(level);
     config["kDomainLogLevels"] = levels;
     log->updateConfig(config);
-    const auto remote = plr::VoxLogServer::create(log, "remote", "remote");
+    const auto remote = VoxLogServer::create(log, "remote", "remote");
     remote->startListeningOn(vox::listener::create(kName));
     for (;;)
         ::pause();
 }
 
-// ---- A client -----------------------------------------------------------------
-
 class Client {
   public:
     Client(int number, Shared::Client& told)
         : told_(told),
-          logger_(plr::VoxLogger::create(queue_, "client", "client." + std::to_string(number),
-                                         vox::connection::create(kName))) {
+          logger_(VoxLogger::create(queue_, "client", "client." + std::to_string(number),
+                                    vox::connection::create(kName))) {
         logger_->limitBuffer(kBuffer, 1 << 20);
         logger_->setInvalidationCallback(dispatch::block<void()>([this] {
             queue_.after(dispatch::time::after(std::chrono::milliseconds(1)),
@@ -126,7 +104,7 @@ class Client {
             if (pauses)
                 lookUntil([this] { return logger_->getHeldMessageCount() <= kBuffer / 2; });
             look();
-            logger_->forceLog(LogLevel::Info, plr::LogMessageBuffer() << i);
+            logger_->forceLog(LogLevel::Info, LogMessageBuffer() << i);
         }
         lookUntil([this] { return logger_->getHeldMessageCount() == 0; });
         told_.dropped = static_cast<long>(logger_->getDroppedMessageCount());
@@ -149,8 +127,6 @@ class Client {
     const dispatch::queue queue_ = dispatch::queue::create("client");
     const std::shared_ptr<plr::VoxLogger> logger_;
 };
-
-// ---- What was written ---------------------------------------------------------
 
 // One client's messages, through the files of all servers. In each file they
 // begin at or before the first that was never seen, and then go on without a gap

@@ -1,25 +1,21 @@
 // The serving side of remote logging, against clients that say what they like.
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
-#include <atomic>
 #include <regex>
 
 #include "plr/concurrency/clock.h"
 #include "plr/log/log_message_buffer.h"
-#include "plr/log/log_writer.h"
 #include "plr/log/vox_log_server.h"
 #include "plr/log/vox_logger.h"
+#include "support/function_log_writer.h"
 #include "support/log_fixture.h"
 #include "support/vox_test.h"
 
 namespace {
 
+using namespace plr;
 using namespace plr::test;
-using enum plr::LogLevel;
-using plr::LogMessageBuffer;
-using plr::VoxLogger;
-using plr::VoxLogServer;
+using enum LogLevel;
 using testing::ElementsAre;
 using testing::IsEmpty;
 using Lines = std::vector<std::string>;
@@ -137,66 +133,45 @@ TEST_F(RemoteLog, TheFirstMessageDecides) {
 }
 
 TEST_F(RemoteLog, LogsWhatComesLeniently) {
-    struct Row {
+    const struct {
         const char* name;
-        Ref message;
-        const char* text;
-        plr::LogLevel level;
-        std::vector<std::string> metadata;
-        plr::TimeStamp time;  // 0: now
+        const char* key;  // with `value`, in a message "said" at Debug
+        Ref value;
+        const char* logged;
+        TimeStamp time = 0;  // 0: now
+    } rows[] = {
+        {"with a time", "kLogMessageTimestamp", number(7), "D calls said", 7},
+        {"of time 0", "kLogMessageTimestamp", number(0), "D calls said"},
+        {"metadata", "kLogMessageMetadata", array({text("a"), text("b")}), "D calls said {a} {b}"},
+        {"odd metadata", "kLogMessageMetadata", text("a"), "D calls said"},
+        {"odd items", "kLogMessageMetadata", array({number(1), text("b")}), "D calls said {} {b}"},
+        {"a level of 9 bits", "kLogMessageLevel", number(256 + 80), "E calls said"},
+        {"a level too", "kLoggerLevel", number(10), "D calls said"},
+        {"no text", "kLogMessage", number(1), "D calls "},
     };
-    const auto message = [](std::initializer_list<std::pair<const char*, vox_object_t>> rest) {
-        const Ref made =
-            dictionary({{"kLogMessage", text("said")}, {"kLogMessageLevel", number(20)}});
-        for (const auto& [key, value] : rest)
-            vox_dictionary_set_value(made, key, value);
-        return made;
-    };
-    const Row rows[] = {
-        {"whole",
-         message({{"kLogMessageTimestamp", number(7)},
-                  {"kLogMessageMetadata", array({text("a"), text("b")})}}),
-         "said",
-         Debug,
-         {"a", "b"},
-         7},
-        {"without a time", message({}), "said", Debug, {}, 0},
-        {"of time 0", message({{"kLogMessageTimestamp", number(0)}}), "said", Debug, {}, 0},
-        {"with odd metadata", message({{"kLogMessageMetadata", text("a")}}), "said", Debug, {}, 0},
-        {"with odd items",
-         message({{"kLogMessageMetadata", array({number(1), text("b")})}}),
-         "said",
-         Debug,
-         {"", "b"},
-         0},
-        {"a level of 9 bits",
-         message({{"kLogMessageLevel", number(256 + 80)}}),
-         "said",
-         Error,
-         {},
-         0},
-        {"a level too", message({{"kLoggerLevel", number(10)}}), "said", Debug, {}, 0},
-        {"no text", message({{"kLogMessage", number(1)}}), "", Debug, {}, 0}};
     RawClient client(*remote_);
     client.send(checkIn("c", "calls"));
     client.settle();
     takeMessages();
-    for (const Row& row : rows) {
-        const auto before = static_cast<plr::TimeStamp>(plr::Clock::now_in_nanoseconds());
-        client.send(row.message);
+    for (const auto& row : rows) {
+        SCOPED_TRACE(row.name);
+        const auto before = static_cast<TimeStamp>(Clock::now_in_nanoseconds());
+        const Ref sent =
+            dictionary({{"kLogMessage", text("said")}, {"kLogMessageLevel", number(20)}});
+        vox_dictionary_set_value(sent, row.key, row.value);
+        client.send(sent);
         client.send(
             dictionary({{"kUnknown", text("ignored")}, {"kLogMessage", Ref(vox_null_create())}}));
         client.settle();
         const auto logged = takeMessages();
-        ASSERT_EQ(logged.size(), 1U) << row.name;
-        EXPECT_EQ(logged[0]->getText(), row.text) << row.name;
-        EXPECT_EQ(logged[0]->getDomain(), "calls") << row.name;
-        EXPECT_EQ(logged[0]->getLevel(), row.level) << row.name;
-        EXPECT_EQ(logged[0]->getMetaData(), row.metadata) << row.name;
-        if (row.time != 0)
-            EXPECT_EQ(logged[0]->getTimeStamp(), row.time) << row.name;
-        else
-            EXPECT_GE(logged[0]->getTimeStamp(), before) << row.name;
+        ASSERT_EQ(logged.size(), 1U);
+        std::string line = asChar(logged[0]->getLevel()) + (" " + logged[0]->getDomain()) + " " +
+                           logged[0]->getText();
+        for (const std::string& data : logged[0]->getMetaData())
+            line += " {" + data + "}";
+        EXPECT_EQ(line, row.logged);
+        EXPECT_GE(logged[0]->getTimeStamp(), row.time != 0 ? row.time : before);
+        EXPECT_TRUE(row.time == 0 || logged[0]->getTimeStamp() == row.time);
     }
 }
 
@@ -205,13 +180,10 @@ TEST_F(RemoteLog, TellsAClientEachChangeOfItsLevelOnce) {
     RawClient client(*remote_);
     client.send(checkIn("c", "calls.voice"));
     client.settle();
-    for (const auto& [domain, level] :
-         std::vector<std::pair<const char*, plr::LogLevel>>{{"calls", Warn},
-                                                            {"calls", Warn},
-                                                            {"other", Trace},
-                                                            {"calls.voice", Trace},
-                                                            {"calls", Error},
-                                                            {"calls.voice", Unset}})
+    const std::pair<const char*, LogLevel> changes[] = {{"calls", Warn},  {"calls", Warn},
+                                                        {"other", Trace}, {"calls.voice", Trace},
+                                                        {"calls", Error}, {"calls.voice", Unset}};
+    for (const auto& [domain, level] : changes)
         configure(domain, level);
     client.settle();
     // Deliberate: a new logger is told twice, at once and from the tree.
@@ -225,8 +197,8 @@ TEST_F(RemoteLog, AVoxLoggerIsOneLikeOthers) {
     EXPECT_TRUE(eventually([&] { return logger->getInheritedLogLevel() == Debug; }));
     logger->setLogLevel(Trace);
     EXPECT_TRUE(logger->enabled(Trace));
-    const auto before = static_cast<plr::TimeStamp>(plr::Clock::now_in_nanoseconds());
-    logger->forceLog(Notice, LogMessageBuffer() << "number " << 1 << plr::MetaData("a=1"));
+    const auto before = static_cast<plr::TimeStamp>(Clock::now_in_nanoseconds());
+    logger->forceLog(Notice, LogMessageBuffer() << "number " << 1 << MetaData("a=1"));
     EXPECT_EQ(logger->flush().wait(), 0);
     const auto logged = takeMessages().back();
     EXPECT_EQ(logged->getText() + " " + logged->getDomain(), "number 1 calls.voice");
@@ -269,15 +241,9 @@ TEST_F(RemoteLog, SaysWhatBecomesOfItsListener) {
 // Messages wait in the server only as far as the writers are slow, and in the
 // client otherwise; other clients are served meanwhile.
 TEST_F(RemoteLog, AFloodingClientIsReadNoFasterThanItsMessagesAreWritten) {
-    class Gate : public plr::LogWriter {
-      public:
-        void close() override {}
-        using LogWriter::write;
-        void write(const plr::LogMessage&) override { open.wait(false); }
-        std::atomic<bool> open = false;
-    };
-    const auto gate = std::make_shared<Gate>();
-    server_->addWriter(gate);
+    const auto open = std::make_shared<std::atomic<bool>>(false);
+    server_->addWriter(
+        std::make_shared<FunctionLogWriter>([open](const LogMessage&) { open->wait(false); }));
     RawClient flooder(*remote_);
     flooder.send(checkIn("c", "calls"));
     const Ref message = dictionary({{"kLogMessage", text(std::string(10'000, 'x'))}});
@@ -289,8 +255,8 @@ TEST_F(RemoteLog, AFloodingClientIsReadNoFasterThanItsMessagesAreWritten) {
         EXPECT_TRUE(other.inbox.wait(1));  // its level
     }
     EXPECT_GT(flooder.counts().queued_bytes, 4'000'000U);
-    gate->open = true;
-    gate->open.notify_all();
+    *open = true;
+    open->notify_all();
     flooder.settle();
     EXPECT_EQ(flooder.counts().queued_bytes, 0U);
 }

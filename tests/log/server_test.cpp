@@ -1,61 +1,33 @@
 #include "plr/log/log_server.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
-#include <atomic>
-#include <functional>
-#include <thread>
-#include <vector>
 
 #include "plr/ipc/read.h"
-#include "plr/ipc/values.h"
 #include "plr/log/log_message_buffer.h"
-#include "plr/log/log_writer.h"
 #include "plr/log/memory_buffered_log_writer.h"
 #include "plr/log/scoped_log_flusher.h"
 #include "plr/log/static_logger.h"
 #include "support/fake_tracked_logger.h"
+#include "support/function_log_writer.h"
 #include "support/log_fixture.h"
 #include "support/log_records.h"
 #include "support/waiting.h"
 
 namespace {
 
+using namespace plr;
+using namespace plr::test;
 using namespace std::chrono_literals;
-using plr::LogLevel;
-using plr::LogMessage;
-using plr::LogMessageBuffer;
-using plr::LogServer;
-using plr::MemoryBufferedLogWriter;
-using plr::StaticLogger;
-using plr::test::Event;
 using testing::ElementsAre;
+using testing::ElementsAreArray;
 using testing::IsEmpty;
-
-// A writer made of a function, run on the writers queue.
-struct FunctionWriter : plr::LogWriter {
-    using Function = std::function<void(const LogMessage&)>;
-    explicit FunctionWriter(Function function) : function_(std::move(function)) {}
-    void close() override { closed_ = true; }
-    using LogWriter::write;
-    void write(const LogMessage& message) override { function_(message); }
-    vox::object getFullConfig() override {
-        const vox::dict config = vox::dict::create();
-        config["path"] = vox::string("/log");
-        return config;
-    }
-
-    const Function function_;
-    bool closed_ = false;
-};
 
 void log(const StaticLogger& logger, const std::string& text, LogLevel level = LogLevel::Info) {
     logger.forceLog(level, LogMessageBuffer() << text);
 }
 
 std::shared_ptr<LogMessage> messageOf(const std::string& text) {
-    return std::make_shared<LogMessage>(plr::test::logMessage(text));
+    return std::make_shared<LogMessage>(logMessage(text));
 }
 
 std::vector<std::string> textsOf(MemoryBufferedLogWriter& writer) {
@@ -66,26 +38,23 @@ std::vector<std::string> textsOf(MemoryBufferedLogWriter& writer) {
 }
 
 TEST(MemoryBufferedLogWriter, DropsTheOldestBeyondItsLimits) {
-    struct Row {
+    const struct {
         const char* name;
         long maxMessages, maxBytes;
-        std::vector<std::string> left;  // of 4 messages of 8 bytes
-    };
-    const Row rows[] = {{"no limits", -1, MemoryBufferedLogWriter::UNLIMITED, {"0", "1", "2", "3"}},
-                        {"messages", 3, 0, {"1", "2", "3"}},
-                        {"bytes, exceeded by one message", 0, 10, {"2", "3"}},
-                        {"bytes, exactly", 0, 16, {"2", "3"}},
-                        {"less than a message", 0, 1, {"3"}}};
-    for (const Row& row : rows) {
+        std::size_t left;  // of 4 messages of 8 bytes
+    } rows[] = {{"no limits", -1, MemoryBufferedLogWriter::UNLIMITED, 4},
+                {"messages", 3, 0, 3},
+                {"bytes, exceeded by one message", 0, 10, 2},
+                {"bytes, exactly", 0, 16, 2},
+                {"less than a message", 0, 1, 1}};
+    const std::vector<std::string> texts = {"0.......", "1.......", "2.......", "3......."};
+    for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         const auto writer = MemoryBufferedLogWriter::create(row.maxMessages, row.maxBytes);
-        for (char i = '0'; i < '4'; ++i)
-            writer->write(messageOf(std::string(1, i) + "       "));
-        std::vector<std::string> left = textsOf(*writer);
-        for (std::string& text : left)
-            text.resize(1);
-        EXPECT_EQ(left, row.left);
-        EXPECT_EQ(writer->getDroppedMessageCount(), 4 - static_cast<long>(row.left.size()));
+        for (const std::string& text : texts)
+            writer->write(messageOf(text));
+        EXPECT_THAT(textsOf(*writer), ElementsAreArray(texts.end() - row.left, texts.end()));
+        EXPECT_EQ(writer->getDroppedMessageCount(), 4 - static_cast<long>(row.left));
     }
 }
 
@@ -120,7 +89,7 @@ TEST(LogServer, DeliversWhatTheStartupBufferHeldBehindANoteOfWhatItDropped) {
     EXPECT_THAT(textsOf(*writer), ElementsAre("6"));
 }
 
-class ConfiguredServer : public plr::test::LogFixture {};
+class ConfiguredServer : public LogFixture {};
 
 TEST_F(ConfiguredServer, FindsTheLevelOfTheNearestConfiguredDomain) {
     const std::pair<const char*, LogLevel> configured[] = {{"a", LogLevel::Debug},
@@ -149,7 +118,7 @@ TEST_F(ConfiguredServer, FindsTheLevelOfTheNearestConfiguredDomain) {
 TEST_F(ConfiguredServer, ReportsLoggersAndTheWritersThatHaveSomethingToTell) {
     const auto logger = std::make_shared<plr::test::FakeTrackedLogger>("sms", LogLevel::Trace);
     server_->registerLogger("radio.sms", logger);
-    server_->addWriter(std::make_shared<FunctionWriter>([](const LogMessage&) {}));
+    server_->addWriter(std::make_shared<FunctionLogWriter>([](const LogMessage&) {}));
     const vox::dict config = server_->getSimpleConfig();
     EXPECT_EQ(vox::get_subpath(config, "kLoggers.0.kLoggerName"), vox::string("sms"));
     EXPECT_EQ(vox::get_subpath(config, "kLogWriters.0.path"), vox::string("/log"));
@@ -159,8 +128,8 @@ TEST_F(ConfiguredServer, ReportsLoggersAndTheWritersThatHaveSomethingToTell) {
 // A server whose writers are functions.
 class Server : public testing::Test {
   protected:
-    std::shared_ptr<FunctionWriter> add(FunctionWriter::Function function) {
-        auto writer = std::make_shared<FunctionWriter>(std::move(function));
+    std::shared_ptr<FunctionLogWriter> add(FunctionLogWriter::Function function) {
+        auto writer = std::make_shared<FunctionLogWriter>(std::move(function));
         server_->addWriter(writer);
         return writer;
     }
@@ -178,8 +147,8 @@ TEST_F(Server, WritesToWhoeverIsThereWhenAMessageIsLogged) {
     const auto second = add([&](const LogMessage& message) { seen_.push_back(message.getText()); });
     log(logger_, "2");
     server_->close();
-    ASSERT_EQ(server_->flush().wait(dispatch::time::after(plr::test::kBound)), 0);
-    EXPECT_TRUE(second->closed_);
+    ASSERT_EQ(server_->flush().wait(dispatch::time::after(kBound)), 0);
+    EXPECT_TRUE(second->closed);
     EXPECT_THAT(seen_, ElementsAre("2"));
     EXPECT_THAT(textsOf(*first), ElementsAre("1", "2"));
 }
@@ -201,7 +170,7 @@ TEST(LogServer, LivesUntilWhatWasLoggedIsWritten) {
     Event written;
     auto server = LogServer::create("s");
     const std::weak_ptr<LogServer> late = server;
-    server->addWriter(std::make_shared<FunctionWriter>([&](const LogMessage&) {
+    server->addWriter(std::make_shared<FunctionLogWriter>([&](const LogMessage&) {
         EXPECT_TRUE(go.wait());
         EXPECT_FALSE(late.expired());
         written.signal();
@@ -213,17 +182,17 @@ TEST(LogServer, LivesUntilWhatWasLoggedIsWritten) {
 }
 
 TEST_F(Server, IsWaitedForByAFlusherButNotForEver) {
-    { const plr::ScopedLogFlusher nothing(nullptr); }
+    { const ScopedLogFlusher nothing(nullptr); }
     std::atomic<int> written{0};
     add([&](const LogMessage&) {
         EXPECT_TRUE(go_.wait());
         ++written;
     });
     log(logger_, "held up");
-    { const plr::ScopedLogFlusher flusher(server_, 1ms); }
+    { const ScopedLogFlusher flusher(server_, 1ms); }
     EXPECT_EQ(written, 0);
     go_.signal();
-    { const plr::ScopedLogFlusher flusher(server_); }
+    { const ScopedLogFlusher flusher(server_); }
     EXPECT_EQ(written, 1);
 }
 
@@ -286,7 +255,7 @@ TEST_F(ConfiguredServer, GivesAllWritersOneOrderWhateverHappens) {
     Seen seen[2];
     for (Seen& by : seen) {
         by.nextOfThread.resize(kThreads);
-        server_->addWriter(std::make_shared<FunctionWriter>(
+        server_->addWriter(std::make_shared<FunctionLogWriter>(
             [&by](const LogMessage& message) { by.add(message); }));
     }
     std::atomic<int> running{kThreads};

@@ -1,7 +1,6 @@
 #include "plr/log/shared_loggable.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <stdexcept>
 
@@ -11,32 +10,30 @@
 
 namespace {
 
-using enum plr::LogLevel;
-using plr::LogMessageBuffer;
-using plr::LogServer;
-using plr::test::Event;
+using namespace plr;
+using namespace plr::test;
+using enum LogLevel;
 using testing::ElementsAre;
 
 enum class Fails { Nowhere, InItsConstructor, WhenRegistered };
 
-class Radio : public plr::SharedLoggable<Radio> {
+class Radio : public SharedLoggable<Radio> {
   public:
     static std::shared_ptr<Radio> create(const std::shared_ptr<LogServer>& server,
                                          Fails fails = Fails::Nowhere, Event* queueEnd = nullptr) {
         std::shared_ptr<Radio> radio = make_shared_ptr(new Radio(server, fails, queueEnd));
-        radio->execute_wrapped(
-            [self = radio.get()] { self->report(plr::LogLevel::Debug, "init"); });
+        radio->execute_wrapped([self = radio.get()] { self->report(LogLevel::Debug, "init"); });
         return radio;
     }
     ~Radio() override { EXPECT_TRUE(ownQueue_.queue().is_current()); }
 
     using Loggable::setLogLevel;
-    void report(plr::LogLevel level, const char* text) const {
+    void report(LogLevel level, const char* text) const {
         if (enabled(level))
             forceLog(level, LogMessageBuffer() << text);
     }
     using SharedLoggable::updateTrackedConfig;
-    void updateTrackedConfig(plr::LogLevel level) override {
+    void updateTrackedConfig(LogLevel level) override {
         if (fails_ == Fails::WhenRegistered)
             throw std::runtime_error("refused");
         SharedLoggable::updateTrackedConfig(level);
@@ -56,7 +53,7 @@ class Radio : public plr::SharedLoggable<Radio> {
     const Fails fails_;
 };
 
-using SharedLoggable = plr::test::LogFixture;
+using SharedLoggable = LogFixture;
 
 TEST_F(SharedLoggable, LogsAtItsConfiguredLevelFromItsFirstWorkOn) {
     configure("radio", Debug);

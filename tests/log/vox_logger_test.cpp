@@ -2,19 +2,15 @@
 #include "plr/log/vox_logger.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
-#include <memory>
 
 #include "plr/log/log_message_buffer.h"
 #include "support/vox_test.h"
 
 namespace {
 
+using namespace plr;
 using namespace plr::test;
-using enum plr::LogLevel;
-using plr::LogMessageBuffer;
-using plr::VoxLogger;
+using enum LogLevel;
 using testing::ElementsAre;
 using Lines = std::vector<std::string>;
 
@@ -171,14 +167,14 @@ TEST_F(VoxLoggerTest, TellsOnceThatAConnectionIsLost) {
     std::optional<FakeServer> server(std::in_place, Answers::Everything);
     logger_->reconnect(server->connection());
     server->end().send(dictionary({{"kLoggerLevel", number(30)}}));
-    EXPECT_TRUE(eventually([this] { return logger_->getLogLevel() == plr::LogLevel{30}; }));
+    EXPECT_TRUE(eventually([this] { return logger_->getLogLevel() == LogLevel{30}; }));
     server.reset();
     EXPECT_TRUE(gone_.wait());
     lost();
     EXPECT_TRUE(gone_.wait()) << "again at once";
     logger_->reconnect(vox::endpoint());
     EXPECT_TRUE(gone_.wait()) << "one that cannot be made";
-    EXPECT_EQ(logger_->getLogLevel(), plr::LogLevel{30}) << "the last level stays";
+    EXPECT_EQ(logger_->getLogLevel(), LogLevel{30}) << "the last level stays";
     logger_->setInvalidationCallback(nullptr);
     log("kept");
     EXPECT_EQ(logger_->flush().wait(), 0) << "nothing to wait for";

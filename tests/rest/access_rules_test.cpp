@@ -1,18 +1,13 @@
 // Access rules: where messages arrive decides, however they spell it.
 #include "plr/rest/access_rules.h"
 
-#include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <algorithm>
-#include <functional>
-#include <memory>
 #include <stdexcept>
-#include <string>
-#include <vector>
 
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
+#include "support/scripted_resource.h"
 
 namespace {
 
@@ -28,16 +23,15 @@ const std::vector<AccessRule> kNobody = {{.path = "/"}};
 // ---- Every spelling --------------------------------------------------------------
 
 // A resource that shows all it has at its own path, and says nothing of itself.
-class Open : public RestResource {
-  public:
-    bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override {
+std::shared_ptr<RestResource> open() {
+    const auto show = [](RestResourceContext& context, const PathView& path) {
         const bool shows = !path || path.current() == "*" || path.current() == "x";
         return shows && context.sendReplyWithValue(vox::string("SECRET"));
-    }
-    bool handleRestMessage_PUSH(RestResourceContext& context, const PathView& path) override {
-        return handleRestMessage_GET(context, path);
-    }
-};
+    };
+    return std::make_shared<ScriptedResource>(show, [show](auto& context, const PathView& path) {
+        return context.getRestOperation() == asObject(Operation::kPush) && show(context, path);
+    });
+}
 
 // The secret is the property x at /kept and at /t/kept, and x of /open.
 class Secrets {
@@ -46,7 +40,7 @@ class Secrets {
         install("t", std::make_shared<TreeRestResource>());
         install("t/kept", std::make_shared<PropertyRestResource>(true));
         install("kept", std::make_shared<PropertyRestResource>(true));
-        install("open", std::make_shared<Open>());
+        install("open", open());
         hide();
     }
     // Whether a message shows or changes it.
@@ -145,7 +139,7 @@ class AccessRulesOfAServer : public testing::Test {
         rig.add("/kept", std::make_shared<PropertyRestResource>(true));
         rig.add("/t", std::make_shared<TreeRestResource>());
         rig.add("/t/kept", std::make_shared<PropertyRestResource>(true));
-        rig.add("/t/open", std::make_shared<Open>());
+        rig.add("/t/open", open());
         rig.start();
         client = rig.registeredClient("me");
     }
@@ -233,10 +227,7 @@ TEST_F(AccessRulesOfAServer, RefusedMessagesDoNothingAndAreToldOfByOneLineASecon
                             ": set of /kept/x?? (refused since the last such line: 1)"),
               1U);
     // The service itself may do anything.
-    rig.queue().sync([&] {
-        EXPECT_TRUE(rig.server().handleRestMessage(
-            nullptr, client->message(Operation::kSet, "/kept/x", vox::int64(2))));
-    });
+    EXPECT_TRUE(rig.handleOwn(client->message(Operation::kSet, "/kept/x", vox::int64(2))));
     rig.server().setAccessRules({});
     EXPECT_EQ(client->textAt("/kept/x"), "2");
     EXPECT_EQ(client->textAt("/kept"), R"([0: "x"])") << "no refused one made a property";
@@ -248,13 +239,8 @@ TEST_F(AccessRulesOfAServer, RefusedMessagesDoNothingAndAreToldOfByOneLineASecon
 }
 
 TEST_F(AccessRulesOfAServer, ARedirectedMessageNeedsBoth) {
-    class Elsewhere : public RestResource {
-      public:
-        bool handleRestMessage_GET(RestResourceContext& context, const PathView&) override {
-            return context.redirect("/kept/x");
-        }
-    };
-    rig.add("/elsewhere", std::make_shared<Elsewhere>());
+    rig.add("/elsewhere", std::make_shared<ScriptedResource>(
+                              [](auto& context, auto&&) { return context.redirect("/kept/x"); }));
     const auto answer = [&] {
         return oneLine(client->exchange(client->message(Operation::kGet, "/elsewhere")));
     };
@@ -267,8 +253,8 @@ TEST_F(AccessRulesOfAServer, ARedirectedMessageNeedsBoth) {
 
 TEST_F(AccessRulesOfAServer, DescriptionsShowWhatAClientMayGet) {
     RestServerExample& server = rig.server();
-    EXPECT_TRUE(server.registerResource("/map", std::make_shared<Open>(), {"map", "Open."}));
-    EXPECT_FALSE(server.registerResource("/no/map", std::make_shared<Open>(), {"map", ""}));
+    EXPECT_TRUE(server.registerResource("/map", open(), {"map", "Open."}));
+    EXPECT_FALSE(server.registerResource("/no/map", open(), {"map", ""}));
     server.describe("kept/x/", {"int64", "old"});
     server.describe("/kept/x", {"int64", "X."});
     server.describe("/keptother", {"", ""});

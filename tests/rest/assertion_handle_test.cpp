@@ -1,8 +1,5 @@
 #include "plr/rest/assertion_handle.h"
 
-#include <optional>
-#include <thread>
-
 #include "plr/rest/assertion_provider.h"
 #include "plr/rest/assertion_resource.h"
 #include "support/module_client.h"

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <random>
 #include <set>
@@ -30,8 +31,6 @@ constexpr std::uint32_t kGenerationsBeforeLast = 20;
 // state.
 using Told = std::tuple<int, std::string, std::uint64_t, std::string>;
 
-// ---- The model ------------------------------------------------------------------
-
 // Clients are connections: one that comes back is another.
 struct Model {
     struct Assertion {
@@ -46,8 +45,8 @@ struct Model {
     };
     const bool holdOff;
     const bool providerOnly;
-    std::map<std::string, Assertion> assertions;
-    std::vector<Told> told;  // by the last step
+    std::map<std::string, Assertion> assertions = {};
+    std::vector<Told> told = {};  // by the last step
 
     void tell(const std::string& name, int client, const char* state) {
         told.emplace_back(client, "/at/" + name, assertions[name].generation(), state);
@@ -133,8 +132,6 @@ struct Model {
     }
 };
 
-// ---- The resource, as clients see it --------------------------------------------
-
 class Assertions : public AssertionRestResource {
   public:
     template <class... Tags>
@@ -159,18 +156,17 @@ class NotingContext : public FakeRestContext {
     bool isOdd = false;
 };
 
-// What one step does; the client is a connection's number.
+// One message, or the end of a client, and what the model makes of it.
 struct Step {
-    enum Kind { Assert, Release, Grant, Revoke, Register, Unregister, Drop } kind;
-    std::string name;
-    int client;
-    std::uint64_t generation = 0;  // as it reads
-    vox::object value = {};
+    Operation operation;  // kNone: the client's connection ends
+    std::string name, word;
+    int client;  // a connection's number
+    vox::object value;
+    std::function<void(Model&)> effect;
 
     [[nodiscard]] std::string text() const {
-        return std::array{
-                   "assert", "release", "grant", "revoke", "provide", "unprovide", "drop"}[kind] +
-               (" " + name + " by " + std::to_string(client) + " value " + oneLine(value));
+        return asString(operation) + (" " + name + word + " by " + std::to_string(client)) + " " +
+               oneLine(value);
     }
 };
 
@@ -207,68 +203,77 @@ class Walk {
         return number == kNobody ? nullptr : clients_[static_cast<std::size_t>(number % kClients)];
     }
 
-    // ---- Choosing ----
-
     Step choose() {
         const unsigned dice = below(100);
         const std::string name = kNames[below(kNames.size())];
         const int client = below(50) == 0 ? kNobody : numbers_[below(kClients)];
+        const auto step = [&](Operation operation, const char* word, auto effect) -> Step {
+            return {operation, name, word,
+                    client,    {},   [=](Model& model) {
+                        (model.*effect)(name, client); }};
+        };
         if (dice < 35)
-            return {Step::Assert, name, client};
+            return step(Operation::kPush, "", &Model::assertBy);
         if (dice < 60)
-            return {Step::Release, name, client};
+            return step(Operation::kPop, "", &Model::releaseBy);
         if (dice < 85)
-            return chooseAnswer(dice < 77 ? Step::Grant : Step::Revoke, name, client);
+            return chooseAnswer(dice < 77, name, client);
         if (dice < 93)
-            return {Step::Register, name, client};
+            return step(Operation::kPush, "/provider", &Model::registerBy);
         if (dice < 96)
-            return {Step::Unregister, name, client};
-        return {Step::Drop, name, numbers_[below(kClients)]};
+            return step(Operation::kPop, "/provider", &Model::unregisterBy);
+        const int leaving = numbers_[below(kClients)];
+        return {Operation::kNone, {}, {}, leaving, {}, [=](Model& model) { model.drop(leaving); }};
     }
     // Mostly by the provider and of the current generation.
-    Step chooseAnswer(Step::Kind kind, const std::string& name, int client) {
+    Step chooseAnswer(bool grants, const std::string& name, int client) {
         const auto known = model_.assertions.find(name);
-        if (known == model_.assertions.end())
-            return {kind, name, client, 1, vox::int64(1)};
-        const int author = below(4) == 0 ? client : known->second.provider;
-        const std::uint64_t current = known->second.generation();
+        std::uint64_t generation = 1;
+        if (known != model_.assertions.end()) {
+            client = below(4) == 0 ? client : known->second.provider;
+            generation = known->second.generation();
+        }
+        vox::object value = vox::uint64(generation);
         switch (below(10)) {
             case 0:
-                return {kind, name, author, current - 1, vox::uint64(current - 1)};
+                value = vox::uint64(--generation);
+                break;
             case 1:
-                return {kind, name, author, current + 1,
-                        vox::int64(static_cast<std::int64_t>(current) + 1)};
+                value = vox::int64(static_cast<std::int64_t>(++generation));
+                break;
             case 2:
-                return {kind, name, author, 0, garbage()};
+                value = garbage();
+                generation = 0;  // as it reads
+                break;
             default:
-                return {kind, name, author, current, vox::uint64(current)};
+                break;
         }
+        return {Operation::kSet,
+                name,
+                grants ? "/granted" : "/revoked",
+                client,
+                value,
+                [=](Model& model) {
+                    grants ? model.grantBy(name, client, generation)
+                           : model.revokeBy(name, client, generation);
+                }};
     }
     vox::object garbage() {
-        switch (below(6)) {
-            case 0:
-                return {};
-            case 1:
-                return vox::string("1");
-            case 2:
-                return vox::real(1);
-            case 3:
-                return vox::boolean(true);
-            case 4:
-                return vox::int64((1LL << 32) + 1);
-            default:
-                return vox::dict::create();
-        }
+        const vox::object values[] = {{},
+                                      vox::string("1"),
+                                      vox::real(1),
+                                      vox::boolean(true),
+                                      vox::int64((1LL << 32) + 1),
+                                      vox::dict::create()};
+        return values[below(std::size(values))];
     }
 
-    // ---- Playing ----
-
-    // What differs afterwards.
+    // What differs after a step.
     std::string play(const Step& step) {
         model_.told.clear();
-        apply(step);
-        const bool isDrop = step.kind == Step::Drop;
-        NotingContext context(operationOf(step), step.value,
+        step.effect(model_);
+        const bool isDrop = step.operation == Operation::kNone;
+        NotingContext context(step.operation, step.value,
                               isDrop ? nullptr : connection(step.client));
         if (isDrop)
             drop(context, step.client);
@@ -281,33 +286,8 @@ class Walk {
                    testing::PrintToString(model_.told);
         return isDrop ? differenceOfAll() : differenceOf(step.name);
     }
-    void apply(const Step& step) {
-        switch (step.kind) {
-            case Step::Assert:
-                return model_.assertBy(step.name, step.client);
-            case Step::Release:
-                return model_.releaseBy(step.name, step.client);
-            case Step::Grant:
-                return model_.grantBy(step.name, step.client, step.generation);
-            case Step::Revoke:
-                return model_.revokeBy(step.name, step.client, step.generation);
-            case Step::Register:
-                return model_.registerBy(step.name, step.client);
-            case Step::Unregister:
-                return model_.unregisterBy(step.name, step.client);
-            case Step::Drop:
-                return model_.drop(step.client);
-        }
-    }
-    static Operation operationOf(const Step& step) {
-        if (step.kind == Step::Grant || step.kind == Step::Revoke)
-            return Operation::kSet;
-        return step.kind == Step::Assert || step.kind == Step::Register ? Operation::kPush
-                                                                        : Operation::kPop;
-    }
     void send(NotingContext& context, const Step& step) {
-        static const std::array words = {"", "", "/granted", "/revoked", "/provider", "/provider"};
-        const std::string path = "/at/" + step.name + words[step.kind];
+        const std::string path = "/at/" + step.name + step.word;
         PathView view(path);
         view.advance(1);
         context.isOdd |= !resource_.handleMessage(context, view);
@@ -322,11 +302,9 @@ class Walk {
 
     // Each connection's own order counts.
     static bool sameTold(std::vector<Told> left, std::vector<Told> right) {
-        const auto byConnection = [](const Told& a, const Told& b) {
-            return std::get<0>(a) < std::get<0>(b);
-        };
-        std::stable_sort(left.begin(), left.end(), byConnection);
-        std::stable_sort(right.begin(), right.end(), byConnection);
+        const auto number = [](const Told& told) { return std::get<0>(told); };
+        std::ranges::stable_sort(left, {}, number);
+        std::ranges::stable_sort(right, {}, number);
         return left == right;
     }
 
@@ -383,18 +361,10 @@ class Walk {
 };
 
 TEST(AssertionModel, IsFollowed) {
-    Assertions resource;
-    Walk(resource, {false, false, {}, {}}).run(kSteps);
-}
-
-TEST(AssertionModel, IsFollowedWithHoldOff) {
-    Assertions resource(hold_off);
-    Walk(resource, {true, false, {}, {}}).run(kSteps);
-}
-
-TEST(AssertionModel, IsFollowedWhereTheProviderAloneAnswers) {
-    Assertions resource(provider_only);
-    Walk(resource, {false, true, {}, {}}).run(kSteps / 10);
+    Assertions plain, holdingOff(hold_off), provided(provider_only);
+    Walk(plain, {.holdOff = false, .providerOnly = false}).run(kSteps);
+    Walk(holdingOff, {.holdOff = true, .providerOnly = false}).run(kSteps);
+    Walk(provided, {.holdOff = false, .providerOnly = true}).run(kSteps / 10);
 }
 
 }  // namespace

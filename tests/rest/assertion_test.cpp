@@ -1,6 +1,5 @@
 #include "plr/rest/assertion_resource.h"
 
-#include <map>
 #include <regex>
 #include <sstream>
 

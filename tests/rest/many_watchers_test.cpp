@@ -1,13 +1,16 @@
-// Watchers by the thousand: gone at once, and each told of thousands of properties.
-// This program also holds those that go, when it is called with "watchers".
+// Watchers by the thousand: gone at once, and each told of thousands of properties;
+// and one that stops reading while others go on. This program also holds those that
+// go, when it is called with "watchers".
 #include <sys/prctl.h>
 #include <sys/resource.h>
 
-#include <charconv>
+#include <fstream>
 
+#include "support/module_client.h"
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
 #include "support/sanitized.h"
+#include "support/scripted_resource.h"
 #include "support/service_process.h"
 
 namespace {
@@ -22,6 +25,10 @@ constexpr int kGroups = 10;      // properties that some of them watch besides
 constexpr int kProperties = kSanitized ? 500 : 5'000;
 constexpr int kWatchers = kSanitized ? 20 : 50;
 constexpr int kRounds = 2;
+constexpr std::uint32_t kQueuedBytes = 4U << 20;
+constexpr int kWindow = 1024;  // how far the setter may be ahead of the good watchers
+constexpr int kWindows = kSanitized ? 30 : 200;
+constexpr std::size_t kValueBytes = 1024;
 
 // Both ends of all connections may be in this process.
 void allowOpenFiles() {
@@ -80,81 +87,156 @@ TEST(ManyWatchers, ThatGoAtOnceLeaveNothingBehindAndNobodyWaitsForIt) {
     }
 }
 
-// Watches all properties, and sees that each one's values come in order, none
-// missing: null, 1, 2, …
-class Watcher {
+// Watches properties "0", "1", …, and sees that the values of each come in order, none
+// missing: null, and the numbers from 0 on.
+class GoodWatcher {
   public:
-    explicit Watcher(vox::connection connection) : client_(std::move(connection)) {
-        client_.set_event_handler([this](const vox::object& event) { take(event); });
-        client_.set_target_queue(queue_);
-        client_.resume();
+    explicit GoodWatcher(const RestServerRig& rig, int properties) {
+        client_.on([&] {
+            client_.module.connect(rig.connect());
+            for (int i = 0; i < properties; ++i)
+                client_.module.observeProperty(
+                    "/kept/" + std::to_string(i),
+                    [this, next = -1](const vox::object& value) mutable {
+                        const std::string text(value.text());
+                        wrong_ += (value ? std::atoi(text.c_str()) : -1) == next++ ? 0 : 1;
+                        taken_.signal();
+                    });
+        });
+        EXPECT_TRUE(wait(properties));
     }
-    ~Watcher() {
-        client_.cancel();
-        EXPECT_TRUE(end_.wait());
+    // Whether `count` more values came in time.
+    [[nodiscard]] bool wait(int count) {
+        while (count > 0 && taken_.wait())
+            --count;
+        return count == 0;
     }
-
-    void watchAll() const {
-        send("/connections");
-        for (int i = 0; i < kProperties; ++i)
-            send("/kept/" + std::to_string(i));
-    }
-    // Whether each property had one more value.
-    [[nodiscard]] bool waitForRound() { return round_.wait(); }
     // Values that came too early, too late or twice.
     [[nodiscard]] int wrong() const {
-        return queue_.sync([this] { return wrong_; });
+        return client_.on([this] { return wrong_; });
     }
 
   private:
-    void send(const std::string& path) const {
-        client_.send_message(plr::rest::createRestMessage(plr::rest::asObject(Operation::kPush),
-                                                          vox::string("watcher"),
-                                                          vox::string(std::string_view(path)), {}));
-    }
-    void take(const vox::object& event) {
-        const vox::dict message(event);
-        if (!message)
-            return end_.signal();
-        const std::string path(message.text("r"));
-        std::size_t property = 0;
-        std::from_chars(path.data() + sizeof "/kept", path.data() + path.size(), property);
-        const vox::object value(message["v"]);
-        const int number = value ? std::atoi(std::string(value.text()).c_str()) : 0;
-        wrong_ += number == next_.at(property)++ ? 0 : 1;
-        if (++taken_ % kProperties == 0)
-            round_.signal();
-    }
-
-    const vox::connection client_;
-    const dispatch::queue queue_ = dispatch::queue::create("watcher");
-    std::vector<int> next_ = std::vector<int>(kProperties);  // touched on the queue only, as …
-    int taken_ = 0;
-    int wrong_ = 0;
-    Event round_;
-    Event end_;
+    Event taken_;
+    int wrong_ = 0;  // touched on the queue only
+    const ModuleClient client_;
 };
+
+// A value that carries its number.
+vox::object numbered(int number, std::size_t bytes) {
+    std::string text = std::to_string(number);
+    text.resize(bytes, '.');
+    return vox::string(std::string_view(text));
+}
 
 TEST(ManyWatchers, SeeEverySetOfEveryPropertyInOrder) {
     vox_limits_t limits = vox_limits_default();
     limits.max_queued_messages_per_uid = kProperties * kWatchers * 2;
-    const RestServerRig rig(vox::listener::create_anonymous(&limits));
+    const RestServerRig rig(limits);
     rig.add("/kept", std::make_shared<PropertyRestResource>(true));
     rig.start();
-    std::vector<std::unique_ptr<Watcher>> watchers;
+    std::vector<std::unique_ptr<GoodWatcher>> watchers;
     for (int i = 0; i < kWatchers; ++i)
-        watchers.emplace_back(std::make_unique<Watcher>(rig.connect()))->watchAll();
+        watchers.push_back(std::make_unique<GoodWatcher>(rig, kProperties));
     const auto setter = rig.client("setter");
-    for (int round = 0; round <= kRounds; ++round) {
-        const std::string value = std::to_string(round);
-        for (int i = 0; i < kProperties && round > 0; ++i)
-            setter->send(Operation::kSet, "/kept/" + std::to_string(i),
-                         vox::string(std::string_view(value)));
+    for (int round = 0; round < kRounds; ++round) {
+        for (int i = 0; i < kProperties; ++i)
+            setter->send(Operation::kSet, "/kept/" + std::to_string(i), numbered(round, 1));
         for (const auto& watcher : watchers)
-            ASSERT_TRUE(watcher->waitForRound());
+            ASSERT_TRUE(watcher->wait(kProperties));
     }
     for (const auto& watcher : watchers)
         EXPECT_EQ(watcher->wrong(), 0);
+}
+
+// ---- One that stops reading --------------------------------------------------------
+
+// The memory that this process has resident, in bytes.
+std::size_t residentBytes() {
+    std::ifstream file("/proc/self/statm");
+    std::size_t total = 0;
+    std::size_t resident = 0;
+    file >> total >> resident;
+    return resident * static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
+}
+
+class StalledWatcher : public testing::Test {
+  protected:
+    void run(vox_overflow_policy_t policy) {
+        vox_limits_t limits = vox_limits_default();
+        limits.max_queued_bytes = kQueuedBytes;
+        limits.overflow = policy;
+        rig_ = std::make_unique<RestServerRig>(limits);
+        rig_->add("/kept", std::make_shared<PropertyRestResource>(true));
+        rig_->add("/capture",
+                  std::make_shared<ScriptedResource>(nullptr, [this](auto& context, auto&&) {
+                      serverEnd_ = context.getRawAuthorConnection();
+                      return true;
+                  }));
+        rig_->start();
+        slow_ = rig_->registeredClient("slow");
+        slow_->send(Operation::kPush, "/capture");
+        slow_->send(Operation::kPush, "/kept/0");
+        EXPECT_EQ(slow_->takeMessages().size(), 1U);
+        slow_->connection().suspend();
+        setAll();
+    }
+
+    void setAll() {
+        GoodWatcher first(*rig_, 1);
+        GoodWatcher second(*rig_, 1);
+        const auto setter = rig_->client("setter");
+        const std::size_t before = residentBytes();
+        for (int i = 0; i < kWindows * kWindow; ++i) {
+            ASSERT_EQ(setter->send(Operation::kSet, "/kept/0", numbered(i, kValueBytes)), 0);
+            if ((i + 1) % kWindow != 0)
+                continue;
+            ASSERT_TRUE(first.wait(kWindow) && second.wait(kWindow));
+            EXPECT_LE(serverEnd().statistics().queued_bytes, kQueuedBytes);
+        }
+        EXPECT_EQ(first.wrong() + second.wrong(), 0);
+        // The queue, what the kernel holds besides, and as much again.
+        EXPECT_TRUE(kSanitized || residentBytes() <= before + 4 * std::size_t{kQueuedBytes});
+    }
+
+    [[nodiscard]] vox::connection serverEnd() const {
+        return rig_->queue().sync([this] { return serverEnd_; });
+    }
+
+    std::unique_ptr<RestServerRig> rig_;
+    vox::connection serverEnd_;  // of the slow one; touched on the server's queue only
+    std::unique_ptr<RawRestClient> slow_;
+};
+
+TEST_F(StalledWatcher, IsDisconnectedByDefault) {
+    EXPECT_EQ(vox_limits_default().overflow, VOX_OVERFLOW_DISCONNECT);
+    run(VOX_OVERFLOW_DISCONNECT);
+    // The service has forgotten it, and the good ones that have left since.
+    for (int gone = 0; gone < 3; ++gone)
+        EXPECT_TRUE(rig_->waitForDrop());
+    EXPECT_EQ(rig_->client("late")->textAt("/kept/0/_/watchers"), "[]");
+    slow_->connection().resume();
+    EXPECT_TRUE(slow_->waitForEnd());
+}
+
+TEST_F(StalledWatcher, MissesWhatIsCountedUnderTheDropPolicy) {
+    run(VOX_OVERFLOW_DROP);
+    const vox::connection serverEnd = this->serverEnd();
+    EXPECT_GT(serverEnd.statistics().messages_dropped, 0U);
+    slow_->connection().resume();
+    // What waited for it has left; then there is room for one more.
+    Event drained;
+    serverEnd.send_barrier(dispatch::block<void()>([&drained] { drained.signal(); }));
+    ASSERT_TRUE(drained.wait());
+    const std::size_t delivered = slow_->takeMessages().size();
+    const vox_statistics_t statistics = serverEnd.statistics();
+    EXPECT_EQ(delivered + statistics.messages_dropped, std::size_t{kWindows * kWindow});
+    EXPECT_EQ(slow_->connection().statistics().peer_dropped, statistics.messages_dropped);
+    // It is a watcher like others again.
+    const auto late = rig_->client("late");
+    late->send(Operation::kSet, "/kept/0", vox::string("after"));
+    EXPECT_EQ(late->get("/kept/0").text(), "after");
+    EXPECT_EQ(slow_->takeMessages(), (Texts{"notify slow /kept/0 \"after\""}));
 }
 
 }  // namespace

@@ -1,8 +1,5 @@
 #include "plr/rest/map_resource.h"
 
-#include <map>
-#include <optional>
-
 #include "support/module_client.h"
 #include "support/raw_rest_client.h"
 
@@ -56,17 +53,17 @@ TEST_F(Map, HandlesTheseMessagesOnly) {
     const struct {
         const char* path;
         const char* got;      // "" where a GET is not answered
-        const char* handled;  // of GET, SET (to null), PUSH, POP and NOTIFY
+        const char* handled;  // of GET, PUSH, POP, SET (to null) and NOTIFY
         Texts pushNews;
     } rows[] = {
         {"map", R"({"k": {"part": 5}})", "get push pop ", whole},
         {"/map/*", R"({"k": {"part": 5}})", "get ", {}},
         {"/map/_/watchers", "[]", "get ", {}},
-        {"map/k", R"({"part": 5})", "get set push pop ", ofK},
-        {"/map/k@", R"({"part": 5})", "get set push pop ", ofK},
+        {"map/k", R"({"part": 5})", "get push pop set ", ofK},
+        {"/map/k@", R"({"part": 5})", "get push pop set ", ofK},
         {"/map/k@part", "5", "get ", {}},
         {"/map/k@part.more", "null", "get ", {}},
-        {"/map/new", "null", "get set push pop ", {"notify me /map/new null"}},
+        {"/map/new", "null", "get push pop set ", {"notify me /map/new null"}},
         {"/map/new@part", "null", "get ", {}},
         {"/map/k/_/watchers", "[]", "get ", {}},
         {"/map/new/_/watchers", "[]", "get ", {}},
@@ -79,17 +76,9 @@ TEST_F(Map, HandlesTheseMessagesOnly) {
     };
     for (const auto& row : rows) {
         SCOPED_TRACE(row.path);
-        std::string handled;
-        for (const Operation operation : {Operation::kGet, Operation::kSet, Operation::kPush,
-                                          Operation::kPop, Operation::kNotify}) {
-            send(*client_, operation, row.path);
-            if (rig_.queue().sync([this] { return map_->handled; }))
-                handled += plr::rest::asString(operation) + std::string(" ");
-            if (operation == Operation::kSet)
-                set(*client_, "/map/k", valueOfK());
-        }
-        EXPECT_EQ(handled, row.handled);
+        EXPECT_EQ(rig_.handledBy(*map_, *client_, row.path), row.handled);
         EXPECT_EQ(news(), row.pushNews);
+        set(*client_, "/map/k", valueOfK());
         if (*row.got) {
             EXPECT_EQ(get(row.path), row.got);
         }
@@ -103,24 +92,15 @@ TEST_F(Map, WatchersHearOfEveryChangeOnceUntilTheyPop) {
     send(*client_, Operation::kPush, "/map/new");
     news();
     const auto other = rig_.registeredClient("other");
-    const struct {
-        vox::object value;
-        Texts news;
-    } rows[] = {
-        {vox::int64(1),
-         {"notify me /map/new 1",
-          R"(notify me /map {"whole": false,"set": {"new": 1},"removed": []})"}},
-        {vox::int64(1),
-         {"notify me /map/new 1",
-          R"(notify me /map {"whole": false,"set": {"new": 1},"removed": []})"}},
-        {nullptr,
-         {"notify me /map/new null",
-          R"(notify me /map {"whole": false,"set": {},"removed": [0: "new"]})"}},
-        {nullptr, {}},
-    };
-    for (const auto& row : rows) {
-        set(*other, "map/new", row.value);
-        EXPECT_EQ(news(), row.news);
+    const Texts ofOne = {"notify me /map/new 1",
+                         R"(notify me /map {"whole": false,"set": {"new": 1},"removed": []})"};
+    const Texts ofNone = {"notify me /map/new null",
+                          R"(notify me /map {"whole": false,"set": {},"removed": [0: "new"]})"};
+    const std::pair<vox::object, Texts> rows[] = {
+        {vox::int64(1), ofOne}, {vox::int64(1), ofOne}, {nullptr, ofNone}, {nullptr, {}}};
+    for (const auto& [value, expected] : rows) {
+        set(*other, "map/new", value);
+        EXPECT_EQ(news(), expected);
     }
     EXPECT_EQ(get("/map/_/watchers") + get("/map/new/_/watchers"), R"([0: "me"][0: "me"])");
     send(*client_, Operation::kPop, "/map/new");
@@ -136,10 +116,7 @@ TEST_F(Map, AnOwnersEntriesAreItsOwnAndGoWithItInOneChange) {
     auto owner = rig_.registeredClient("owner");
     const auto stranger = rig_.client("stranger");
     const auto service = [this](const char* path, const vox::object& value) {
-        rig_.queue().sync([&] {
-            const vox::dict message = client_->message(Operation::kSet, path, value);
-            rig_.server().handleRestMessage({}, message);
-        });
+        EXPECT_TRUE(rig_.handleOwn(client_->message(Operation::kSet, path, value)));
     };
     set(*owner, "/owned/a", vox::int64(1));
     set(*owner, "/owned/b", vox::int64(2));
@@ -217,29 +194,33 @@ bool tell(MapRestResource& map, Operation operation, const std::string& path, co
 }
 
 TEST(MapLimits, HoldForEntriesAndForWatchedKeysUntilTheyGo) {
+    using enum Operation;
     MapRestResource map(2);
     auto client = std::make_shared<FakeRestConnection>("client");
-    for (const char* key : {"/map/a", "/map/b"}) {
-        EXPECT_TRUE(tell(map, Operation::kPush, key, client));
-        EXPECT_TRUE(tell(map, Operation::kPush, key, client));
-    }
-    EXPECT_FALSE(tell(map, Operation::kPush, "/map/c", client));
-    EXPECT_TRUE(tell(map, Operation::kPop, "/map/b", client));
-    EXPECT_TRUE(tell(map, Operation::kPush, "/map/c", client));
+    const auto expect = [&](bool accepted, Operation operation, const char* path, int value = 0) {
+        const vox::object sent = value == 0 ? vox::object() : vox::int64(value);
+        EXPECT_EQ(tell(map, operation, path, client, sent), accepted)
+            << asString(operation) << " " << path;
+    };
+    for (const char* key : {"/map/a", "/map/a", "/map/b", "/map/b"})
+        expect(true, kPush, key);
+    expect(false, kPush, "/map/c");
+    expect(true, kPop, "/map/b");
+    expect(true, kPush, "/map/c");
     // Watched keys do not take the place of entries.
-    EXPECT_TRUE(tell(map, Operation::kSet, "/map/x", client, vox::int64(1)));
-    EXPECT_TRUE(tell(map, Operation::kSet, "/map/a", client, vox::int64(1)));
-    EXPECT_FALSE(tell(map, Operation::kSet, "/map/c", client, vox::int64(1)));
-    EXPECT_TRUE(tell(map, Operation::kSet, "/map/a", client, vox::int64(2)));
-    EXPECT_TRUE(tell(map, Operation::kSet, "/map/x", client));
-    EXPECT_TRUE(tell(map, Operation::kSet, "/map/c", client, vox::int64(1)));
+    expect(true, kSet, "/map/x", 1);
+    expect(true, kSet, "/map/a", 1);
+    expect(false, kSet, "/map/c", 1);
+    expect(true, kSet, "/map/a", 2);
+    expect(true, kSet, "/map/x");
+    expect(true, kSet, "/map/c", 1);
 
     client = std::make_shared<FakeRestConnection>("next");
-    EXPECT_FALSE(tell(map, Operation::kPush, "/map/d", client));
-    FakeRestContext context(Operation::kNone);
+    expect(false, kPush, "/map/d");
+    FakeRestContext context(kNone);
     map.cleanupWatchers(context, PathView("/map"));
-    EXPECT_TRUE(tell(map, Operation::kPush, "/map/d", client));
-    EXPECT_TRUE(tell(map, Operation::kPush, "/map/e", client));
+    expect(true, kPush, "/map/d");
+    expect(true, kPush, "/map/e");
 }
 
 TEST(MapDrop, TellsWhoWentNothing) {

@@ -2,12 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <array>
-#include <cstdint>
-#include <memory>
-#include <string>
-#include <vector>
-
 #include "plr/rest/auto_reply.h"
 #include "plr/rest/value_coding.h"
 #include "plr/test/fake_rest.h"

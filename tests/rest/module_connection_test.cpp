@@ -1,9 +1,9 @@
 #include <limits>
-#include <optional>
 
 #include "support/module_client.h"
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
+#include "support/scripted_resource.h"
 
 // A module that connects by itself, requests with an honest result, and values as
 // types.
@@ -15,7 +15,6 @@ using plr::ReconnectPolicy;
 using plr::RestModule;
 using plr::rest::Operation;
 using plr::rest::PathView;
-using plr::rest::RestResourceContext;
 
 constexpr const char* kName = "net.example.rest";
 constexpr ReconnectPolicy kQuick{1ms, 2ms};
@@ -58,54 +57,40 @@ class Client : public ModuleClient {
             note(label + " " + oneLine(value));
         };
     }
+    void noteConnections() {
+        module.setConnectionHandler(
+            [this](bool isReached) { note(isReached ? "reached" : "lost"); });
+    }
 
   private:
     Event noted_;
     Texts notes_;  // touched on the queue only
 };
 
-// A service with one property, played by hand: it refuses every GET.
+// A service with one property. It refuses every GET, and ends with its last client.
 class Service {
   public:
-    explicit Service(int x) : x_(vox::int64(x)) {
-        listener_.set_target_queue(queue_);
-        listener_.set_event_handler([this](const vox::object& event) {
-            if (const vox::connection client(event); client)
-                accept(client);
-        });
-        listener_.resume();
+    explicit Service(int x) {
+        const auto push = [this, x](auto& context, auto&&) {
+            client_ = context.getRawAuthorConnection();
+            return context.sendNotify(*context.getAuthorResource(), {}, vox::string("/x"),
+                                      vox::int64(x));
+        };
+        rig_.add("/x", std::make_shared<ScriptedResource>(nullptr, push));
+        rig_.server().setAccessRules({{.path = "/", .operations = {Operation::kGet}}});
+        rig_.start();
     }
     ~Service() {
-        queue_.sync([this] {
-            listener_.cancel();
-            for (const vox::connection& client : clients_)
-                client.cancel();
-        });
-        drain(queue_);
+        rig_.listener().cancel();
+        rig_.queue().sync([this] { client_.cancel(); });
+        rig_.stop();
     }
     Service(const Service&) = delete;
     Service& operator=(const Service&) = delete;
 
   private:
-    void accept(const vox::connection& client) {
-        clients_.push_back(client);
-        client.set_target_queue(queue_);
-        client.set_event_handler([this, client](const vox::object& event) {
-            const vox::dict message(event);
-            if (const vox::dict reply = plr::rest::createReply(message)) {
-                plr::rest::updateReplyValue(reply, vox::error(VOX_ERROR_APPLICATION, "no"));
-                client.send_message(reply);
-            } else if (message.text("r") == "/x") {
-                client.send_message(plr::rest::createNotify({}, message["r"], x_));
-            }
-        });
-        client.resume();
-    }
-
-    const vox::object x_;
-    const dispatch::queue queue_ = dispatch::queue::create("service");
-    const vox::listener listener_ = vox::listener::create(kName);
-    std::vector<vox::connection> clients_;  // touched on the queue only
+    RestServerRig rig_{vox::listener::create(kName)};
+    vox::connection client_;  // touched on the server's queue only
 };
 
 TEST(AutomaticReconnection, FollowsItsServiceUntilItIsToldNotTo) {
@@ -114,8 +99,7 @@ TEST(AutomaticReconnection, FollowsItsServiceUntilItIsToldNotTo) {
     Event failed;
     client.on([&] {
         client.module.setServerErrorHandler([&](const vox::object&) { failed.signal(); });
-        client.module.setConnectionHandler(
-            [&](bool isReached) { client.note(isReached ? "reached" : "lost"); });
+        client.noteConnections();
         client.module.watch<int>(
             "/x", [&](std::optional<int> x) { client.note(x ? std::to_string(*x) : "none"); });
         client.module.connectToService(kName, kQuick);
@@ -134,48 +118,31 @@ TEST(AutomaticReconnection, FollowsItsServiceUntilItIsToldNotTo) {
     });
 }
 
-TEST(AutomaticReconnection, EndsWithTheNextConnection) {
-    const RuntimeDirectory directory;
-    auto [mine, theirs] = vox::connection::create_pair();
-    RawRestClient server(theirs, "server");
-    Client client;
-    Event waited;
-    client.on([&, mine = mine] {
-        client.module.setServerErrorHandler([&, mine](const vox::object&) {
-            client.module.connect(mine);  // an attempt is due in 2 ms at most
-            client.queue.after(dispatch::time::after(20ms),
-                               dispatch::block<void()>([&] { waited.signal(); }));
-        });
-        client.module.connectToService(kName, kQuick);
-    });
-    ASSERT_TRUE(waited.wait());
-    client.on([&] {
-        EXPECT_TRUE(client.module.isConnected());
-        client.module.setServerErrorHandler(RestModule::Handler());
-    });
-    EXPECT_EQ(server.takeMessagesBefore(plr::rest::createPingMessage()),
-              (Texts{"push me /connections null"}));
-}
-
-TEST(AutomaticReconnection, FollowsOnlyTheServiceThatWasNamedLast) {
+TEST(AutomaticReconnection, EndsWithTheNextConnectionOrName) {
     const RuntimeDirectory directory;
     const Service service(7);
-    Client client;
-    Event waited;
-    client.on([&] {
-        client.module.setConnectionHandler(
-            [&](bool isReached) { client.note(isReached ? "reached" : "lost"); });
-        client.module.setServerErrorHandler([&](const vox::object&) {
-            client.module.connectToService(kName, kQuick);  // an attempt at the other is due
-            client.queue.after(dispatch::time::after(20ms),
-                               dispatch::block<void()>([&] { waited.signal(); }));
+    for (const bool isByName : {true, false}) {
+        Event waited;
+        Client client;
+        client.on([&] {
+            client.noteConnections();
+            client.module.setServerErrorHandler([&](const vox::object&) {
+                client.note("failed");  // and an attempt at the other is due
+                if (isByName)
+                    client.module.connectToService(kName, kQuick);
+                else
+                    client.module.connect(vox::connection::create(kName));
+                client.queue.after(dispatch::time::after(20ms),
+                                   dispatch::block<void()>([&] { waited.signal(); }));
+            });
+            client.module.connectToService("net.example.missing", kQuick);
         });
-        client.module.connectToService("net.example.missing", kQuick);
-    });
-    ASSERT_TRUE(waited.wait());
-    // Answered behind all that was asked before.
-    client.on([&] { client.module.sendRawGet("", [&](auto&&) { client.note("answered"); }); });
-    EXPECT_EQ(client.next(2), (Texts{"reached", "answered"}));
+        ASSERT_TRUE(waited.wait());
+        // Answered behind all that was asked before.
+        client.on([&] { client.module.sendRawGet("", [&](auto&&) { client.note("answered"); }); });
+        EXPECT_EQ(client.next(isByName ? 3 : 2), isByName ? (Texts{"failed", "reached", "answered"})
+                                                          : (Texts{"failed", "answered"}));
+    }
 }
 
 TEST(AutomaticReconnection, RefusesAPolicyThatMakesNoSense) {
@@ -214,24 +181,20 @@ TEST(AutomaticReconnection, TakesNoValueFromAConnectionThatWasReplaced) {
 // ---- Requests ---------------------------------------------------------------------------
 
 // Answers with what it is sent or with nothing, refuses, or keeps the request.
-class Answers : public plr::rest::RestResource {
-  public:
-    bool handleRestMessage_GET(RestResourceContext& context, const PathView& path) override {
+std::shared_ptr<plr::rest::RestResource> answers() {
+    using Kept = std::vector<std::shared_ptr<vox::object>>;
+    const auto kept = std::make_shared<Kept>();
+    return std::make_shared<ScriptedResource>([kept](auto& context, const PathView& path) {
         if (path.current() == "echo")
             return context.sendReplyWithValue(context.getRestValue());
         if (path.current() == "refusal")
             return context.sendReplyWithValue(vox::error(VOX_ERROR_APPLICATION, "not now"));
-        if (path.current() == "nothing") {
-            context.takeAutoReplyValue().reset();
-            return true;
-        }
-        unanswered_.push_back(context.takeAutoReplyValue());
+        const auto reply = context.takeAutoReplyValue();
+        if (path.current() != "nothing")
+            kept->push_back(reply);
         return true;
-    }
-
-  private:
-    std::vector<std::shared_ptr<vox::object>> unanswered_;
-};
+    });
+}
 
 std::string asText(const plr::Result<vox::object>& result) {
     if (result)
@@ -245,7 +208,7 @@ std::string asText(const plr::Result<vox::object>& result) {
 
 TEST(ModuleRequest, GivesAValueOrTellsWhyThereIsNone) {
     RestServerRig rig;
-    rig.add("/a", std::make_shared<Answers>());
+    rig.add("/a", answers());
     rig.start();
     Client client;
     const auto ask = [&](const char* path, std::chrono::milliseconds limit) {
@@ -261,10 +224,15 @@ TEST(ModuleRequest, GivesAValueOrTellsWhyThereIsNone) {
     client.on([&] { client.module.connect(rig.connect()); });
     ask("/a/echo", kBound);
     EXPECT_EQ(client.next(1), (Texts{"5"}));
-    for (const char* path : {"/a/echo", "/a/nothing"}) {
-        client.on([&] { client.module.sendRequest(path, vox::int64(5), client.noting("value")); });
-    }
-    EXPECT_EQ(client.next(2), (Texts{"value 5", "value null"}));
+    client.on([&] {
+        for (const char* path : {"/a/echo", "/a/nothing"})
+            client.module.sendRequest(path, vox::int64(5), client.noting("value"));
+        for (const char* path : {"/a/echo", "/a/refusal"})
+            client.module.sendRawGet(path, client.noting("raw"));
+    });
+    EXPECT_EQ(client.next(4),
+              (Texts{"value 5", "value null", R"(raw {"o": "get","r": "/a/echo","v": null})",
+                     R"(raw {"o": "get","r": "/a/refusal","e": "not now"})"}));
     ask("/a/refusal", kBound);
     EXPECT_EQ(client.next(1), (Texts{"1000 not now"}));
     ask("/a/silence", 1ms);
@@ -280,32 +248,12 @@ TEST(ModuleRequest, GivesAValueOrTellsWhyThereIsNone) {
             "/a/silence", {}, kBound,
             Block([&](const plr::Result<vox::object>& result) { client.note(asText(result)); }));
         client.module.sendRequest("/a/silence", {}, kBound, RestModule::ResultHandler());
-    });
-    server.connection().cancel();
-    EXPECT_EQ(client.next(1)[0].substr(0, 2), "1 ");
-}
-
-TEST(ModuleRequest, HandsTheWholeReplyToARawGet) {
-    RestServerRig rig;
-    rig.add("/a", std::make_shared<Answers>());
-    rig.start();
-    Client client;
-    client.on([&] {
-        client.module.connect(rig.connect());
-        for (const char* path : {"/a/echo", "/a/refusal"})
-            client.module.sendRawGet(path, client.noting("raw"));
-    });
-    EXPECT_EQ(client.next(2), (Texts{R"(raw {"o": "get","r": "/a/echo","v": null})",
-                                     R"(raw {"o": "get","r": "/a/refusal","e": "not now"})"}));
-    auto [mine, theirs] = vox::connection::create_pair();
-    RawRestClient server(theirs, "server");
-    client.on([&, mine = mine] {
-        client.module.connect(mine);
         client.module.sendRawGet(
             "/", [&](const vox::object& reply) { client.note(vox_type_get_name(reply.type())); });
     });
     server.connection().cancel();
-    EXPECT_EQ(client.next(1), (Texts{"error"}));
+    const Texts ends = client.next(2);
+    EXPECT_EQ(ends[0].substr(0, 2) + ends[1], "1 error");
 }
 
 // ---- Typed values -----------------------------------------------------------------------
@@ -313,14 +261,10 @@ TEST(ModuleRequest, HandsTheWholeReplyToARawGet) {
 template <class T>
 std::string read(const vox::object& value) {
     const std::optional<T> read = plr::rest::valueAs<T>(value);
-    if (!read)
-        return "-";
-    if constexpr (std::is_same_v<T, std::string>)
-        return *read;
-    else if constexpr (std::is_arithmetic_v<T>)
-        return std::to_string(*read);
+    if constexpr (std::is_arithmetic_v<T>)
+        return read ? std::to_string(*read) : "-";
     else
-        return "some";
+        return read.value_or("-");
 }
 
 TEST(TypedValue, TakesWhatFitsOnly) {
@@ -352,7 +296,7 @@ TEST(TypedValue, TakesWhatFitsOnly) {
                                   read<std::string>(row.value)};
         EXPECT_TRUE(std::equal(std::begin(as), std::end(as), row.as))
             << oneLine(row.value) << ": " << testing::PrintToString(as);
-        EXPECT_EQ(read<vox::object>(row.value), row.value ? "some" : "-");
+        EXPECT_EQ(plr::rest::valueAs<vox::object>(row.value).has_value(), bool(row.value));
     }
     EXPECT_EQ(plr::rest::valueAs<std::vector<std::uint8_t>>(vox::data(bytes)),
               (std::vector<std::uint8_t>{1, 2}));

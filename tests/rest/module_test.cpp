@@ -2,8 +2,6 @@
 
 #include <gmock/gmock.h>
 
-#include <optional>
-
 #include "support/raw_rest_client.h"
 
 // What a module sends, what it does with what it gets, and what happens when its
@@ -29,6 +27,7 @@ class Module : public testing::Test {
     auto on(Callable&& work) {
         return queue_.sync(std::forward<Callable>(work));
     }
+    static void ignore(const vox::object&, const Reply&) {}
     // A new server at the other end; the connection for the module.
     vox::connection newServer() {
         auto [mine, theirs] = vox::connection::create_pair();
@@ -66,10 +65,11 @@ class Module : public testing::Test {
 
 TEST_F(Module, RestoresRegistrationsInOrder) {
     on([this] {
+        module_->setProperty("/lost", vox::int64(0));
         module_->observeProperty("/b", remember("b"));
         module_->observeEvent("/a", remember("a"));
-        module_->registerAsRequestSink("/z", RestModule::RequestHandler([](auto&&...) {}));
-        module_->registerAsRequestSink("/y", RestModule::RequestHandler([](auto&&...) {}));
+        module_->registerAsRequestSink("/z", RestModule::RequestHandler(ignore));
+        module_->registerAsRequestSink("/y", RestModule::RequestHandler(ignore));
         EXPECT_FALSE(module_->isConnected());
     });
     connect();
@@ -86,11 +86,17 @@ TEST_F(Module, RestoresRegistrationsInOrder) {
     const Texts rest = {"push me /connections null", "push me /z null", "push me /b null"};
     connect();
     EXPECT_EQ(heard(), rest);
-    // A second connection in place of the first.
+    // A second connection in place of the first, and one that cannot be.
     const auto first = std::move(server_);
     connect();
     EXPECT_TRUE(first->waitForEnd());
     EXPECT_EQ(heard(), rest);
+    on([this] {
+        EXPECT_THAT([this] { module_->connect(vox::connection()); },
+                    testing::ThrowsMessage<std::invalid_argument>(
+                        "RestModule::connect cannot be called with a null connection"));
+        EXPECT_TRUE(module_->isConnected());
+    });
 }
 
 TEST_F(Module, ObservingAgainKeepsTheFirstHandler) {
@@ -170,38 +176,37 @@ TEST_F(Module, DropsWhatItDoesNotKnow) {
             calls_.push_back(reply ? "request" : "request without reply");
         });
     });
-    const auto odd = [this](const char* key, const vox::object& value) {
-        const vox::dict message = server_->message(Operation::kNotify, "/p");
-        message[key] = value;
-        return message;
+    const auto message = [](const vox::object& operation, const vox::object& path) {
+        return plr::rest::createRestMessage(operation, nullptr, path, nullptr);
     };
+    const vox::object get = vox::string("get"), notify = vox::string("notify");
+    const vox::object p = vox::string("/p"), r = vox::string("/r");
     const vox::dict messages[] = {
-        server_->message(Operation::kNotify, "/unknown"),
-        server_->message(Operation::kNotify, "/p/"),
-        server_->message(Operation::kNotify, ""),
-        server_->message(Operation::kGet, ""),
-        server_->message(Operation::kGet, "/p"),
-        server_->message(Operation::kSet, "/p"),
-        server_->message(Operation::kPush, "/r"),
-        odd("o", vox::int64(5)),
-        odd("o", nullptr),
-        odd("r", vox::int64(5)),
-        odd("r", vox::dict::create()),
+        message(notify, vox::string("/unknown")),
+        message(notify, vox::string("/p/")),
+        message(notify, vox::string(std::string())),
+        message(get, vox::string(std::string())),
+        message(get, p),
+        message(vox::string("set"), p),
+        message(vox::string("push"), r),
+        message(vox::int64(5), p),
+        message(nullptr, p),
+        message(notify, vox::int64(5)),
+        message(notify, vox::dict::create()),
         vox::dict::create(),
     };
-    for (const vox::dict& message : messages)
-        tell(message);
+    for (const vox::dict& dropped : messages)
+        tell(dropped);
     EXPECT_EQ(calls(), Texts());
-    tell(server_->message(Operation::kGet, "/r"));
+    tell(message(get, r));
     const vox::dict bare = vox::dict::create();
-    bare["o"] = vox::string("notify");
-    bare["r"] = vox::string("/p");
+    bare["o"] = notify;
+    bare["r"] = p;
     tell(bare);
     EXPECT_EQ(calls(), (Texts{"request without reply", "p null"}));
 }
 
 TEST_F(Module, SendsWhatItIsTold) {
-    on([this] { module_->setProperty("/lost", vox::int64(0)); });
     connect();
     heard();
     on([this] {
@@ -268,16 +273,6 @@ TEST_F(Module, LearnsOfTheServersEndAndMayConnectAgain) {
     ASSERT_TRUE(reconnected.wait());
     EXPECT_EQ(heard(), (Texts{"push me /connections null", "push me /p null"}));
     on([&] { module_->setServerErrorHandler(RestModule::Handler()); });
-}
-
-TEST_F(Module, RefusesToConnectToNothing) {
-    connect();
-    on([this] {
-        EXPECT_THAT([this] { module_->connect(vox::connection()); },
-                    testing::ThrowsMessage<std::invalid_argument>(
-                        "RestModule::connect cannot be called with a null connection"));
-        EXPECT_TRUE(module_->isConnected());
-    });
 }
 
 TEST_F(Module, DropsCallbacksWhenItGoes) {

@@ -1,12 +1,4 @@
-#include <gtest/gtest.h>
-
-#include <chrono>
-#include <cstdint>
 #include <limits>
-#include <memory>
-#include <string>
-#include <string_view>
-#include <vector>
 
 #include "support/raw_rest_client.h"
 #include "support/vox_values.h"
@@ -102,10 +94,9 @@ TEST_F(OddClients, EveryKeyMayHoldAnythingAndNoneNeedBeThere) {
     }
     for (int present = 0; present < 16; ++present) {
         const vox::dict message = odd_->message(Operation::kGet, "/kept/x");
-        const char* const keys[] = {"o", "a", "r", "v"};
         for (int i = 0; i < 4; ++i)
             if (present >> i & 1)
-                vox_dictionary_set_value(message.get(), keys[i], nullptr);
+                vox_dictionary_set_value(message.get(), std::array{"o", "a", "r", "v"}[i], nullptr);
         send(message);
     }
 }

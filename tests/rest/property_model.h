@@ -1,16 +1,9 @@
 #pragma once
 
-#include <map>
-#include <memory>
 #include <set>
-#include <string>
-#include <vector>
 
-#include "plr/ipc/array.h"
-#include "plr/ipc/dict.h"
-#include "plr/ipc/values.h"
-#include "plr/rest/operation.h"
-#include "plr/rest/resource_connection.h"
+#include "plr/ipc/read.h"
+#include "plr/test/fake_rest.h"
 
 // What a property resource does, written down a second time, in text: what each
 // step answers, and notifies to whom and in which order.
@@ -20,37 +13,15 @@ using plr::rest::Operation;
 using Connection = std::shared_ptr<plr::rest::RestResourceConnection>;
 using Texts = std::vector<std::string>;
 
-// Null, a number N, or {"k": [N, N + 1]}.
-struct Value {
-    int number = 0;
-    enum { kNull, kNumber, kDictionary } type = kNull;
-
-    [[nodiscard]] vox::object object() const {
-        if (type != kDictionary)
-            return type == kNumber ? vox::int64(number) : vox::object();
-        const vox::dict dictionary = vox::dict::create();
-        const vox::array list = vox::array::create();
-        list.append(vox::int64(number));
-        list.append(vox::int64(number + 1));
-        dictionary["k"] = list;
-        return dictionary;
-    }
-    [[nodiscard]] std::string list() const {
-        return "[0: " + std::to_string(number) + ",1: " + std::to_string(number + 1) + "]";
-    }
-    [[nodiscard]] std::string text() const {
-        if (type == kDictionary)
-            return R"({"k": )" + list() + "}";
-        return type == kNumber ? std::to_string(number) : "null";
-    }
-    [[nodiscard]] std::string part(const std::string& subpath) const {
-        if (subpath.empty())
-            return text();
-        if (type != kDictionary || (subpath != "k" && subpath != "k.1"))
-            return "null";
-        return subpath == "k" ? list() : std::to_string(number + 1);
-    }
-};
+// {"k": [number, number + 1]}
+inline vox::dict partsOf(const vox::object& number) {
+    const vox::array list = vox::array::create();
+    list.append(number);
+    list.append(vox::int64(vox::dyn_cast_or_default(number, 0LL) + 1));
+    const vox::dict parts = vox::dict::create();
+    parts["k"] = list;
+    return parts;
+}
 
 inline std::string listOf(const Texts& names) {
     std::string list;
@@ -72,13 +43,35 @@ enum class Kind {
     Unknown
 };
 
+// What stands behind the resource's path.
+struct Path {
+    Kind kind;
+    std::string text;
+    std::string name = {}, subpath = {};  // of the property
+};
+
+inline const Path kRootPaths[] = {
+    {Kind::Root, ""},
+    {Kind::Meta, "/_"},
+    {Kind::MetaWatchers, "/_/watchers"},
+    {Kind::MetaWatched, "/_/watched"},
+    {Kind::MetaWatchedMetaWatchers, "/_/watched/_/watchers"},
+    {Kind::DumpState, "/*"},
+    {Kind::Unknown, "/_/other"},
+    {Kind::Unknown, "/_/watchers/x"},
+    {Kind::Unknown, "/_/watched/x"},
+    {Kind::Unknown, "/_/watched/_"},
+    {Kind::Unknown, "/_/watched/_/watchers/x"},
+    {Kind::Unknown, "/*/x"},
+};
+
 struct Step {
     Operation operation;
     Kind kind;
     std::string base;           // the resource's path, as this message spells it
     std::string name, subpath;  // of the property
     std::string path;           // all of it
-    Value value;
+    vox::object value;
     bool isCleanup = false;  // of those who went, in place of a message
 };
 
@@ -122,7 +115,7 @@ class Model {
     };
     struct Property {
         Watchers watchers;
-        Value value;
+        vox::object value;
     };
 
     [[nodiscard]] std::string answer() const {
@@ -142,7 +135,7 @@ class Model {
             case Kind::DumpState:
                 return dump();
             case Kind::Resource:
-                return known && keepsValues_ ? found->second.value.part(step_->subpath) : "null";
+                return known ? part(found->second.value) : "null";
             case Kind::ResourceMeta:
                 return R"([0: "watchers"])";
             case Kind::ResourceWatchers:
@@ -151,6 +144,12 @@ class Model {
                 break;
         }
         return "null";
+    }
+    [[nodiscard]] std::string part(const vox::object& value) const {
+        if (step_->subpath.empty())
+            return oneLine(value);
+        const bool isNoIndex = step_->subpath == "k.word";
+        return isNoIndex ? "null" : oneLine(vox::get_subpath(value, step_->subpath));
     }
     bool get() {
         lines_.push_back("answer " + answer());
@@ -165,7 +164,7 @@ class Model {
         Property& property = make();
         if (keepsValues_)
             property.value = step_->value;
-        notify(property.watchers, propertyPath(), step_->value.text());
+        notify(property.watchers, propertyPath(), oneLine(step_->value));
         return true;
     }
 
@@ -190,7 +189,7 @@ class Model {
         if (!hadWatchers)
             notifyWatched();
         if (keepsValues_)
-            notifyOne(author_->name(), propertyPath(), property.value.text());
+            notifyOne(author_->name(), propertyPath(), oneLine(property.value));
     }
 
     bool pop() {
@@ -250,7 +249,8 @@ class Model {
         std::string entries;
         for (const auto& [name, property] : properties_)
             if (!name.empty())
-                entries += (entries.empty() ? "\"" : ",\"") + name + "\": " + property.value.text();
+                entries +=
+                    (entries.empty() ? "\"" : ",\"") + name + "\": " + oneLine(property.value);
         return '{' + entries + '}';
     }
 

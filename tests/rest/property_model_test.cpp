@@ -2,8 +2,6 @@
 // answered and notified, to whom and in which order, is the same at every step.
 #include <gtest/gtest.h>
 
-#include <array>
-#include <cstdint>
 #include <random>
 
 #include "plr/rest/property_resource.h"
@@ -63,23 +61,10 @@ class PropertyModel : public testing::TestWithParam<bool> {
                                                  "__", "*y", "z", ""};
         static constexpr const char* kSubpaths[] = {"", "k", "k.1", "k.word", "none"};
         static constexpr const char* kTails[] = {"", "", "", "/other", "/_/other", "/_/watchers/y"};
-        static constexpr std::pair<Kind, const char*> kMeta[] = {
-            {Kind::Root, ""},
-            {Kind::Meta, "/_"},
-            {Kind::MetaWatchers, "/_/watchers"},
-            {Kind::MetaWatched, "/_/watched"},
-            {Kind::MetaWatchedMetaWatchers, "/_/watched/_/watchers"},
-            {Kind::DumpState, "/*"},
-            {Kind::Unknown, "/_/other"},
-            {Kind::Unknown, "/_/watchers/x"},
-            {Kind::Unknown, "/_/watched/x"},
-            {Kind::Unknown, "/_/watched/_"},
-            {Kind::Unknown, "/_/watched/_/watchers/x"},
-            {Kind::Unknown, "/*/x"}};
         if (below(3) == 0) {
-            const auto& [kind, text] = oneOf(kMeta);
-            step.kind = kind;
-            return text;
+            const Path& path = oneOf(kRootPaths);
+            step.kind = path.kind;
+            return path.text;
         }
         step.name = oneOf(kNames);
         // New ones now and then, for as long as it goes.
@@ -102,15 +87,15 @@ class PropertyModel : public testing::TestWithParam<bool> {
             Operation::kPush, Operation::kPush, Operation::kPop, Operation::kNotify};
         Step step{
             oneOf(kOperations), Kind::Root, below(4) == 0 ? "in/tree" : "/kept", {}, {}, {}, {}};
+        const vox::object number = vox::int64(below(4));  // the same one comes often
         step.path = step.base + randomRest(step) + (below(16) == 0 ? "/" : "");
-        step.value.number = static_cast<int>(below(4));  // the same one comes often
-        step.value.type = oneOf(std::array{Value::kNull, Value::kNumber, Value::kDictionary});
+        step.value = oneOf(std::array<vox::object, 3>{{{}, number, partsOf(number)}});
         step.isCleanup = below(128) == 0;
         return step;
     }
 
     Outcome applyToResource(const Step& step, const Connection& author) {
-        FakeRestContext context(step.operation, step.value.object(), author);
+        FakeRestContext context(step.operation, step.value, author);
         PathView path(step.path);
         path.advance(step.base.front() == '/' ? 1 : 2);
         sent_.clear();
@@ -152,7 +137,7 @@ TEST_P(PropertyModel, TheResourceDoesWhatItsModelDoes) {
         ASSERT_TRUE(seen == expected)
             << "seed " << kSeed << ", step " << number << ": "
             << (step.isCleanup ? "clean" : plr::rest::asObject(step.operation).text()) << ' '
-            << step.path << ' ' << step.value.text() << " by "
+            << step.path << ' ' << oneLine(step.value) << " by "
             << (author ? author->name() : "nobody") << "\nexpected " << expected.handled << ' '
             << testing::PrintToString(expected.lines) << "\nseen     " << seen.handled << ' '
             << testing::PrintToString(seen.lines);

@@ -1,20 +1,17 @@
-// A service that is restarted again and again under load, and clients that connect
-// to it by themselves. This program is also the service, when it is called with the
+// A service that is killed and restarted, also under load, and clients that connect
+// to it again. This program is also the service, when it is called with the
 // argument "service".
 #include <sys/mman.h>
 #include <sys/prctl.h>
 
-#include <algorithm>
-#include <array>
-#include <atomic>
 #include <condition_variable>
-#include <optional>
 
 #include "plr/rest.h"
 #include "plr/test/fake_rest.h"
 #include "support/module_client.h"
 #include "support/runtime.h"
 #include "support/sanitized.h"
+#include "support/scripted_resource.h"
 #include "support/service_process.h"
 #include "support/waiting.h"
 
@@ -22,10 +19,13 @@ namespace {
 
 using namespace plr::test;
 using namespace std::chrono_literals;
+using plr::RestModule;
 using plr::rest::AssertionHandle;
 using plr::rest::AssertionProvider;
 using plr::rest::AssertionState;
 using plr::rest::Operation;
+using plr::rest::PathView;
+using plr::rest::RestResourceContext;
 
 constexpr const char* kName = "net.example.rest";
 constexpr const char* kAssertion = "/assertions/busy";
@@ -52,12 +52,10 @@ class StoredProperties : public plr::rest::PropertyRestResource {
     explicit StoredProperties(Values& values) : PropertyRestResource(true), values_(values) {
         for (std::size_t i = 0; i < kProperties; ++i) {
             FakeRestContext context(Operation::kSet, vox::int64(values_[i]));
-            PropertyRestResource::handleRestMessage_SET(context,
-                                                        plr::rest::PathView(std::to_string(i)));
+            PropertyRestResource::handleRestMessage_SET(context, PathView(std::to_string(i)));
         }
     }
-    bool handleRestMessage_SET(plr::rest::RestResourceContext& context,
-                               const plr::rest::PathView& path) override {
+    bool handleRestMessage_SET(RestResourceContext& context, const PathView& path) override {
         const auto index = static_cast<std::size_t>(path.current()[0] - '0');
         values_.at(index) = vox::dyn_cast_or_default(context.getRestValue(), 0LL);
         return PropertyRestResource::handleRestMessage_SET(context, path);
@@ -66,6 +64,23 @@ class StoredProperties : public plr::rest::PropertyRestResource {
   private:
     Values& values_;
 };
+
+// Logs what is pushed. GET answers the log, or never where the path says so.
+std::shared_ptr<plr::rest::RestResource> log() {
+    const vox::array pushed = vox::array::create();
+    std::vector<std::shared_ptr<vox::object>> unanswered;
+    return std::make_shared<ScriptedResource>(
+        [pushed, unanswered](auto& context, const PathView& path) mutable {
+            if (path.current() != "silent")
+                return context.sendReplyWithValue(pushed);
+            unanswered.push_back(context.takeAutoReplyValue());
+            return true;
+        },
+        [pushed](auto&&, const PathView& path) {
+            pushed.append(vox::string(path.full()));
+            return true;
+        });
+}
 
 // Serves until SIGTERM, and then ends as services do.
 int serviceMain() {
@@ -79,6 +94,7 @@ int serviceMain() {
     server->registerResource("/connections", std::make_shared<plr::rest::ConnectionRestResource>());
     server->registerResource("/kept", std::make_shared<StoredProperties>(valuesIn(3)));
     server->registerResource("/assertions", std::make_shared<plr::rest::AssertionRestResource>());
+    server->registerResource("/log", log());
     server->connect(vox::listener::create(kName));
     std::puts("ready");
     std::fflush(stdout);
@@ -210,62 +226,120 @@ class Granter : ModuleClient {
     std::optional<AssertionProvider> provider_;
 };
 
-TEST(RestartedService, GivesEveryClientEveryValueAndNoneThatIsStale) {
-    const RuntimeDirectory directory;
-    const int memory = ::memfd_create("values", MFD_CLOEXEC);
-    ASSERT_EQ(::ftruncate(memory, sizeof(Values)), 0);
+class RestartedService : public testing::Test {
+  protected:
+    RestartedService() { EXPECT_EQ(::ftruncate(memory_, sizeof(Values)), 0); }
+    ~RestartedService() override { ::close(memory_); }
+    void start() { service_.emplace(std::vector<std::string>{"service"}, memory_); }
+
+    const RuntimeDirectory directory_;
+    const int memory_ = ::memfd_create("values", MFD_CLOEXEC);
+    std::optional<ServiceProcess> service_;
+};
+
+TEST_F(RestartedService, AnswersEachRequestOnceAndGetsItsRegistrationsBack) {
+    Event gone;
+    const ModuleClient client;
+    const auto connect = [&] {
+        client.on([&] { client.module.connect(vox::connection::create(kName)); });
+    };
+    const auto pushed = [&] {
+        Event answered;
+        vox::object answer;
+        client.on([&] {
+            client.module.getPropertyOnce("/log", [&](const vox::object& value) {
+                answer = value;
+                answered.signal();
+            });
+        });
+        EXPECT_TRUE(answered.wait());
+        return answer;
+    };
+    start();
+    client.on([&] {
+        const auto ignore = [](auto&&...) {};
+        client.module.setServerErrorHandler([&gone](const vox::object&) { gone.signal(); });
+        client.module.observeProperty("/log/b", RestModule::Handler(ignore));
+        client.module.observeProperty("/log/a", RestModule::Handler(ignore));
+        client.module.registerAsRequestSink("/log/2", RestModule::RequestHandler(ignore));
+        client.module.registerAsRequestSink("/log/1", RestModule::RequestHandler(ignore));
+    });
+    const vox::object inOrder =
+        vox::array(vox::array_creator()("/log/1")("/log/2")("/log/a")("/log/b"));
+    connect();
+    EXPECT_EQ(pushed(), inOrder);
+
+    std::vector<int> answers(100);  // touched on the client's queue only
+    client.on([&] {
+        for (int& count : answers)
+            client.module.getPropertyOnce("/log/silent", [&count](const vox::object& value) {
+                EXPECT_EQ(value, vox::object());
+                ++count;
+            });
+    });
+    EXPECT_EQ(pushed(), inOrder) << "the requests have arrived";
+    service_->kill();
+    ASSERT_TRUE(gone.wait());
+    client.on([&] {
+        EXPECT_FALSE(client.module.isConnected());
+        EXPECT_EQ(answers, std::vector<int>(100, 1));
+    });
+    connect();  // to nobody
+    ASSERT_TRUE(gone.wait());
+
+    start();
+    connect();
+    EXPECT_EQ(pushed(), inOrder);
+}
+
+TEST_F(RestartedService, GivesEveryClientEveryValueAndNoneThatIsStale) {
     Board board;
-    std::optional<ServiceProcess> service;
     Granter granter;
     Setter setter(board);
     std::vector<std::unique_ptr<Watcher>> watchers;
     for (std::size_t i = 0; i < kClients; ++i)
         watchers.push_back(std::make_unique<Watcher>(board, i));
 
-    service.emplace(std::vector<std::string>{"service"}, memory);
+    start();
     for (int restart = 0; restart < kRestarts; ++restart) {
         std::array<Board::Told, kClients> before;
         board.change([&] { before = board.clients; });
         if (restart % 2 == 0) {
-            service->kill();
+            service_->kill();
         } else {
-            ::kill(service->pid(), SIGTERM);
-            EXPECT_EQ(service->wait(), 0);
+            ::kill(service_->pid(), SIGTERM);
+            EXPECT_EQ(service_->wait(), 0);
         }
-        service.emplace(std::vector<std::string>{"service"}, memory);
+        start();
         // What is written from now on, on new connections, and granted there. Now and
         // then the service goes while most are on their way to it.
         std::int64_t old = 0;
         board.change([&] { old = board.written; });
         const std::size_t awaited = restart % 4 == 2 ? 1 : kClients;
         ASSERT_TRUE(board.wait([&] {
+            bool arrived = true;
             for (std::size_t i = 0; i < awaited; ++i) {
                 const Board::Told& told = board.clients.at(i);
-                if (!told.isGranted || told.grants <= before.at(i).grants)
-                    return false;
-                for (const std::int64_t value : told.values)
-                    if (value <= old)
-                        return false;
+                arrived = arrived && told.isGranted && told.grants > before.at(i).grants &&
+                          std::ranges::min(told.values) > old;
             }
-            return true;
+            return arrived;
         })) << "restart "
             << restart;
     }
 
     const std::int64_t last = setter.stop();
     EXPECT_TRUE(board.wait([&] {
-        return std::all_of(board.clients.begin(), board.clients.end(), [&](const auto& told) {
-            return std::all_of(told.values.begin(), told.values.end(),
-                               [&](std::int64_t value) { return value == last; });
+        return std::ranges::all_of(board.clients, [&](const Board::Told& told) {
+            return std::ranges::count(told.values, last) == kProperties;
         });
     }));
-    for (const auto& value : valuesIn(memory))
+    for (const auto& value : valuesIn(memory_))
         EXPECT_EQ(value, last);
     EXPECT_EQ(board.stale, 0);
     for (const Board::Told& told : board.clients)
         EXPECT_TRUE(told.isGranted);
     EXPECT_GT(last, kRestarts);
-    ::close(memory);
 }
 
 }  // namespace

@@ -2,42 +2,21 @@
 
 #include <gmock/gmock.h>
 
-#include <functional>
 #include <stdexcept>
 
 #include "support/module_client.h"
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
+#include "support/scripted_resource.h"
 
 namespace {
 
 using namespace plr::rest;
 using namespace plr::test;
 
-// A resource that does what a test says with GET, and with SET or PUSH.
-class Scripted : public RestResource {
-  public:
-    using Handler = std::function<bool(RestResourceContext&)>;
-    explicit Scripted(Handler get, Handler other = {})
-        : get_(std::move(get)), other_(std::move(other)) {}
-    bool handleRestMessage_GET(RestResourceContext& context, const PathView&) override {
-        return get_(context);
-    }
-    bool handleRestMessage_SET(RestResourceContext& context, const PathView&) override {
-        return other_(context);
-    }
-    bool handleRestMessage_PUSH(RestResourceContext& context, const PathView&) override {
-        return other_(context);
-    }
-
-  private:
-    const Handler get_;
-    const Handler other_;
-};
-
 // Answers what it sees of the author.
 std::shared_ptr<RestResourceBase> author() {
-    return std::make_shared<Scripted>([](RestResourceContext& context) {
+    return std::make_shared<ScriptedResource>([](RestResourceContext& context, auto&&) {
         EXPECT_EQ(context.getAuthorCredentials().pid, ::getpid());
         return context.sendReplyWithValue(
             vox::string("%s, says %s", context.getAuthorResource() ? "known" : "unknown",
@@ -58,13 +37,10 @@ class RestServer : public testing::Test {
     std::unique_ptr<RawRestClient> client;
 };
 
-TEST_F(RestServer, RefusesToConnectToNothing) {
+TEST_F(RestServer, RefusesWhatIsNothingOrBelowNoNode) {
     EXPECT_THAT([this] { rig.server().connect(vox::connection()); },
                 testing::ThrowsMessage<std::invalid_argument>(
                     "RestServer::connect cannot be called with a null connection"));
-}
-
-TEST_F(RestServer, RegistersResourcesBelowTheirNodes) {
     EXPECT_FALSE(rig.server().registerResource("/a/b", std::make_shared<RestResource>()));
     EXPECT_FALSE(rig.server().registerResource("/", std::make_shared<RestResource>()));
     EXPECT_FALSE(rig.server().registerResource("/a", nullptr));
@@ -161,10 +137,7 @@ TEST_F(RestServer, BoundsTheNamesThatClientsMakeWhereThatIsWanted) {
                      R"("state": "1:kPending"})",
                      "notify me /p/x null", "notify me /p/y null", "notify me /p/y 1"}));
     // The service itself is not bound.
-    rig.queue().sync([this] {
-        rig.server().handleRestMessage(nullptr,
-                                       client->message(Operation::kSet, "/p/own", vox::int64(1)));
-    });
+    EXPECT_TRUE(rig.handleOwn(client->message(Operation::kSet, "/p/own", vox::int64(1))));
     EXPECT_EQ(client->textAt("/p"), R"([0: "own",1: "x",2: "y"])");
     EXPECT_EQ(client->textAt("/a"), R"([0: "x"])");
 }
@@ -180,17 +153,16 @@ TEST_F(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
               R"({"o": "get","r": 7,"v": [0: "connections",1: "leaf",2: "~drops"]})")
         << "something that is no path is the root";
     // None of these is answered: only the GET of the root behind each of them is.
-    const vox::dict unanswered[] = {
-        createPingMessage(),
-        vox::dict::create(),
-        client->message(Operation::kGet, "/unknown"),
-        client->message(Operation::kGet, "/connections/unknown"),
-        client->message(Operation::kPing, "/leaf"),
-        client->message(Operation::kNone, "/leaf"),
-        client->message(Operation::kSet, "*"),
-    };
-    for (const vox::dict& message : unanswered)
-        client->ask(message);
+    client->ask(createPingMessage());
+    client->ask(vox::dict::create());
+    const std::pair<Operation, const char*> unanswered[] = {
+        {Operation::kGet, "/unknown"},
+        {Operation::kGet, "/connections/unknown"},
+        {Operation::kPing, "/leaf"},
+        {Operation::kNone, "/leaf"},
+        {Operation::kSet, "*"}};
+    for (const auto& [operation, path] : unanswered)
+        client->ask(client->message(operation, path));
     // Nor is what wants no answer.
     for (const char* path : {"/leaf", "", "*", "/connections"})
         client->send(Operation::kGet, path);
@@ -199,49 +171,45 @@ TEST_F(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
     // They are answered by the end of the connection.
     client->connection().cancel();
     EXPECT_TRUE(client->waitForEnd());
-    EXPECT_EQ(client->replies().size(), std::size(unanswered));
+    EXPECT_EQ(client->replies().size(), 2 + std::size(unanswered));
 }
 
 TEST_F(RestServer, RedirectsAMessageTenTimesAtMost) {
     int reached = 0;
-    rig.add("/loop", std::make_shared<Scripted>(
-                         [&](RestResourceContext& context) {
-                             ++reached;
-                             return context.redirect("/loop/again");
-                         },
-                         [](RestResourceContext& context) { return context.redirect("/leaf"); }));
+    rig.add("/loop",
+            std::make_shared<ScriptedResource>(
+                [&](RestResourceContext& context, auto&&) {
+                    ++reached;
+                    return context.redirect("/loop/again");
+                },
+                [](RestResourceContext& context, auto&&) { return context.redirect("/leaf"); }));
     const auto leaf = std::make_shared<FakeRestResource>();
     rig.add("/leaf", leaf);
-    rig.queue().sync([&] {
-        const auto send = [&](Operation operation) {
-            return rig.server().handleRestMessage(
-                nullptr,
-                createRestMessage(asObject(operation), nullptr, vox::string("/loop"), nullptr));
-        };
-        EXPECT_FALSE(send(Operation::kGet));
-        EXPECT_EQ(reached, 11);
-        EXPECT_FALSE(send(Operation::kGet)) << "each message has its own ten";
-        EXPECT_EQ(reached, 22);
-        EXPECT_TRUE(send(Operation::kSet));
-        EXPECT_EQ(leaf->calls, (Texts{"SET "}));
-    });
+    const auto send = [this](Operation operation) {
+        return rig.handleOwn(
+            createRestMessage(asObject(operation), nullptr, vox::string("/loop"), nullptr));
+    };
+    EXPECT_FALSE(send(Operation::kGet));
+    EXPECT_EQ(reached, 11);
+    EXPECT_FALSE(send(Operation::kGet)) << "each message has its own ten";
+    EXPECT_EQ(reached, 22);
+    EXPECT_TRUE(send(Operation::kSet));
+    EXPECT_EQ(leaf->calls, (Texts{"SET "}));
 }
 
 // A GET is passed on to the client that has pushed itself there.
 TEST_F(RestServer, ForwardsAGetAndItsAnswer) {
     std::shared_ptr<RestResourceConnection> provider;
-    rig.add("/forward", std::make_shared<Scripted>(
-                            [&](RestResourceContext& context) {
-                                return provider &&
-                                       context.sendGet(*provider, context.getRestAuthor(),
-                                                       vox::string("/forwarded"),
-                                                       context.getRestValue(),
-                                                       context.takeAutoReplyValue());
-                            },
-                            [&](RestResourceContext& context) {
-                                provider = context.getAuthorResource();
-                                return true;
-                            }));
+    const auto forward = [&](RestResourceContext& context, auto&&) {
+        return provider &&
+               context.sendGet(*provider, context.getRestAuthor(), vox::string("/forwarded"),
+                               context.getRestValue(), context.takeAutoReplyValue());
+    };
+    const auto provide = [&](RestResourceContext& context, auto&&) {
+        provider = context.getAuthorResource();
+        return true;
+    };
+    rig.add("/forward", std::make_shared<ScriptedResource>(forward, provide));
     start();
     const ModuleClient other("provider");
     Event ready;
@@ -263,7 +231,7 @@ TEST_F(RestServer, ForwardsAGetAndItsAnswer) {
 
 TEST_F(RestServer, DeferredRepliesLeaveWithTheirLastHolder) {
     std::vector<std::shared_ptr<vox::object>> replies;  // touched on the server's queue only
-    rig.add("/late", std::make_shared<Scripted>([&](RestResourceContext& context) {
+    rig.add("/late", std::make_shared<ScriptedResource>([&](RestResourceContext& context, auto&&) {
                 replies.push_back(context.takeAutoReplyValue());
                 EXPECT_FALSE(context.takeAutoReplyValue()) << "there is one reply";
                 EXPECT_FALSE(context.sendReplyWithValue(vox::int64(1)));
@@ -298,10 +266,9 @@ TEST_F(RestServer, DeferredRepliesLeaveWithTheirLastHolder) {
 
 TEST_F(RestServer, SurvivesAResourceThatThrows) {
     const Reports reports;
-    const auto trusting = [](RestResourceContext& context) {
-        return vox::dyn_cast_or_default(context.getRestValue(), 0ULL) != 0;
-    };
-    rig.add("/throws", std::make_shared<Scripted>(trusting, trusting));
+    rig.add("/throws", std::make_shared<ScriptedResource>(nullptr, [](auto& context, auto&&) {
+                return vox::dyn_cast_or_default(context.getRestValue(), 0ULL) != 0;
+            }));
     start().send(Operation::kSet, "/throws", vox::int64(-1));
     EXPECT_EQ(client->takeMessages(), Texts());
     EXPECT_EQ(reports.count("dyn_cast to uint64_t requires nonnegative values"), 1U);

@@ -145,6 +145,26 @@ class RestServerRig {
     [[nodiscard]] rest::RestServerExample& server() const { return *server_; }
     [[nodiscard]] const vox::connection& listener() const { return listener_; }
 
+    // What the service does itself.
+    bool handleOwn(const vox::dict& message) const {
+        return queue_.sync([&] { return server_->handleRestMessage(nullptr, message); });
+    }
+    // Which operations `resource` handles at a path, "get push ", when `client` sends
+    // them without a value.
+    template <class Resource>
+    [[nodiscard]] std::string handledBy(const Recording<Resource>& resource,
+                                        const RawRestClient& client, const char* path) const {
+        using enum rest::Operation;
+        std::string handled;
+        for (const rest::Operation operation : {kGet, kPush, kPop, kSet, kNotify}) {
+            client.send(operation, path);
+            static_cast<void>(client.get(""));
+            if (queue_.sync([&] { return resource.handled; }))
+                handled += rest::asString(operation) + std::string(" ");
+        }
+        return handled;
+    }
+
     // Stops listening and ignores the clients from now on.
     void stop() {
         server_.reset();
