@@ -1,9 +1,3 @@
-#include <gtest/gtest.h>
-
-#include <memory>
-#include <new>
-#include <string>
-
 #include "plr/concurrency/priority_queue.h"
 #include "plr/concurrency/shared_synchronizable.h"
 #include "support/failing_allocations.h"

@@ -1,10 +1,5 @@
 #include "plr/concurrency/async_dispatch_callback.h"
 
-#include <gtest/gtest.h>
-
-#include <memory>
-#include <vector>
-
 #include "support/waiting.h"
 
 namespace {

@@ -1,20 +1,16 @@
 #include "plr/concurrency/clock.h"
 
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 
 #include <cerrno>
-#include <utility>
 
 #include "plr/test/manual_calendar.h"
 #include "support/fake_log.h"
 
 namespace {
 
-using plr::Clock;
-using plr::test::FakeLog;
-using plr::test::LogPlaces;
-using plr::test::ManualCalendar;
+using namespace plr;
+using namespace plr::test;
 using namespace std::chrono_literals;
 
 TEST(Clock, CountsTheNanosecondsOfTheSystemsTime) {

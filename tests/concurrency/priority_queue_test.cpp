@@ -1,13 +1,5 @@
-#include <gtest/gtest.h>
-
-#include <array>
-#include <atomic>
-#include <memory>
 #include <random>
-#include <string>
-#include <thread>
 #include <type_traits>
-#include <vector>
 
 #include "plr/concurrency/monitor.h"
 #include "support/waiting.h"
@@ -50,18 +42,17 @@ Block append(std::string& log, char what) {
 }
 
 TEST(PriorityQueue, HighestBlocksGoBeforeNormalOnesThatWait) {
-    struct Row {
+    const struct {
         const char* name;
         void (*submit)(const PriorityQueue&, Block);
-    };
-    const Row rows[] = {
+    } rows[] = {
         {"addBlock", [](const auto& on, Block b) { on.addBlock(std::move(b), Highest); }},
         {"addHighest", [](const auto& on, Block b) { on.addHighestPriorityBlock(std::move(b)); }},
         {"group", [](const auto& on, Block b) { on.addBlock(group(), std::move(b), Highest); }},
         {"copy",
          [](const auto& on, Block b) { PriorityQueue(on).addBlock(std::move(b), Highest); }},
     };
-    for (const Row& row : rows) {
+    for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         const PriorityQueue queue("lanes");
         std::string order;
@@ -130,17 +121,17 @@ class Submissions {
     void submitFrom(std::size_t t, PriorityQueue queue) {
         std::minstd_rand random(static_cast<unsigned>(t) + 1);
         for (int i = 0; i < kEach; ++i) {
-            const bool nested = random() % 4 == 0;
-            if (random() % 3 == 0) {
-                Block work = highest(t, lanes_[t].submittedHighest, nested);
-                random() % 8 == 0 ? queue.addBlockSync(work, Highest)
-                                  : queue.addBlock(all_, std::move(work), Highest);
-                ++lanes_[t].submittedHighest;
-            } else {
-                Block work = normal(t, lanes_[t].submittedNormal++, nested);
-                random() % 8 == 0 ? queue.addBlockSync(work, Normal)
-                                  : queue.addBlock(all_, std::move(work), Normal);
-            }
+            const auto priority = random() % 3 == 0 ? Highest : Normal;
+            Lane& lane = lanes_[t];
+            const int number =
+                priority == Highest ? lane.submittedHighest.load() : lane.submittedNormal++;
+            Block work = makeWork(t, priority, number, random() % 4 == 0);
+            if (random() % 8 == 0)
+                queue.addBlockSync(work, priority);
+            else
+                queue.addBlock(all_, std::move(work), priority);
+            if (priority == Highest)
+                ++lane.submittedHighest;
             if (random() % 64 == 0) {
                 queue.suspend();
                 queue.resume();
@@ -148,35 +139,26 @@ class Submissions {
         }
     }
 
-    Block highest(std::size_t t, int number, bool nested) {
-        return Block([this, t, number, nested] {
-            enter();
-            EXPECT_EQ(lanes_[t].ranHighest++, number);
-            leave(nested);
+    Block makeWork(std::size_t t, PriorityQueue::Priority priority, int number, bool nested) {
+        return Block([this, t, priority, number, nested] {
+            queue_.assertSynchronized();
+            EXPECT_FALSE(std::exchange(running_, true));
+            Lane& lane = lanes_[t];
+            EXPECT_EQ((priority == Highest ? lane.ranHighest : lane.ranNormal)++, number);
+            if (priority == Normal)
+                checkHighest();
+            if (nested)
+                queue_.addBlock(all_, makeWork(kThreads, Highest, own_.submittedHighest++, false),
+                                Highest);
+            running_ = false;
         });
     }
-
-    Block normal(std::size_t t, int number, bool nested) {
-        return Block([this, t, number, nested] {
-            enter();
-            EXPECT_EQ(lanes_[t].ranNormal++, number);
-            EXPECT_EQ(own_.ranHighest, own_.submittedHighest);
-            for (Lane& lane : lanes_) {
-                EXPECT_GE(lane.ranHighest, lane.mayNotWait);
-                lane.mayNotWait = lane.submittedHighest;
-            }
-            leave(nested);
-        });
-    }
-
-    void enter() {
-        queue_.assertSynchronized();
-        EXPECT_FALSE(std::exchange(running_, true));
-    }
-    void leave(bool nested) {
-        if (nested)
-            queue_.addBlock(all_, highest(kThreads, own_.submittedHighest++, false), Highest);
-        running_ = false;
+    void checkHighest() {
+        EXPECT_EQ(own_.ranHighest, own_.submittedHighest);
+        for (Lane& lane : lanes_) {
+            EXPECT_GE(lane.ranHighest, lane.mayNotWait);
+            lane.mayNotWait = lane.submittedHighest;
+        }
     }
 
     const PriorityQueue queue_{"lanes"};

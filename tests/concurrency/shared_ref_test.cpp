@@ -2,8 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <utility>
-
 #include "plr/concurrency/qf_shared_ref.h"
 #include "support/qf_balance.h"
 

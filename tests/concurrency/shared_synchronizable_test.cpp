@@ -1,43 +1,23 @@
 #include "plr/concurrency/shared_synchronizable.h"
 
-#include <gtest/gtest.h>
-
-#include <atomic>
-#include <memory>
-#include <string>
-#include <vector>
-
 #include "plr/concurrency/while_alive.h"
 #include "support/waiting.h"
 
 namespace {
 
-using plr::test::drain;
-using plr::test::Event;
-
-// What an object's end looked like. Waits for it at the latest when the test
-// ends, since it comes later than the last owner's.
-class End {
-  public:
-    ~End() { EXPECT_TRUE(wait()); }
-    [[nodiscard]] bool wait() { return waited_ || (waited_ = happened_.wait()); }
-    void signal() { happened_.signal(); }
-
-    std::atomic<bool> onItsQueue{false};
-
-  private:
-    Event happened_;
-    bool waited_ = false;
-};
-
+using namespace plr::test;
+// Calls `atEnd` when it is destroyed.
 class Thing : public plr::SharedSynchronizable<Thing> {
   public:
-    explicit Thing(End& end) : SharedSynchronizable("thing"), end_(end) {}
+    explicit Thing(std::function<void()> atEnd)
+        : SharedSynchronizable("thing"), atEnd_(std::move(atEnd)) {}
     virtual ~Thing() {
-        end_.onItsQueue = ownQueue_.queue().is_current();
-        end_.signal();
+        EXPECT_TRUE(queue().is_current());
+        atEnd_();
     }
-    static std::shared_ptr<Thing> create(End& end) { return make_shared_ptr(new Thing(end)); }
+    static std::shared_ptr<Thing> create(std::function<void()> atEnd) {
+        return make_shared_ptr(new Thing(std::move(atEnd)));
+    }
 
     [[nodiscard]] const dispatch::queue& queue() const { return ownQueue_.queue(); }
     template <class Callable>
@@ -46,60 +26,53 @@ class Thing : public plr::SharedSynchronizable<Thing> {
     }
 
   private:
-    End& end_;
+    const std::function<void()> atEnd_;
 };
 
-TEST(SharedSynchronizable, WrappedWorkKeepsTheObjectAlive) {
-    End end;
-    auto thing = Thing::create(end);
+class SharedThing : public testing::Test {
+  protected:
+    const std::function<void()> atEnd_ = [this] { ended_.signal(); };
+    Event ended_, go_;
+};
+
+TEST_F(SharedThing, IsKeptAliveByWrappedWork) {
+    auto thing = Thing::create(atEnd_);
     const Thing* raw = thing.get();
-    const dispatch::queue queue = thing->queue();
-    Event go;
-    Event checked;
-    std::weak_ptr<Thing> weak = thing->weak_from_this();
-    queue.async([&go] { EXPECT_TRUE(go.wait()); });
-    thing->execute_wrapped([weak, raw, &checked] {
-        EXPECT_EQ(weak.lock().get(), raw);
-        checked.signal();
-    });
+    const std::weak_ptr<Thing> weak = thing->weak_from_this();
+    thing->queue().async([this] { EXPECT_TRUE(go_.wait()); });
+    thing->execute_wrapped([weak, raw] { EXPECT_EQ(weak.lock().get(), raw); });
     thing.reset();
-    go.signal();
-    EXPECT_TRUE(checked.wait());
-    EXPECT_TRUE(end.wait());
-    drain(queue);
+    go_.signal();
+    EXPECT_TRUE(ended_.wait());
     EXPECT_TRUE(weak.expired());
-    EXPECT_TRUE(end.onItsQueue);
 }
 
-TEST(SharedSynchronizable, DroppingTheLastOwnerOnTheQueueDestroysBehindTheQueuedWork) {
-    End end;
-    auto thing = Thing::create(end);
-    const dispatch::queue queue = thing->queue();
+TEST_F(SharedThing, IsDestroyedBehindTheQueuedWorkWhenItsLastOwnerGoesOnItsQueue) {
     std::vector<std::string> log;  // touched on the queue only
-    const auto destroyed = [&end] { return end.onItsQueue.load(); };
-    Event go;
+    auto thing = Thing::create([&] {
+        log.push_back("destroyed");
+        ended_.signal();
+    });
+    const dispatch::queue queue = thing->queue();
     queue.async([&] {
-        EXPECT_TRUE(go.wait());
+        EXPECT_TRUE(go_.wait());
         thing.reset();
-        log.push_back(destroyed() ? "destroyed in the block" : "alive after the drop");
+        log.push_back("dropped");
     });
-    queue.async([&] { log.push_back(destroyed() ? "destroyed too early" : "queued before"); });
-    go.signal();
-    EXPECT_TRUE(end.wait());
+    queue.async([&] { log.push_back("queued before"); });
+    go_.signal();
+    EXPECT_TRUE(ended_.wait());
     queue.sync([&] {
-        EXPECT_EQ(log, (std::vector<std::string>{"alive after the drop", "queued before"}));
+        EXPECT_EQ(log, (std::vector<std::string>{"dropped", "queued before", "destroyed"}));
     });
-    EXPECT_TRUE(end.onItsQueue);
 }
 
-TEST(SharedSynchronizable, RefusesWorkWhileNobodyOwnsIt) {
-    End end;
-    Event dropped;
+TEST_F(SharedThing, RefusesWorkWhileNobodyOwnsIt) {
     class Derived : public Thing {
       public:
         using Thing::Thing;
     };
-    auto* thing = new Derived(end);
+    auto* thing = new Derived(atEnd_);
     const auto expectRefused = [thing] {
         EXPECT_THROW(thing->execute_wrapped([] { FAIL(); }), std::bad_weak_ptr);
         EXPECT_THROW(static_cast<void>(thing->weak_from_this()), std::bad_weak_ptr);
@@ -110,18 +83,17 @@ TEST(SharedSynchronizable, RefusesWorkWhileNobodyOwnsIt) {
     EXPECT_STREQ(thing->queue().label(), "thing");
     // Queued before the drop, so that it runs before the destruction.
     thing->queue().async([&] {
-        EXPECT_TRUE(dropped.wait());
+        EXPECT_TRUE(go_.wait());
         expectRefused();
     });
     owner.reset();
-    dropped.signal();
-    EXPECT_TRUE(end.wait());
+    go_.signal();
+    EXPECT_TRUE(ended_.wait());
     EXPECT_EQ(Thing::make_shared_ptr(static_cast<Thing*>(nullptr)).get(), nullptr);
 }
 
-TEST(SharedSynchronizable, RunsWorkInOrderAndReturnsResults) {
-    End end;
-    const auto thing = Thing::create(end);
+TEST_F(SharedThing, RunsWorkInOrderAndReturnsResults) {
+    auto thing = Thing::create(atEnd_);
     std::vector<int> order;  // touched on the queue only
     for (int i = 0; i < 3; ++i)
         thing->execute_wrapped([&order, i] { order.push_back(i); });
@@ -133,6 +105,8 @@ TEST(SharedSynchronizable, RunsWorkInOrderAndReturnsResults) {
     const auto onQueue = [&] { return thing->queue().is_current(); };
     EXPECT_TRUE(thing->execute_wrapped_sync([&] { return thing->performed(onQueue); }));
     EXPECT_TRUE(thing->performed(onQueue));
+    thing.reset();
+    EXPECT_TRUE(ended_.wait());
 }
 
 TEST(WhileAlive, DoesNothingOnceTheObjectIsGone) {

@@ -1,7 +1,5 @@
 #include "plr/concurrency/timer_service.h"
 
-#include <gtest/gtest.h>
-
 #include <cmath>
 #include <limits>
 
@@ -11,17 +9,10 @@
 
 namespace {
 
+using namespace plr;
+using namespace plr::test;
 using dispatch::block;
 using dispatch::queue;
-using plr::DispatchTimerService;
-using plr::IllegalTimerParamsException;
-using plr::Timer;
-using plr::TimerDelay;
-using plr::TimerService;
-using plr::TimeType;
-using plr::test::drain;
-using plr::test::Event;
-using plr::test::ManualCalendar;
 using std::chrono::microseconds;
 using namespace std::chrono_literals;
 
@@ -171,12 +162,11 @@ TEST_F(Timers, DispatchTimesCountFromNowOnTheirClock) {
 TEST(TimerDelay, IsWholeMicrosecondsRoundedUpAndClamped) {
     using Frames = std::chrono::duration<int, std::ratio<1, 30>>;
     using Big = std::chrono::duration<std::uint64_t, std::nano>;
-    struct Row {
+    const struct {
         const char* name;
         TimerDelay delay;
         std::int64_t expected;
-    };
-    const Row rows[] = {
+    } rows[] = {
         {"part of one", 1ns, 1},
         {"negative rounds up", -1500ns, -1},
         {"odd units", Frames(1), 33'334},
@@ -188,7 +178,7 @@ TEST(TimerDelay, IsWholeMicrosecondsRoundedUpAndClamped) {
         {"nanoseconds", std::chrono::nanoseconds::max(), kMaximum / 1000 + 1},
         {"unsigned", Big(std::numeric_limits<std::uint64_t>::max()), kMaximum},
     };
-    for (const Row& row : rows)
+    for (const auto& row : rows)
         EXPECT_EQ(std::get<microseconds>(row.delay.time()).count(), row.expected) << row.name;
 }
 

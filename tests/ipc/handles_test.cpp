@@ -1,10 +1,4 @@
-#include <gtest/gtest.h>
 #include <unistd.h>
-
-#include <chrono>
-#include <cstdint>
-#include <string>
-#include <utility>
 
 #include "plr/ipc.h"
 #include "support/waiting.h"

@@ -4,7 +4,6 @@
 
 #include <bit>
 #include <random>
-#include <string>
 
 #include "plr/ipc/values.h"
 #include "support/qf_balance.h"

@@ -2,13 +2,8 @@
 
 #include <gtest/gtest.h>
 
-#include <chrono>
-#include <cstdint>
 #include <limits>
-#include <optional>
 #include <stdexcept>
-#include <string>
-#include <vector>
 
 #include "plr/ipc/values.h"
 
@@ -17,7 +12,7 @@ namespace {
 constexpr std::uint64_t kHuge = std::numeric_limits<std::uint64_t>::max();
 
 TEST(DynCastOrDefault, FollowsTheRulesOfEachType) {
-    struct Row {
+    const struct {
         const char* name;
         vox::object value;
         long long asLongLong;  // fallback 9
@@ -26,8 +21,7 @@ TEST(DynCastOrDefault, FollowsTheRulesOfEachType) {
         std::optional<unsigned long long> asUnsignedLongLong;  // nothing: throws
         bool asBool;                                           // fallback true
         double asDouble;                                       // fallback 1.5
-    };
-    const Row rows[] = {
+    } rows[] = {
         {"int64 3", vox::int64(3), 3, 3, 3, 3, true, 1.5},
         {"int64 0", vox::int64(0), 0, 0, 0, 0, false, 1.5},
         {"int64 -5", vox::int64(-5), -5, -5, 4294967291U, std::nullopt, true, 1.5},
@@ -42,7 +36,7 @@ TEST(DynCastOrDefault, FollowsTheRulesOfEachType) {
         {"null", vox::object(), 9, 9, 9, 9, true, 1.5},
         {"dictionary", vox::dict::create(), 9, 9, 9, 9, true, 1.5},
     };
-    for (const Row& row : rows) {
+    for (const auto& row : rows) {
         SCOPED_TRACE(row.name);
         EXPECT_EQ(vox::dyn_cast_or_default(row.value, 9LL), row.asLongLong);
         EXPECT_EQ(vox::dyn_cast_or_default(row.value, 9L), row.asLongLong);

@@ -3,9 +3,6 @@
 #include <stdlib.h>
 #include <time.h>
 
-#include <chrono>
-#include <string>
-
 #include "plr/ipc.h"
 
 namespace {

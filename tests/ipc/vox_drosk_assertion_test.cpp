@@ -1,12 +1,5 @@
 #include "plr/ipc/vox_drosk_assertion.h"
 
-#include <gtest/gtest.h>
-
-#include <new>
-#include <thread>
-#include <utility>
-#include <vector>
-
 #include "support/failing_allocations.h"
 #include "support/waiting.h"
 #include "vox/service.h"
