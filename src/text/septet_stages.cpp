@@ -1,5 +1,6 @@
 #include "src/text/septet_stages.h"
 
+#include <algorithm>
 #include <bit>
 #include <cstring>
 
