@@ -60,6 +60,8 @@ std::int32_t writePiece(void* context, const void* piece, std::uint32_t length) 
 // The stored bytes run past the end of the storage, or may.
 bool linearizeWrapped(PelorinRingBuffer& ring, const Positions& at) {
     const std::uint32_t tail = at.toStorageEnd;
+    if (tail == 0)  // an empty storage, which may be null
+        return true;
     // Deliberate: also of a full and of an empty buffer, whose bytes need not move.
     void* const block = ::operator new(tail, std::nothrow);
     if (!block)

@@ -103,7 +103,8 @@ void TimedUart::closePort() {
     for (const int wake : wakes)
         if (wake >= 0)
             serial_wake_close(wake);
-    if (port >= 0 && serial_close(port) != 0)
+    // Deliberate: descriptor 0 is no port of ours.
+    if (port >= 1 && serial_close(port) != 0)
         PelorinDebugPrint(kFree, "Failed to close, err = %s(%u)\n", errorText(errno),
                           static_cast<unsigned>(errno));
 }
