@@ -138,9 +138,10 @@ DeliverReading readDeliver(Octets pdu) {
     reading.message.time = timeOf(time);
     reading.message.userData =
         plr::decodeSmsUserData(reader.left(), codingScheme, length, (flags & kHasHeader) != 0);
-    // Elements that do not fill their header are as if there were none.
+    // A wrong header and a reserved coding scheme are no reason to withhold the text.
+    using enum plr::SmsUserDataError;
     const auto error = reading.message.userData.error;
-    if (error != plr::SmsUserDataError::kNone && error != plr::SmsUserDataError::kHeaderElements)
+    if (error != kNone && error != kHeaderElements && error != kReservedCoding)
         reading.complaint = asString(error);
     return reading;
 }

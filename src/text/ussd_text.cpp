@@ -41,6 +41,12 @@ bool isLanguage(std::string_view text) {
            std::ranges::all_of(text, [](char c) { return c >= 'a' && c <= 'z'; });
 }
 
+// Not what has a header in front, and what other protocols define.
+constexpr bool isText(std::uint8_t codingScheme) noexcept {
+    const int group = codingScheme >> 4;
+    return group != 0x9 && group != 0xD && group != 0xE;
+}
+
 // Without a CR that only fills the last octet.
 std::size_t septetsOf(std::string_view octets) {
     const bool isFilled = !octets.empty() && octets.size() % 7 == 0 &&
@@ -79,10 +85,11 @@ std::optional<UssdText> decodeUssd(std::span<const std::uint8_t> octets,
                                    std::uint8_t codingScheme) {
     UssdText result;
     bool hasLanguage = false;
-    if (octets.size() > kMostOctets ||
-        !TextConverter::decodeCbsDataCodingScheme(codingScheme, result.messageClass,
-                                                  result.encoding, hasLanguage))
+    if (octets.size() > kMostOctets || !isText(codingScheme))
         return std::nullopt;
+    // What is reserved leaves the default alphabet, which receivers are to take it for.
+    TextConverter::decodeCbsDataCodingScheme(codingScheme, result.messageClass, result.encoding,
+                                             hasLanguage);
     result.isCompressed = (codingScheme & 0xE0) == 0x60;
     if (result.isCompressed || result.encoding == MessageEncoding::k8BitData) {
         result.data.assign(octets.begin(), octets.end());

@@ -39,6 +39,8 @@ TEST(Ussd, IsReadByCodingScheme) {
         {"language of UCS-2 cut", "65", 0x11, "", ""},
         {"no language", "00000416", 0x11, "Ж", ""},
         {"EUC-KR", "bec8b3e7", 0x4C, "안녕", ""},
+        {"reserved", "aa180c3602", 0x12, "*100#", ""},
+        {"reserved group", "aa180c3602", 0xA1, "*100#", ""},
     };
     for (const auto& row : rows) {
         const auto read =
@@ -49,7 +51,8 @@ TEST(Ussd, IsReadByCodingScheme) {
     }
     EXPECT_EQ(decodeUssd(octetsOf("0102"), 0xF4)->data, octetsOf("0102"));
     EXPECT_EQ(decodeUssd(octetsOf("0102"), 0x60)->data, octetsOf("0102")) << "compressed";
-    EXPECT_FALSE(decodeUssd(octetsOf("0102"), 0x12)) << "reserved";
+    for (const int scheme : {0x90, 0xD0, 0xE0})
+        EXPECT_FALSE(decodeUssd(octetsOf("0102"), static_cast<std::uint8_t>(scheme))) << scheme;
     EXPECT_FALSE(decodeUssd(std::vector<std::uint8_t>(161), 0x0F));
 }
 
@@ -103,7 +106,7 @@ TEST(CellBroadcast, PagesAreReadWithTheirPlace) {
          std::map<std::string, std::string>{{"cut", "6ab5111201"},
                                             {"too long", "6ab511120111" + std::string(83 * 2, '0')},
                                             {"beyond the total", "6ab511120132"},
-                                            {"reserved", "6ab511121211"}})
+                                            {"no text", "6ab511129011"}})
         EXPECT_FALSE(decodeCellBroadcastPage(octetsOf(page.c_str()))) << name;
 }
 

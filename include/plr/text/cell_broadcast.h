@@ -36,8 +36,8 @@ struct CellBroadcastPage {
 };
 
 // `page`: from outside, any octets. The pages of a message, joined in order, are its text. Nothing
-// if it is shorter than 6 or longer than 88 octets, for a page beyond the total, and for a
-// reserved scheme. A page parameter with a 0 counts as page 1 of 1.
+// if it is shorter than 6 or longer than 88 octets, for a page beyond the total, and for
+// a scheme that decodeUssd() has nothing for. A page parameter with a 0 counts as page 1 of 1.
 [[nodiscard]] PLR_EXPORT std::optional<CellBroadcastPage> decodeCellBroadcastPage(
     std::span<const std::uint8_t> page);
 

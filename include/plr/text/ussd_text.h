@@ -28,8 +28,9 @@ struct UssdText {
 
 // `octets`: from outside. Of 7-bit text a CR that fills the last 7 bits (3GPP TS 23.038,
 // 6.1.2.3.1) is taken off, and so is the language that a text begins with, if the scheme says
-// that it does. Nothing for a scheme that is reserved or that of no text, and for more than 160
-// octets.
+// that it does. A reserved scheme counts as the default alphabet, as the standard tells receivers.
+// Nothing for the schemes of headers (0x90 to 0x9F) and of other protocols (0xD0 to 0xEF), and
+// for more than 160 octets.
 [[nodiscard]] PLR_EXPORT std::optional<UssdText> decodeUssd(std::span<const std::uint8_t> octets,
                                                             std::uint8_t codingScheme);
 
