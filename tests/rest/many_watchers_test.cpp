@@ -6,7 +6,6 @@
 
 #include <fstream>
 
-#include "support/module_client.h"
 #include "support/raw_rest_client.h"
 #include "support/runtime.h"
 #include "support/sanitized.h"
@@ -91,20 +90,23 @@ TEST(ManyWatchers, ThatGoAtOnceLeaveNothingBehindAndNobodyWaitsForIt) {
 // missing: null, and the numbers from 0 on.
 class GoodWatcher {
   public:
-    explicit GoodWatcher(const RestServerRig& rig, int properties) {
-        client_.on([&] {
-            client_.module.connect(rig.connect());
-            for (int i = 0; i < properties; ++i)
-                client_.module.observeProperty(
-                    "/kept/" + std::to_string(i),
-                    [this, next = -1](const vox::object& value) mutable {
-                        const std::string text(value.text());
-                        wrong_ += (value ? std::atoi(text.c_str()) : -1) == next++ ? 0 : 1;
-                        taken_.signal();
-                    });
-        });
+    explicit GoodWatcher(const RestServerRig& rig, int properties)
+        : connection_(rig.connect()), next_(static_cast<std::size_t>(properties), -1) {
+        connection_.set_event_handler([this](const vox::object& event) { take(event); });
+        connection_.set_target_queue(queue_);
+        connection_.resume();
+        push("/connections");
+        for (int i = 0; i < properties; ++i)
+            push("/kept/" + std::to_string(i));
         EXPECT_TRUE(wait(properties));
     }
+    ~GoodWatcher() {
+        connection_.cancel();
+        EXPECT_TRUE(ended_.wait());
+    }
+    GoodWatcher(const GoodWatcher&) = delete;
+    GoodWatcher& operator=(const GoodWatcher&) = delete;
+
     // Whether `count` more values came in time.
     [[nodiscard]] bool wait(int count) {
         while (count > 0 && taken_.wait())
@@ -113,13 +115,30 @@ class GoodWatcher {
     }
     // Values that came too early, too late or twice.
     [[nodiscard]] int wrong() const {
-        return client_.on([this] { return wrong_; });
+        return queue_.sync([this] { return wrong_; });
     }
 
   private:
-    Event taken_;
-    int wrong_ = 0;  // touched on the queue only
-    const ModuleClient client_;
+    void push(const std::string& path) const {
+        connection_.send_message(plr::rest::createRestMessage(
+            plr::rest::asObject(Operation::kPush), vox::string("good"), vox::string(path), {}));
+    }
+    void take(const vox::object& event) {
+        const vox::dict message(event);
+        if (!message)
+            return ended_.signal();
+        const std::string property(message.text("r").substr(sizeof "/kept"));
+        const vox::object value(message["v"]);
+        const int number = value ? std::atoi(std::string(value.text()).c_str()) : -1;
+        wrong_ += number == next_.at(std::stoul(property))++ ? 0 : 1;
+        taken_.signal();
+    }
+
+    const vox::connection connection_;
+    const dispatch::queue queue_ = dispatch::queue::create("good");
+    std::vector<int> next_;  // touched on the queue only, as …
+    int wrong_ = 0;
+    Event taken_, ended_;
 };
 
 // A value that carries its number.

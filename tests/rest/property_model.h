@@ -13,6 +13,8 @@ using plr::rest::Operation;
 using Connection = std::shared_ptr<plr::rest::RestResourceConnection>;
 using Texts = std::vector<std::string>;
 
+constexpr const char* kHuge = "k.99999999999999999999999";
+
 // {"k": [number, number + 1]}
 inline vox::dict partsOf(const vox::object& number) {
     const vox::array list = vox::array::create();
@@ -148,7 +150,7 @@ class Model {
     [[nodiscard]] std::string part(const vox::object& value) const {
         if (step_->subpath.empty())
             return oneLine(value);
-        const bool isNoIndex = step_->subpath == "k.word";
+        const bool isNoIndex = step_->subpath == "k.word" || step_->subpath == kHuge;
         return isNoIndex ? "null" : oneLine(vox::get_subpath(value, step_->subpath));
     }
     bool get() {

@@ -59,7 +59,7 @@ class PropertyModel : public testing::TestWithParam<bool> {
     std::string randomRest(Step& step) {
         static constexpr const char* kNames[] = {"x",  "x",  "y", "watchers", "watched",
                                                  "__", "*y", "z", ""};
-        static constexpr const char* kSubpaths[] = {"", "k", "k.1", "k.word", "none"};
+        static constexpr const char* kSubpaths[] = {"", "k", "k.1", "k.word", "none", kHuge};
         static constexpr const char* kTails[] = {"", "", "", "/other", "/_/other", "/_/watchers/y"};
         if (below(3) == 0) {
             const Path& path = oneOf(kRootPaths);

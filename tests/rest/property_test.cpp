@@ -62,15 +62,19 @@ class PropertyTable : public testing::TestWithParam<bool> {
 
 TEST_P(PropertyTable, HasTheModelsCells) {
     using model::Kind;
-    std::vector<model::Path> paths = {kX,
-                                      {Kind::Resource, "/x/other", "x"},
-                                      {Kind::Resource, "/x/_/other", "x"},
-                                      {Kind::Resource, "/x/_/watchers/y", "x"},
-                                      {Kind::Resource, "/x@k.1", "x", "k.1"},
-                                      {Kind::Resource, "/x@", "x"},
-                                      {Kind::ResourceMeta, "/x/_", "x"},
-                                      {Kind::ResourceWatchers, "/x/_/watchers", "x"},
-                                      {Kind::ResourceWatchers, "/y/_/watchers", "y"}};
+    std::vector<model::Path> paths = {
+        kX,
+        {Kind::Resource, "/x/other", "x"},
+        {Kind::Resource, "/x/_/other", "x"},
+        {Kind::Resource, "/x/_/watchers/y", "x"},
+        {Kind::Resource, "/x@k.1", "x", "k.1"},
+        {Kind::Resource, "/x@k.word", "x", "k.word"},
+        {Kind::Resource, std::string("/x@") + model::kHuge, "x", model::kHuge},
+        {Kind::Resource, "/new@k", "new", "k"},
+        {Kind::Resource, "/x@", "x"},
+        {Kind::ResourceMeta, "/x/_", "x"},
+        {Kind::ResourceWatchers, "/x/_/watchers", "x"},
+        {Kind::ResourceWatchers, "/y/_/watchers", "y"}};
     paths.insert(paths.end(), std::begin(model::kRootPaths), std::end(model::kRootPaths));
     play(Operation::kSet, kX);
     for (const model::Path& path : paths)
@@ -89,61 +93,27 @@ TEST_P(PropertyTable, HasTheModelsCells) {
 INSTANTIATE_TEST_SUITE_P(Values, PropertyTable, testing::Values(true, false),
                          [](const auto& keeps) { return keeps.param ? "Kept" : "PassedOn"; });
 
-// A server with properties at /kept and /events (not kept), and a client that
-// is known to it. "x" is set at both, to {"k": [5, 6]}.
-class Property : public testing::Test {
-  protected:
-    Property() {
-        rig_.add("/kept", std::make_shared<PropertyRestResource>(true));
-        rig_.add("/events", std::make_shared<PropertyRestResource>(false));
-        rig_.start();
-        client_ = rig_.registeredClient("me");
-        for (const char* path : {"/kept/x", "/events/x"})
-            client_->send(Operation::kSet, path, model::partsOf(vox::int64(5)));
-    }
-
-    RestServerRig rig_;
-    std::unique_ptr<RawRestClient> client_;
-};
-
-TEST_F(Property, GivesPartsOfItsValue) {
-    const struct {
-        const char* path;
-        const char* expected;
-    } rows[] = {
-        {"/kept/x@k", "[0: 5,1: 6]"},
-        {"/kept/x@k.word", "null"},  // the conversion throws
-        {"/kept/x@k.99999999999999999999999", "null"},
-        {"/kept/new@k", "null"},
-        {"/events/x@k", "null"},
-        {"/events/x", "null"},
-        {"/events/*", R"({"x": null})"},
-        {"/events", R"([0: "x"])"},
-        {"*",
-         R"({"connections": [0: "me"],"events": {"x": null},"kept": {"x": {"k": [0: 5,1: 6]}}})"},
-    };
-    for (const auto& row : rows)
-        EXPECT_EQ(client_->textAt(row.path), row.expected) << row.path;
-}
-
 // However it goes. Nothing is left of it then: the next watcher is the first.
-TEST_F(Property, WhenAClientWentWhoWatchesWhatIsWatchedIsToldOnce) {
-    rig_.add("/tree", std::make_shared<plr::rest::TreeRestResource>());
-    rig_.add("/tree/kept", std::make_shared<PropertyRestResource>(true));
-    client_->send(Operation::kPush, "/tree/kept/_/watched");
-    static_cast<void>(client_->takeMessages());
+TEST(Property, WhenAClientWentWhoWatchesWhatIsWatchedIsToldOnce) {
+    RestServerRig rig;
+    rig.add("/tree", std::make_shared<plr::rest::TreeRestResource>());
+    rig.add("/tree/kept", std::make_shared<PropertyRestResource>(true));
+    rig.start();
+    const auto client = rig.registeredClient("me");
+    client->send(Operation::kPush, "/tree/kept/_/watched");
+    EXPECT_EQ(client->takeMessages().size(), 1U);
     for (const bool isByPop : {false, true}) {
-        auto other = rig_.registeredClient("other");
+        auto other = rig.registeredClient("other");
         other->send(Operation::kPush, "/tree/kept/x");
         other->send(Operation::kPush, "/tree/kept/y");
         static_cast<void>(other->takeMessages());
-        EXPECT_EQ(client_->takeMessages().size(), 2U);
+        EXPECT_EQ(client->takeMessages().size(), 2U);
         if (isByPop)
             other->send(Operation::kPop, "/connections");
         else
             other.reset();
         Texts told;
-        EXPECT_TRUE(eventually([&] { return !(told = client_->takeMessages()).empty(); }));
+        EXPECT_TRUE(eventually([&] { return !(told = client->takeMessages()).empty(); }));
         EXPECT_EQ(told, (Texts{"notify me /tree/kept/_/watched []"}));
     }
 }
