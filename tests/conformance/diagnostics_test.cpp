@@ -16,8 +16,7 @@ namespace {
 using dispatch::block;
 using dispatch::overrun;
 using dispatch::queue;
-using plr::test::drain;
-using plr::test::Event;
+using namespace plr::test;
 using testing::ContainsRegex;
 using testing::HasSubstr;
 using testing::Not;
@@ -77,26 +76,23 @@ TEST(Dump, ShowsWhatRunsWaitsAndIsSuspended) {
 TEST(Dump, MayLookAtAnyTime) {
     std::atomic<bool> stop{false};
     const auto shared = queue::create("shared");
-    std::vector<std::jthread> threads;
-    threads.reserve(3);
-    for (int i = 0; i < 3; ++i)
-        threads.emplace_back([&] {
-            while (!stop) {
-                const auto own = queue::create(std::string(100, 'x'), shared);
-                dispatch::enable_statistics(own);
-                const auto single = queue::create("single");
-                for (int n = 0; n < 20; ++n) {
-                    own.async([&] { shared.async([] {}); });
-                    single.async([] {});
-                }
-                const auto timer = dispatch::source::timer(own);
-                timer.set_timer(dispatch::immediately, 1ms);
-                timer.resume();
-                shared.async([] {});
-                own.sync([] {});
-                shared.sync([] {});
+    const Threads threads(3, [&](unsigned) {
+        while (!stop) {
+            const auto own = queue::create(std::string(100, 'x'), shared);
+            dispatch::enable_statistics(own);
+            const auto single = queue::create("single");
+            for (int n = 0; n < 20; ++n) {
+                own.async([&] { shared.async([] {}); });
+                single.async([] {});
             }
-        });
+            const auto timer = dispatch::source::timer(own);
+            timer.set_timer(dispatch::immediately, 1ms);
+            timer.resume();
+            shared.async([] {});
+            own.sync([] {});
+            shared.sync([] {});
+        }
+    });
     for (int i = 0; i < 300; ++i)
         EXPECT_THAT(dispatch::dump(), HasSubstr("queues: "));
     EXPECT_THAT(shared.sync([] { return dispatch::dump(); }), HasSubstr("\"shared\""));
@@ -203,10 +199,9 @@ TEST(Statistics, CountWorkOfAConcurrentQueueOnAllWorkers) {
     const dispatch::group all;
     for (int i = 0; i < 10'000; ++i)
         all.async(global, [] {});
-    EXPECT_EQ(all.wait(dispatch::time::after(plr::test::kBound)), 0);
+    EXPECT_EQ(all.wait(dispatch::time::after(kBound)), 0);
     dispatch::enable_statistics(global, false);
-    EXPECT_TRUE(
-        plr::test::eventually([&] { return dispatch::statistics(global).run.count() == 10'000; }));
+    EXPECT_TRUE(eventually([&] { return dispatch::statistics(global).run.count() == 10'000; }));
 }
 
 TEST(Statistics, BucketsAreASixteenthOfAPowerOfTwo) {

@@ -2,7 +2,6 @@
 
 #include <atomic>
 #include <optional>
-#include <thread>
 #include <vector>
 
 #include "dispatch/dispatch.h"
@@ -14,8 +13,7 @@ using dispatch::block;
 using dispatch::group;
 using dispatch::group_session;
 using dispatch::queue;
-using plr::test::drain;
-using plr::test::Event;
+using namespace plr::test;
 
 TEST(Group, WaitTellsDoneFromTimeOut) {
     const group work;
@@ -26,7 +24,7 @@ TEST(Group, WaitTellsDoneFromTimeOut) {
     EXPECT_NE(work.wait(dispatch::time::after(std::chrono::milliseconds(1), dispatch::clock::wall)),
               0);
     queue::global().async([&] { work.leave(); });
-    EXPECT_EQ(work.wait(dispatch::time::after(plr::test::kBound)), 0);
+    EXPECT_EQ(work.wait(dispatch::time::after(kBound)), 0);
 }
 
 TEST(Group, NotifiesExactlyOnceWhenTheCountIsZero) {
@@ -57,25 +55,18 @@ TEST(Group, RacingNotificationsComeExactlyOnce) {
     const auto serial = queue::create("serial");
     const group work;
     std::vector<int> notified(kRounds, 0);
-    std::vector<std::thread> threads;
-    for (int t = 0; t < 3; ++t) {
-        threads.emplace_back([&] {
-            for (int i = 0; i < kRounds; ++i) {
+    Threads(5, [&](unsigned t) {
+        for (unsigned i = 0; i < kRounds; ++i) {
+            if (t == 0) {
+                work.notify(serial, block<void()>([&, i] { ++notified[i]; }));
+            } else if (t == 1 && i % 10 == 0) {
+                EXPECT_EQ(work.wait(dispatch::time::after(kBound)), 0);
+            } else {
                 work.enter();
                 work.leave();
             }
-        });
-    }
-    threads.emplace_back([&] {
-        for (unsigned i = 0; i < kRounds; ++i)
-            work.notify(serial, block<void()>([&, i] { ++notified[i]; }));
+        }
     });
-    threads.emplace_back([&] {
-        for (int i = 0; i < kRounds / 10; ++i)
-            EXPECT_EQ(work.wait(dispatch::time::after(plr::test::kBound)), 0);
-    });
-    for (auto& each : threads)
-        each.join();
     drain(serial);
     EXPECT_EQ(notified, std::vector<int>(kRounds, 1));
 }
@@ -88,19 +79,6 @@ TEST(Group, SessionsLeaveWithTheirLastCopy) {
     EXPECT_NE(work.wait(dispatch::immediately), 0);
     copy.reset();
     EXPECT_EQ(work.wait(dispatch::immediately), 0);
-}
-
-TEST(Group, WorkersMayWaitForWorkThatIsQueued) {
-    constexpr int kWaiters = 30;
-    group done;
-    for (int i = 0; i < kWaiters; ++i) {
-        done.async(queue::global(), [] {
-            const group inner;
-            inner.async(queue::global(), [] {});
-            EXPECT_EQ(inner.wait(dispatch::time::after(plr::test::kBound)), 0);
-        });
-    }
-    EXPECT_EQ(done.wait(dispatch::time::after(plr::test::kBound)), 0);
 }
 
 TEST(Group, LeaveWithoutEnterStopsTheProcess) {

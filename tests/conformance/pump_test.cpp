@@ -10,14 +10,14 @@
 #include <vector>
 
 #include "dispatch/dispatch.h"
+#include "support/descriptors.h"
 #include "support/waiting.h"
 
 namespace {
 
 using dispatch::pump;
 using dispatch::queue;
-using plr::test::drain;
-using plr::test::kBound;
+using namespace plr::test;
 
 // Whether there is something to process, waited for unless `bound` says otherwise.
 bool isReadable(const pump& served, std::chrono::milliseconds bound = kBound) {
@@ -43,18 +43,15 @@ TEST(Pump, RunsWhatManyThreadsPostOnTheThreadThatPollsIt) {
     std::array<unsigned, kThreads> seen{};
     unsigned total = 0;
     unsigned faults = 0;
-    std::vector<std::thread> threads;
-    for (unsigned t = 0; t < kThreads; ++t)
-        threads.emplace_back([&, t] {
-            for (unsigned i = 0; i < kEach; ++i)
-                (t % 2 ? nested : served.queue()).async([&, t, i] {
-                    faults += seen[t]++ != i || std::this_thread::get_id() != here;
-                    ++total;
-                });
-        });
+    Threads threads(kThreads, [&](unsigned t) {
+        for (unsigned i = 0; i < kEach; ++i)
+            (t % 2 ? nested : served.queue()).async([&, t, i] {
+                faults += seen[t]++ != i || std::this_thread::get_id() != here;
+                ++total;
+            });
+    });
     serve(served, [&] { return total == kThreads * kEach; });
-    for (auto& each : threads)
-        each.join();
+    threads.join();
     EXPECT_EQ(total, kThreads * kEach);
     EXPECT_EQ(faults, 0u);
     served.process();  // for a wake-up that came too late
@@ -124,9 +121,8 @@ TEST(Pump, ServesWhateverTargetsIt) {
     timer.set_timer(dispatch::time::now(), dispatch::kOnce);
     timer.resume();
     serve(served, [&] { return ran == "t"; });
-    std::array<int, 2> ends{};
-    ASSERT_EQ(::pipe(ends.data()), 0);
-    const auto readable = dispatch::source::readable(ends[0], served.queue());
+    const Ends pipe;
+    const auto readable = dispatch::source::readable(pipe.out(), served.queue());
     bool closed = false;
     readable.set_event_handler(dispatch::block<void()>([&] {
         ran += 'r';
@@ -134,15 +130,13 @@ TEST(Pump, ServesWhateverTargetsIt) {
     }));
     readable.set_cancel_handler(dispatch::block<void()>([&] { closed = true; }));
     readable.resume();
-    ASSERT_EQ(::write(ends[1], "x", 1), 1);
+    pipe.put("x");
     serve(served, [&] { return closed; });
     const dispatch::group group;
     group.async(queue::create("elsewhere"), [] {});
     group.notify(nested, dispatch::block<void()>([&] { ran += 'g'; }));
     serve(served, [&] { return ran == "trg"; });
     EXPECT_EQ(ran, "trg");
-    for (const int end : ends)
-        ::close(end);
 }
 
 TEST(Pump, KeepsSuspendedWorkWithoutBeingReadable) {

@@ -13,33 +13,43 @@
 namespace {
 
 using dispatch::queue;
-using plr::test::drain;
-using plr::test::Event;
+using namespace plr::test;
 
-TEST(Queue, KeepsTheOrderOfEachProducerAndExcludesItself) {
-    constexpr int kProducers = 4;
-    constexpr int kEach = 20'000;
-    const auto serial = queue::create("serial");
-    std::array<int, kProducers> seen{};  // touched on the queue only
+// Queues of several levels, which some of the threads suspend meanwhile and some wait for.
+TEST(Queue, KeepsTheOrderOfEachThreadExcludesItselfAndLosesNothing) {
+    constexpr int kEach = 12'000;
+    constexpr unsigned kThreads = 6;
+    const auto target = queue::create("target");
+    const std::array levels = {target, queue::create("one", target),
+                               queue::create("two", queue::create("mid", target))};
+    std::array<std::array<int, levels.size()>, kThreads> seen{};  // touched on the target only
     int inside = 0;
     int faults = 0;
-    std::vector<std::thread> producers;
-    for (int producer = 0; producer < kProducers; ++producer) {
-        producers.emplace_back([&, producer] {
-            for (int i = 0; i < kEach; ++i) {
-                serial.async([&, producer, i] {
-                    faults += inside++ != 0;
-                    faults += seen[static_cast<unsigned>(producer)]++ != i;
-                    --inside;
-                });
-            }
-        });
-    }
-    for (auto& each : producers)
-        each.join();
-    drain(serial);
+    Threads(kThreads, [&](unsigned t) {
+        std::array<int, levels.size()> sent{};
+        for (unsigned i = 0; i < kEach; ++i) {
+            const std::size_t level = (t + i) % levels.size();
+            const queue& on = levels[level];
+            const auto work = [&, t, level, number = sent[level]++] {
+                faults += inside++ != 0;
+                faults += seen[t][level]++ != number;
+                --inside;
+            };
+            if (t % 3 == 0)
+                on.suspend();
+            if (t % 3 == 1 && i % 4 == 0)
+                on.sync(work);
+            else
+                on.async(work);
+            if (t % 3 == 0)
+                on.resume();
+        }
+    });
+    for (const queue& each : levels)
+        drain(each);
     EXPECT_EQ(faults, 0);
-    EXPECT_EQ(seen, (std::array<int, kProducers>{kEach, kEach, kEach, kEach}));
+    for (const auto& each : seen)
+        EXPECT_EQ(each, (std::array{kEach / 3, kEach / 3, kEach / 3}));
 }
 
 TEST(Queue, RunsClosuresOfEverySizeAndDestroysThemOnTheQueue) {
@@ -135,7 +145,7 @@ TEST(Queue, GlobalQueuesRunAtOnceAndByPriority) {
         EXPECT_TRUE(started.wait());
     for (int i = 0; i < 3; ++i)
         release.signal();
-    EXPECT_EQ(waiting.wait(dispatch::time::after(plr::test::kBound)), 0);
+    EXPECT_EQ(waiting.wait(dispatch::time::after(kBound)), 0);
     EXPECT_EQ(queue::global().sync([] { return 3; }), 3);
 }
 

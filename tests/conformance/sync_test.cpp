@@ -11,8 +11,8 @@
 namespace {
 
 using dispatch::queue;
-using plr::test::drain;
-using plr::test::Event;
+using dispatch::time;
+using namespace plr::test;
 
 TEST(Sync, RunsInPlaceOnAnIdleQueueAndReturnsTheResult) {
     const auto serial = queue::create("serial");
@@ -49,40 +49,6 @@ TEST(Sync, WaitsItsTurnOnABusyQueueAndThenRunsOnTheCallersThread) {
     EXPECT_EQ(order, 4);
 }
 
-TEST(Sync, FromManyThreadsAtOnceMixedWithAsyncLosesNothing) {
-    constexpr int kThreads = 6;
-    constexpr int kEach = 4'000;
-    const auto target = queue::create("target");
-    const std::vector<queue> levels = {target, queue::create("one", target),
-                                       queue::create("two", queue::create("mid", target))};
-    int counted = 0;
-    int inside = 0;
-    int faults = 0;
-    std::vector<std::thread> threads;
-    for (int t = 0; t < kThreads; ++t) {
-        threads.emplace_back([&, t] {
-            for (int i = 0; i < kEach; ++i) {
-                const queue& on = levels[static_cast<unsigned>(t + i) % levels.size()];
-                const auto work = [&] {
-                    faults += inside++ != 0;
-                    ++counted;
-                    --inside;
-                };
-                if (i % 3 == 0)
-                    on.async(work);
-                else
-                    on.sync(work);
-            }
-        });
-    }
-    for (auto& each : threads)
-        each.join();
-    for (const queue& each : levels)
-        drain(each);
-    EXPECT_EQ(counted, kThreads * kEach);
-    EXPECT_EQ(faults, 0);
-}
-
 TEST(Sync, OntoTheQueueOneIsOnStopsTheProcess) {
     const auto target = queue::create("upper");
     const auto child = queue::create("lower", target);
@@ -93,47 +59,45 @@ TEST(Sync, OntoTheQueueOneIsOnStopsTheProcess) {
     EXPECT_DEATH(child.sync([&] { other.sync([&] { child.sync([] {}); }); }), "'lower'");
 }
 
-// Many more workers than processors wait in sync() for work that is queued
-// behind them.
-TEST(Sync, BlockedWorkersAreReplaced) {
+// Many more workers than processors wait for what is queued behind them: in sync(), for a
+// group, and where the pool cannot see it. Others are served meanwhile.
+TEST(Sync, WorkersThatWaitAreReplaced) {
     constexpr int kWaiters = 40;
-    const auto busy = queue::create("busy");
-    Event release;
-    busy.async([&] { EXPECT_TRUE(release.wait()); });
-    dispatch::group all;
-    std::atomic<int> started{0};
-    std::atomic<int> finished{0};
-    Event everybody;
-    for (int i = 0; i < kWaiters; ++i) {
-        all.async(queue::global(), [&] {
-            if (++started == kWaiters)
-                everybody.signal();
-            busy.sync([&] { ++finished; });
-        });
+    struct Held {
+        const queue busy = queue::create("busy");
+        const dispatch::group awaited;
+        Event event;
+    };
+    const std::pair<const char*, void (*)(Held&)> rows[] = {
+        {"sync", [](Held& held) { held.busy.sync([] {}); }},
+        {"group", [](Held& held) { EXPECT_EQ(held.awaited.wait(time::after(kBound)), 0); }},
+        {"elsewhere", [](Held& held) { EXPECT_TRUE(held.event.wait()); }},
+    };
+    for (const auto& [name, wait] : rows) {
+        SCOPED_TRACE(name);
+        Held held;
+        held.busy.suspend();
+        held.awaited.enter();
+        const dispatch::group all;
+        std::atomic<int> started{0};
+        Event everybody;
+        for (int i = 0; i < kWaiters; ++i)
+            all.async(queue::global(), [&, wait = wait] {
+                if (++started == kWaiters)
+                    everybody.signal();
+                wait(held);
+            });
+        EXPECT_TRUE(everybody.wait());
+        const auto timed = queue::create("timed");
+        timed.after(time::after(std::chrono::milliseconds(1)), dispatch::block<void()>([&] {
+                        held.busy.resume();
+                        held.awaited.leave();
+                        for (int i = 0; i < kWaiters; ++i)
+                            held.event.signal();
+                    }));
+        EXPECT_EQ(all.wait(time::after(kBound)), 0);
+        drain(timed);
     }
-    EXPECT_TRUE(everybody.wait());
-    queue::global().async([&] { release.signal(); });
-    EXPECT_EQ(all.wait(dispatch::time::after(plr::test::kBound)), 0);
-    EXPECT_EQ(finished, kWaiters);
-}
-
-// The pool cannot see these block.
-TEST(Sync, WorkersThatBlockElsewhereDoNotStopTheRest) {
-    constexpr int kBlocked = 24;
-    Event release;
-    dispatch::group all;
-    for (int i = 0; i < kBlocked; ++i)
-        all.async(queue::create("blocked"), [&] { EXPECT_TRUE(release.wait()); });
-    Event ran;
-    queue::create("free").async([&] { ran.signal(); });
-    EXPECT_TRUE(ran.wait());
-    Event timer;
-    queue::create("timed").after(dispatch::time::after(std::chrono::milliseconds(1)),
-                                 dispatch::block<void()>([&] { timer.signal(); }));
-    EXPECT_TRUE(timer.wait());
-    for (int i = 0; i < kBlocked; ++i)
-        release.signal();
-    EXPECT_EQ(all.wait(dispatch::time::after(plr::test::kBound)), 0);
 }
 
 }  // namespace

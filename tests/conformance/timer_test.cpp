@@ -10,9 +10,7 @@ namespace {
 using dispatch::block;
 using dispatch::queue;
 using dispatch::source;
-using plr::test::drain;
-using plr::test::Event;
-using plr::test::ManualCalendar;
+using namespace plr::test;
 using namespace std::chrono_literals;
 
 struct WallTimer {
@@ -148,10 +146,11 @@ TEST(TimerSource, HandlersNeverRunTwoAtOnce) {
     EXPECT_TRUE(cancelled.wait());
 }
 
-TEST(Source, SuspendedFiringsAreDeliveredOnResumeAsOne) {
+TEST(Source, SetAnewWhileSuspendedItsFiringsAreDeliveredOnResumeAsOne) {
     ManualCalendar calendar;
-    WallTimer timer(1s, 1s);
+    WallTimer timer(1h);
     timer.timer.suspend();
+    timer.timer.set_timer(dispatch::time::after(1s, dispatch::clock::wall), 1s);
     calendar.step(1s);
     calendar.step(1s);
     EXPECT_EQ(timer.count(), 0u);
@@ -163,34 +162,30 @@ TEST(Source, SuspendedFiringsAreDeliveredOnResumeAsOne) {
 // Handles, arming and cancelling on several threads, firing meanwhile: the
 // cancel handler runs once each and everything is freed.
 TEST(Source, ManyThreadsMakeArmAndCancel) {
-    constexpr int kThreads = 4;
+    constexpr unsigned kThreads = 4;
     constexpr int kRounds = 2'000;
     std::atomic<int> cancelled{0};
     const auto serial = queue::create("serial");
     const dispatch::group all;
-    std::vector<std::jthread> threads;
-    for (int i = 0; i < kThreads; ++i)
-        threads.emplace_back([&, i] {
-            for (int round = 0; round < kRounds; ++round) {
-                const auto& on = i % 2 == 0 ? serial : queue::global();
-                const auto timer = source::timer(on);
-                all.enter();
-                timer.set_event_handler(block<void()>([timer] { timer.cancel(); }));
-                timer.set_cancel_handler(block<void()>([&] {
-                    ++cancelled;
-                    all.leave();
-                }));
-                timer.set_timer(dispatch::time::after(std::chrono::microseconds(round % 64)), 1us);
-                timer.resume();
-                if (round % 3 == 0)
-                    timer.suspend();
-                if (round % 3 != 1)
-                    timer.cancel();
-            }
-        });
-    threads.clear();
-    EXPECT_EQ(all.wait(dispatch::time::after(plr::test::kBound)), 0);
-    EXPECT_EQ(cancelled, kThreads * kRounds);
+    Threads(kThreads, [&](unsigned i) {
+        for (int round = 0; round < kRounds; ++round) {
+            const auto timer = source::timer(i % 2 == 0 ? serial : queue::global());
+            all.enter();
+            timer.set_event_handler(block<void()>([timer] { timer.cancel(); }));
+            timer.set_cancel_handler(block<void()>([&] {
+                ++cancelled;
+                all.leave();
+            }));
+            timer.set_timer(dispatch::time::after(round % 64 * 1us), 1us);
+            timer.resume();
+            if (round % 3 == 0)
+                timer.suspend();
+            if (round % 3 != 1)
+                timer.cancel();
+        }
+    });
+    EXPECT_EQ(all.wait(dispatch::time::after(kBound)), 0);
+    EXPECT_EQ(cancelled, int{kThreads} * kRounds);
 }
 
 }  // namespace

@@ -4,10 +4,10 @@
 #include <atomic>
 #include <cerrno>
 #include <string>
-#include <thread>
 
 #include "Pelorin"
 #include "support/debug_records.h"
+#include "support/waiting.h"
 
 namespace {
 
@@ -53,12 +53,10 @@ TEST(DebugPrint, AReplacedDelegateIsCalledNoMoreWhileThreadsPrint) {
     const PelorinDebugDelegate quiet = [](void*, const char*, const char*) {};
     PelorinDebugSetDelegate(quiet, nullptr);
     std::atomic<bool> stop = false;
-    std::array<std::jthread, 3> threads;
-    for (std::jthread& thread : threads)
-        thread = std::jthread([&stop] {
-            while (!stop)
-                PelorinDebugPrint("thread", "text");
-        });
+    plr::test::Threads threads(3, [&stop](unsigned) {
+        while (!stop)
+            PelorinDebugPrint("thread", "text");
+    });
     std::array<Delegate, 200> delegates;
     for (Delegate& delegate : delegates) {
         PelorinDebugSetDelegate(
@@ -76,8 +74,7 @@ TEST(DebugPrint, AReplacedDelegateIsCalledNoMoreWhileThreadsPrint) {
         delegate.replaced = true;
     }
     stop = true;
-    for (std::jthread& thread : threads)
-        thread.join();
+    threads.join();
     PelorinDebugSetDelegate(nullptr, nullptr);
     for (const Delegate& delegate : delegates)
         EXPECT_FALSE(delegate.calledLate);

@@ -18,6 +18,7 @@
 #include <utility>
 
 #include "Pelorin"
+#include "support/descriptors.h"
 #include "support/waiting.h"
 
 namespace {
@@ -34,41 +35,8 @@ extern "C" __attribute__((visibility("default"))) int ppoll(pollfd* descriptors,
 
 namespace {
 
+using plr::test::Ends;
 constexpr std::uint32_t kLongest = 0xFFFFFFFE;  // of those that end: 49 days
-
-// Two descriptors of one connection: a pipe, or sockets that keep the limits of messages.
-class Ends {
-  public:
-    enum class Kind { pipe, packets };
-    explicit Ends(Kind kind = Kind::pipe) {
-        const int failed = kind == Kind::pipe
-                               ? ::pipe2(ends_.data(), O_CLOEXEC)
-                               : ::socketpair(AF_UNIX, SOCK_SEQPACKET, 0, ends_.data());
-        if (failed != 0)
-            std::abort();
-    }
-    ~Ends() {
-        ::close(ends_[0]);
-        closeIn();
-    }
-    Ends(const Ends&) = delete;
-    Ends& operator=(const Ends&) = delete;
-    [[nodiscard]] int out() const { return ends_[0]; }
-    [[nodiscard]] int in() const { return ends_[1]; }
-    const Ends& put(const std::string& text) const {
-        EXPECT_EQ(::write(in(), text.data(), text.size()), static_cast<ssize_t>(text.size()));
-        return *this;
-    }
-    void closeIn() { ::close(std::exchange(ends_[1], -1)); }
-    // The read end moves to `number`.
-    void renumber(int number) {
-        ASSERT_EQ(::dup2(ends_[0], number), number);
-        ::close(std::exchange(ends_[0], number));
-    }
-
-  private:
-    std::array<int, 2> ends_{};
-};
 
 // A read of up to four bytes.
 struct Read {
@@ -90,7 +58,7 @@ TEST(Descriptor, AReadEndsForOneOfTheseReasons) {
     unblock.put("u");
     Ends ended;
     ended.closeIn();
-    Ends hungUp(Ends::Kind::packets);
+    Ends hungUp(SOCK_SEQPACKET);
     hungUp.closeIn();
     constexpr int kNotOpen = 987;
     struct {
@@ -121,19 +89,18 @@ TEST(Descriptor, AReadEndsForOneOfTheseReasons) {
 }
 
 TEST(Descriptor, NumbersFrom1024OnWork) {
-    rlimit limit{};
-    ::getrlimit(RLIMIT_NOFILE, &limit);
-    limit.rlim_cur = std::min<rlim_t>(limit.rlim_max, 4096);
-    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &limit), 0);
-    Ends data;
-    data.renumber(1024);
-    Ends unblock;
-    unblock.renumber(2047);
+    const plr::test::DescriptorLimit limit(4096);
+    const Ends data;
+    const Ends unblock;
+    ASSERT_EQ(::dup2(data.out(), 1024), 1024);
+    ASSERT_EQ(::dup2(unblock.out(), 2047), 2047);
     data.put("abcd");
     EXPECT_EQ(Read(1024, 2047, 0).result, 4);
     EXPECT_EQ(Read(1024, 2047, 0).error, ETIMEDOUT);
     unblock.put("x");
     EXPECT_EQ(Read(1024, 2047, PELORIN_FOREVER).error, ECANCELED);
+    ::close(1024);
+    ::close(2047);
 }
 
 TEST(Descriptor, TimeOutsAreMilliseconds) {
@@ -169,7 +136,7 @@ TEST(Descriptor, ALongWaitEndsWhenDataComesOrTheUnblock) {
 }
 
 TEST(Descriptor, ToCompletionGoesOnUntilTheLength) {
-    Ends ends(Ends::Kind::packets);
+    Ends ends(SOCK_SEQPACKET);
     std::string text(5, '.');
     ends.put("ab").put("cde").put("x");
     EXPECT_TRUE(

@@ -15,12 +15,15 @@
 
 #include "Pelorin"
 #include "support/debug_records.h"
+#include "support/descriptors.h"
 
 namespace {
 
 constexpr std::uint32_t kCapacity = 8;
 constexpr std::uint32_t kFailed = 0xFFFFFFFF;
+constexpr int kSockets = SOCK_STREAM | SOCK_NONBLOCK;
 using Bytes = std::deque<std::uint8_t>;
+using plr::test::Ends;
 
 Bytes sequence(std::size_t count) {
     Bytes bytes(count);
@@ -94,33 +97,12 @@ struct State {
     }
 };
 
-class Pipe {
-  public:
-    Pipe() {
-        if (::pipe2(ends_.data(), O_NONBLOCK) != 0)
-            std::abort();
-    }
-    ~Pipe() {
-        ::close(ends_[0]);
-        ::close(ends_[1]);
-    }
-    Pipe(const Pipe&) = delete;
-    Pipe& operator=(const Pipe&) = delete;
-    [[nodiscard]] int out() const { return ends_[0]; }
-    [[nodiscard]] int in() const { return ends_[1]; }
-    void put(const Bytes& bytes) const {
-        const std::string text(bytes.begin(), bytes.end());
-        EXPECT_EQ(::write(in(), text.data(), text.size()), static_cast<ssize_t>(text.size()));
-    }
-    [[nodiscard]] Bytes takeAll() const {
-        std::array<std::uint8_t, 64> bytes;
-        const ssize_t count = std::max<ssize_t>(0, ::read(out(), bytes.data(), bytes.size()));
-        return {bytes.begin(), bytes.begin() + count};
-    }
-
-  private:
-    std::array<int, 2> ends_{};
-};
+// Whatever can be read from `ends` now.
+Bytes takeAll(const Ends& ends) {
+    std::array<std::uint8_t, 64> bytes;
+    const ssize_t count = std::max<ssize_t>(0, ::read(ends.out(), bytes.data(), bytes.size()));
+    return {bytes.begin(), bytes.begin() + count};
+}
 
 // A consumer that refuses from the piece number `refuseFrom` on.
 struct Consumer {
@@ -141,7 +123,7 @@ struct Consumer {
 bool readFromPipe(PelorinTransport* transport, void* buffer, std::uint32_t length,
                   std::uint32_t* count, bool toCompletion, std::uint32_t timeoutMs, void* null) {
     EXPECT_TRUE(!toCompletion && timeoutMs == 12 && null == nullptr);
-    const ssize_t got = ::read(static_cast<Pipe*>(transport->state)->out(), buffer, length);
+    const ssize_t got = ::read(static_cast<Ends*>(transport->state)->out(), buffer, length);
     *count = static_cast<std::uint32_t>(std::max<ssize_t>(got, 0));
     return got >= 0;
 }
@@ -153,25 +135,25 @@ void insertRaw(State& state, std::uint32_t count) {
 }
 
 void insertFd(State& state, std::uint32_t count) {
-    const Pipe pipe;
+    const Ends pipe(kSockets);
     const Bytes more = sequence(count);
-    pipe.put(more);
+    pipe.put({more.begin(), more.end()});
     EXPECT_EQ(PelorinRingBufferInsertFDUnblockable(*state, pipe.out(), -1, count, 0),
               static_cast<std::int32_t>(state.model.insert(more)));
     EXPECT_EQ(PelorinRingBufferInsertFDUnblockable(*state, -1, -1, count, 0), -9);
 }
 
 void insertTransport(State& state, std::uint32_t count) {
-    Pipe pipe;
+    Ends pipe(kSockets);
     PelorinTransport transport{};
     EXPECT_EQ(PelorinRingBufferInsertTransport(*state, &transport, count, 12), kFailed);
     transport.read = &readFromPipe;
     transport.state = &pipe;
     const Bytes more = sequence(count);
-    pipe.put(more);
+    pipe.put({more.begin(), more.end()});
     const std::uint32_t expected = state.model.insert(more);
     EXPECT_EQ(PelorinRingBufferInsertTransport(*state, &transport, count, 12), expected);
-    static_cast<void>(pipe.takeAll());
+    static_cast<void>(takeAll(pipe));
     if (state.model.room() > 0 && count > 0) {  // an empty pipe fails
         EXPECT_EQ(PelorinRingBufferInsertTransport(*state, &transport, count, 12), kFailed);
     }
@@ -187,11 +169,11 @@ void extractRaw(State& state, std::uint32_t most) {
 }
 
 void extractFd(State& state, std::uint32_t most) {
-    const Pipe pipe;
+    const Ends pipe(kSockets);
     const Bytes expected = state.model.extract(most);
     EXPECT_EQ(PelorinRingBufferExtractFD(*state, pipe.in(), most),
               static_cast<std::int32_t>(expected.size()));
-    EXPECT_EQ(pipe.takeAll(), expected);
+    EXPECT_EQ(takeAll(pipe), expected);
 }
 
 // What cannot be written is removed, and its error number stands for its bytes.
@@ -310,7 +292,7 @@ TEST(RingBuffer, TakesPowersOfTwoOnly) {
     EXPECT_FALSE(PelorinRingBufferInitialize(&none, storage.data(), 6));
     EXPECT_EQ(records.take().back(),
               "PelorinRingBufferInitialize: Capacity 6 is not a power of two\n");
-    ASSERT_TRUE(PelorinRingBufferInitialize(&none, storage.data(), 0));
+    ASSERT_TRUE(PelorinRingBufferInitialize(&none, nullptr, 0));
     EXPECT_EQ(PelorinRingBufferInsertRaw(&none, "abc", 3), 0u);
     EXPECT_TRUE(PelorinRingBufferLinearize(&none));
 }

@@ -2,19 +2,17 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <poll.h>
 #include <unistd.h>
 
 #include <array>
 #include <stdexcept>
 #include <string>
 
-#include "support/waiting.h"
+#include "io/open_transport.h"
 
 namespace {
 
-using plr::test::ModemScript;
-using plr::test::ScriptedModem;
+using namespace plr::test;
 
 constexpr auto kScript = R"(# A small modem.
 AT+CSQ
@@ -34,7 +32,9 @@ ATL*
 class Client {
   public:
     explicit Client(const ScriptedModem& modem)
-        : fd_(::open(modem.path().c_str(), O_RDWR | O_NOCTTY | O_NONBLOCK)) {}
+        : fd_(::open(modem.path().c_str(), O_RDWR | O_NOCTTY | O_NONBLOCK)) {
+        EXPECT_TRUE(PelorinTransportCreateWithFD(&transport_, fd_));
+    }
     Client(const Client&) = delete;
     Client& operator=(const Client&) = delete;
     ~Client() { ::close(fd_); }
@@ -42,31 +42,20 @@ class Client {
     [[nodiscard]] bool write(const std::string& bytes) const {
         return ::write(fd_, bytes.data(), bytes.size()) == static_cast<ssize_t>(bytes.size());
     }
-    [[nodiscard]] std::string read(std::size_t count) const {
-        std::string bytes;
-        while (bytes.size() < count) {
-            const std::string part = readOnce(count - bytes.size());
-            if (part.empty())
-                break;
-            bytes += part;
-        }
-        return bytes;
-    }
+    [[nodiscard]] std::string read(std::size_t count) { return get(count, true); }
     // Empty when the line is gone.
-    [[nodiscard]] std::string readOnce(std::size_t most) const {
-        pollfd wait = {.fd = fd_, .events = POLLIN, .revents = 0};
-        std::string bytes(most, '\0');
-        ::poll(&wait, 1, 60'000);
-        const ssize_t count = ::read(fd_, bytes.data(), most);
-        bytes.resize(count > 0 ? static_cast<std::size_t>(count) : 0);
-        return bytes;
-    }
-    [[nodiscard]] std::string ask(const std::string& command, const std::string& expected) const {
+    [[nodiscard]] std::string readOnce(std::size_t most) { return get(most, false); }
+    [[nodiscard]] std::string ask(const std::string& command, const std::string& expected) {
         return write(command) ? read(expected.size()) : "not written";
     }
 
   private:
-    int fd_;
+    std::string get(std::size_t count, bool toCompletion) {
+        return transport_.get(static_cast<std::uint32_t>(count), toCompletion, 60'000).second;
+    }
+
+    const int fd_;
+    OpenTransport transport_;
 };
 
 TEST(ScriptedModem, AnswersAsTheScriptSays) {
@@ -96,7 +85,7 @@ TEST(ScriptedModem, AnswersAsTheScriptSays) {
 
 TEST(ScriptedModem, SpeaksOnItsOwnAlsoInPieces) {
     ScriptedModem modem((ModemScript()));
-    const Client client(modem);
+    Client client(modem);
     EXPECT_TRUE(modem.say("RING"));
     EXPECT_TRUE(modem.sayBytes(std::string("\0\xFF", 2)));
     EXPECT_EQ(client.read(10), std::string("\r\nRING\r\n\0\xFF", 10));
@@ -114,7 +103,7 @@ TEST(ScriptedModem, SpeaksOnItsOwnAlsoInPieces) {
 
 TEST(ScriptedModem, TakesNothingWhilePaused) {
     ScriptedModem modem((ModemScript()));
-    const Client client(modem);
+    Client client(modem);
     modem.pauseReading();
     while (client.write("AT\r")) {  // until the terminal is full
     }
@@ -125,7 +114,7 @@ TEST(ScriptedModem, TakesNothingWhilePaused) {
 
 TEST(ScriptedModem, IsGoneWhenItHungUp) {
     ScriptedModem modem((ModemScript()));
-    const Client client(modem);
+    Client client(modem);
     modem.hangUp();
     EXPECT_EQ(client.readOnce(1), "");
     EXPECT_FALSE(client.write("AT\r"));

@@ -9,12 +9,12 @@
 #include <unistd.h>
 
 #include <chrono>
-#include <mutex>
 #include <string>
 #include <string_view>
 #include <utility>
 
-#include "Pelorin"
+#include "io/open_transport.h"
+#include "support/debug_records.h"
 #include "support/waiting.h"
 
 namespace plr::test {
@@ -79,56 +79,6 @@ class SerialLine {
   private:
     int far_ = -1;
     std::string path_;
-};
-
-// A transport that ends with its scope.
-struct OpenTransport : PelorinTransport {
-    OpenTransport() : PelorinTransport{} {}
-    OpenTransport(const OpenTransport&) = delete;
-    OpenTransport& operator=(const OpenTransport&) = delete;
-    ~OpenTransport() { PelorinTransportFree(this); }
-
-    bool put(std::string_view bytes) {
-        std::uint32_t count = 0;
-        const bool written = write(this, bytes.data(), static_cast<std::uint32_t>(bytes.size()),
-                                   &count, true, 0, nullptr);
-        EXPECT_EQ(written, count == bytes.size());
-        return written;
-    }
-    // Whether a read succeeded, and what it got.
-    using Got = std::pair<bool, std::string>;
-    Got get(std::uint32_t length, bool toCompletion = false,
-            std::uint32_t timeoutMs = PELORIN_FOREVER) {
-        Got got{false, std::string(length, '\0')};
-        std::uint32_t count = 0;
-        got.first = read(this, got.second.data(), length, &count, toCompletion, timeoutMs, nullptr);
-        got.second.resize(count);
-        return got;
-    }
-};
-
-// What is printed while it lives.
-class DebugTexts {
-  public:
-    DebugTexts() { PelorinDebugSetDelegate(&DebugTexts::add, this); }
-    DebugTexts(const DebugTexts&) = delete;
-    DebugTexts& operator=(const DebugTexts&) = delete;
-    ~DebugTexts() { PelorinDebugSetDelegate(nullptr, nullptr); }
-
-    [[nodiscard]] std::string take() {
-        const std::lock_guard guard(mutex_);
-        return std::exchange(texts_, {});
-    }
-
-  private:
-    static void add(void* self, const char* /*function*/, const char* text) {
-        auto& texts = *static_cast<DebugTexts*>(self);
-        const std::lock_guard guard(texts.mutex_);
-        texts.texts_ += text;
-    }
-
-    std::mutex mutex_;
-    std::string texts_;
 };
 
 }  // namespace plr::test

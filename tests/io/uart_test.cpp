@@ -9,12 +9,7 @@
 
 namespace {
 
-namespace device = plr::test::device;
-using plr::test::DebugTexts;
-using plr::test::Event;
-using plr::test::eventually;
-using plr::test::OpenTransport;
-using plr::test::SerialLine;
+using namespace plr::test;
 using Got = OpenTransport::Got;
 
 PelorinUARTTimeoutConfig timedConfig(const std::string& path, std::uint32_t queue = 4096) {
@@ -133,7 +128,7 @@ TEST(Uart, SaysWhyItCannotBeCreated) {
     for (const Row& row : rows) {
         SCOPED_TRACE(row.name);
         const SerialLine line;
-        DebugTexts texts;
+        DebugRecords texts;
         device::path = row.path ? row.path : line.path();
         device::baudPercent = row.baudPercent;
         device::threadsLeft = row.threads;
@@ -151,7 +146,7 @@ TEST(Uart, SaysWhyItCannotBeCreated) {
         }
         device::baudPercent = 100;
         device::threadsLeft = -1;
-        EXPECT_EQ(texts.take(), first + "\n" + row.text);
+        EXPECT_EQ(texts.takeText(), first + "\n" + row.text);
         EXPECT_EQ(transport.free, nullptr);
     }
     OpenTransport transport;
@@ -179,7 +174,7 @@ TEST(Uart, EveryCallReturnsWhenTheLineIsUnplugged) {
         {"flush", false,
          [](OpenTransport& t) { EXPECT_TRUE(eventually([&] { return !t.flushRead(&t); })); }},
         {"teardown", false, [](OpenTransport& t) { EXPECT_TRUE(PelorinTransportFree(&t)); }}};
-    DebugTexts texts;
+    DebugRecords texts;
     for (const Kind& kind : kKinds) {
         for (const Call& call : calls) {
             SCOPED_TRACE(std::string(kind.name) + ", " + call.name);
@@ -204,24 +199,6 @@ TEST(Uart, EveryCallReturnsWhenTheLineIsUnplugged) {
                 // whether it has a line.
                 EXPECT_EQ(transport.isValid(&transport), kind.create == createSerial);
             }
-        }
-    }
-}
-
-TEST(Uart, OneUnblockEndsOneRead) {
-    for (const Kind& kind : kKinds) {
-        SCOPED_TRACE(kind.name);
-        const SerialLine line;
-        OpenTransport transport;
-        ASSERT_TRUE(kind.create(&transport, line));
-        const bool unblockedIsSuccess = kind.create == createSerial;
-        for (int i = 0; i < 100; ++i) {
-            std::thread other([&] { EXPECT_TRUE(transport.unblockRead(&transport)); });
-            EXPECT_EQ(transport.get(1), (Got{unblockedIsSuccess, ""}));
-            other.join();
-            std::thread sender([&] { line.send("x"); });
-            EXPECT_EQ(transport.get(1), (Got{true, "x"}));
-            sender.join();
         }
     }
 }
@@ -293,10 +270,10 @@ TEST(Uart, DiscardsTheQueuesOfTheDriver) {
     EXPECT_TRUE(PelorinTransportUARTFlushOutput(&transport));
     EXPECT_EQ(device::discarded, before + 1);
     line.unplug();
-    DebugTexts texts;
+    DebugRecords texts;
     EXPECT_FALSE(PelorinTransportUARTFlushInput(&transport));
     EXPECT_FALSE(PelorinTransportUARTFlushOutput(&transport));
-    EXPECT_EQ(texts.take(),
+    EXPECT_EQ(texts.takeText(),
               "Failed to read flush, err = Input/output error (5)\n"
               "Failed to write flush, err = Input/output error (5)\n");
 }
@@ -322,6 +299,20 @@ TEST(Uart, ClosingGivesUpOnALineThatTakesNothing) {
         device::unsent = nullptr;
         EXPECT_EQ(device::discarded > before, row.discards);
     }
+}
+
+TEST(Uart, DescriptorZeroIsNoPortAndStaysOpen) {
+    const int standardInput = ::dup(0);
+    for (const Kind& kind : kKinds) {
+        SCOPED_TRACE(kind.name);
+        const SerialLine line;
+        OpenTransport transport;
+        ::close(0);
+        EXPECT_FALSE(kind.create(&transport, line));
+        EXPECT_EQ(::fcntl(0, F_GETFD), FD_CLOEXEC);
+    }
+    ::dup2(standardInput, 0);
+    ::close(standardInput);
 }
 
 }  // namespace

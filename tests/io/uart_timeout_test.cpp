@@ -15,12 +15,7 @@
 namespace {
 
 namespace fs = std::filesystem;
-using plr::test::DebugTexts;
-using plr::test::Event;
-using plr::test::eventually;
-using plr::test::kSanitized;
-using plr::test::OpenTransport;
-using plr::test::SerialLine;
+using namespace plr::test;
 using Got = OpenTransport::Got;
 
 void create(OpenTransport& transport, const SerialLine& line, std::uint32_t queue = 4096) {
@@ -167,12 +162,10 @@ TEST(TimedUart, WritesKeepTheirOrder) {
     const SerialLine line;
     OpenTransport transport;
     create(transport, line);
-    std::vector<std::thread> writers;
-    for (int writer = 0; writer < kWriters; ++writer)
-        writers.emplace_back([&, writer] {
-            for (int i = 0; i < kWrites; ++i)
-                EXPECT_TRUE(transport.put(block(writer, i)));
-        });
+    const Threads writers(kWriters, [&](unsigned writer) {
+        for (int i = 0; i < kWrites; ++i)
+            EXPECT_TRUE(transport.put(block(static_cast<int>(writer), i)));
+    });
     int next[kWriters] = {};
     for (int i = 0; i < kWriters * kWrites; ++i) {
         const std::string got = line.receive(kLength);
@@ -180,8 +173,6 @@ TEST(TimedUart, WritesKeepTheirOrder) {
         ASSERT_TRUE(writer >= 0 && writer < kWriters) << got;
         ASSERT_EQ(got, block(writer, next[writer]++));
     }
-    for (std::thread& writer : writers)
-        writer.join();
 }
 
 TEST(TimedUart, FullLineDelaysNobodyAndItsWritersFailAtTheEnd) {
@@ -190,7 +181,7 @@ TEST(TimedUart, FullLineDelaysNobodyAndItsWritersFailAtTheEnd) {
         const SerialLine line;
         OpenTransport transport;
         create(transport, line);
-        DebugTexts texts;
+        DebugRecords texts;
         {
             const auto write = [&] { EXPECT_FALSE(transport.put(std::string(1 << 20, 'w'))); };
             const Caller inMidWrite(write);
@@ -209,7 +200,7 @@ TEST(TimedUart, FullLineDelaysNobodyAndItsWritersFailAtTheEnd) {
             EXPECT_FALSE(inMidWrite.returned() || second.returned() || third.returned());
             EXPECT_TRUE(flush ? transport.flushRead(&transport) : PelorinTransportFree(&transport));
         }
-        EXPECT_EQ(texts.take(), flush ? "Flushing\n" : "Freeing\n");
+        EXPECT_EQ(texts.takeText(), flush ? "Flushing\n" : "Freeing\n");
         if (!flush)
             continue;
         ASSERT_TRUE(PelorinTransportFree(&transport));
@@ -277,7 +268,7 @@ TEST(TimedUart, LeavesNothingBehind) {
     const int cycles = kSanitized ? 500 : 10'000;
     const SerialLine line;
     const Traffic traffic(line);
-    DebugTexts texts;
+    DebugRecords texts;
     const std::size_t threads = entries("/proc/self/task");
     const std::size_t descriptors = entries("/proc/self/fd");
     for (int i = 0; i < cycles; ++i) {
@@ -286,7 +277,7 @@ TEST(TimedUart, LeavesNothingBehind) {
         ASSERT_TRUE(transport.put("traffic"));
         static_cast<void>(transport.get(100, false, 0));
         ASSERT_TRUE(PelorinTransportFree(&transport));
-        ASSERT_EQ(texts.take().find("ailed"), std::string::npos);
+        ASSERT_EQ(texts.takeText().find("ailed"), std::string::npos);
     }
     EXPECT_EQ(entries("/proc/self/fd"), descriptors);
     // A thread that was joined may be seen a moment longer.

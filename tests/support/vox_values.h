@@ -2,9 +2,7 @@
 
 #include <cstdint>
 #include <cstdlib>
-#include <filesystem>
 #include <initializer_list>
-#include <iterator>
 #include <span>
 #include <string>
 #include <string_view>
@@ -12,6 +10,7 @@
 #include <vector>
 
 #include "platform/linux/vox/codec.h"
+#include "support/descriptors.h"
 
 // Vox values and their encodings, short to write.
 namespace plr::test {
@@ -90,12 +89,6 @@ inline std::pair<Ref, std::string> decode(std::span<const std::uint8_t> data,
     const char* why = nullptr;
     Ref value(vox_wire::decode(data, descriptors, limits, why));
     return {value, why ? why : ""};
-}
-
-// Descriptors that this process has open.
-inline std::size_t openDescriptors() {
-    return static_cast<std::size_t>(
-        std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {}));
 }
 
 }  // namespace plr::test
