@@ -1,5 +1,4 @@
 #include <gtest/gtest.h>
-#include <unistd.h>
 
 #include <atomic>
 #include <cstdio>
@@ -7,14 +6,14 @@
 #include <vector>
 
 #include "dispatch/dispatch.h"
+#include "support/descriptors.h"
 #include "support/sanitized.h"
 #include "support/waiting.h"
 
 namespace {
 
 using dispatch::queue;
-using plr::test::Event;
-using plr::test::eventually;
+using namespace plr::test;
 
 unsigned workers() {
     unsigned count = 0;
@@ -23,7 +22,7 @@ unsigned workers() {
 }
 
 TEST(Load, TenThousandQueuesKeepTheirOrder) {
-    const int each = plr::test::kSanitized ? 10 : 1'000;
+    const int each = kSanitized ? 10 : 1'000;
     struct Line {
         queue on = queue::create("one of many");
         int next = 0;
@@ -34,7 +33,7 @@ TEST(Load, TenThousandQueuesKeepTheirOrder) {
         for (Line& line : lines)
             line.on.async([&line, i] { line.faults += line.next++ != i; });
     for (Line& line : lines) {
-        plr::test::drain(line.on);
+        drain(line.on);
         ASSERT_EQ(line.next, each);
         ASSERT_EQ(line.faults, 0);
     }
@@ -44,10 +43,9 @@ TEST(Load, TenThousandQueuesKeepTheirOrder) {
 // seen before included as soon as one of the blocked ones ends.
 TEST(Load, WorkThatBlocksHoldsUpNoOtherQueue) {
     constexpr unsigned kBlocks = 1'000;
-    int pipes[2];
-    ASSERT_EQ(::pipe(pipes), 0);
+    const Ends pipe;
     const auto other = queue::create("other");
-    plr::test::drain(other);
+    drain(other);
     Event served;
     other.async([&] { served.signal(); });
     ASSERT_TRUE(served.wait());
@@ -56,7 +54,7 @@ TEST(Load, WorkThatBlocksHoldsUpNoOtherQueue) {
     for (unsigned i = 0; i < kBlocks; ++i)
         blocked.emplace_back(queue::create("blocked")).async([&] {
             char one;
-            EXPECT_EQ(::read(pipes[0], &one, 1), 1);
+            EXPECT_EQ(::read(pipe.out(), &one, 1), 1);
             ++ended;
         });
     do {
@@ -68,12 +66,9 @@ TEST(Load, WorkThatBlocksHoldsUpNoOtherQueue) {
         ASSERT_TRUE(served.wait());
     }
     EXPECT_EQ(ended, 0u);
-    const std::vector<char> bytes(kBlocks);
-    ASSERT_EQ(::write(pipes[1], bytes.data(), kBlocks), static_cast<ssize_t>(kBlocks));
+    pipe.put(std::string(kBlocks, 'x'));
     EXPECT_TRUE(eventually([&] { return ended == kBlocks; }));
     EXPECT_TRUE(eventually([] { return workers() < 16; }));
-    ::close(pipes[0]);
-    ::close(pipes[1]);
 }
 
 }  // namespace

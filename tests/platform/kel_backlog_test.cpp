@@ -1,14 +1,13 @@
 // Logs that are slow, full, away, back.
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cstdint>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "kel/kel.h"
+#include "support/child.h"
 #include "support/fake_log.h"
 
 namespace {
@@ -41,19 +40,17 @@ TEST_F(KelBacklog, BytesAreLimitedTooButOneMessageOfAnySizeIsTaken) {
 
 // Every thread's messages arrive in order; with one thread, every gap is where
 // its messages are missing.
-struct KelFlood : KelBacklog, testing::WithParamInterface<std::size_t> {};
-INSTANTIATE_TEST_SUITE_P(Threads, KelFlood, testing::Values(1, 4));
+struct KelFlood : KelBacklog, testing::WithParamInterface<unsigned> {};
+INSTANTIATE_TEST_SUITE_P(Threads, KelFlood, testing::Values(1u, 4u));
 
 TEST_P(KelFlood, IsInOrderAndAccountedForMessageByMessage) {
-    const std::size_t threads = GetParam();
+    const unsigned threads = GetParam();
     limitMessages(client, 40);
     constexpr std::uint64_t kEach = 3000;
-    std::vector<std::jthread> writers;
-    for (std::size_t t = 0; t < threads; t++)
-        writers.emplace_back([this, t] {
-            for (std::uint64_t i = 0; i < kEach; i++)
-                client.send({{"Thread", std::to_string(t)}, {"Number", std::to_string(i)}});
-        });
+    plr::test::Threads writers(threads, [this](unsigned t) {
+        for (std::uint64_t i = 0; i < kEach; i++)
+            client.send({{"Thread", std::to_string(t)}, {"Number", std::to_string(i)}});
+    });
     std::vector<std::uint64_t> next(threads, 0);
     std::uint64_t arrived = 0;
     std::uint64_t gaps = 0;
@@ -73,7 +70,7 @@ TEST_P(KelFlood, IsInOrderAndAccountedForMessageByMessage) {
         next[thread] = number + 1;
         arrived++;
     }
-    writers.clear();
+    writers.join();
     EXPECT_TRUE(kel_flush(client.handle, kLong));
     EXPECT_FALSE(journal.hasMore());
     EXPECT_EQ(client.statistics().sent, arrived);
@@ -137,14 +134,10 @@ TEST_F(KelBacklog, AConsoleThatNobodyReadsHoldsNobodyUp) {
 TEST_F(KelBacklog, AForkedChildLogsAndLeavesItsParentsBacklogAlone) {
     journal.stop();
     client.send("parent");
-    const pid_t child = ::fork();
-    if (child == 0) {
+    EXPECT_TRUE(plr::test::holdsInChild([&] {
         client.send("child");
-        ::_exit(client.statistics().sent == 1 && client.statistics().waiting == 0 ? 0 : 1);
-    }
-    int status = -1;
-    EXPECT_EQ(::waitpid(child, &status, 0), child);
-    EXPECT_EQ(status, 0);
+        return client.statistics().sent == 1 && client.statistics().waiting == 0;
+    }));
     EXPECT_NE(places.readConsole().find(": child\n"), std::string::npos);
     journal.start();
     EXPECT_EQ(journal.receiveField("MESSAGE"), "parent");

@@ -12,10 +12,9 @@
 
 namespace {
 
-using plr::test::FakeLog;
-using Client = plr::test::LogClient;
-using Kel = plr::test::LogClientFixture;
-using plr::test::JournalFields;
+using namespace plr::test;
+using Client = LogClient;
+using Kel = LogClientFixture;
 
 TEST_F(Kel, KeysAndLevelsBecomeFieldsByTheDocumentedRules) {
     const Client radiod("radiod", "local3");

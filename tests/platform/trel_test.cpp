@@ -1,10 +1,9 @@
 #include "trel/trel.h"
 
-#include <gtest/gtest.h>
-
 #include <array>
 #include <string>
-#include <thread>
+
+#include "support/waiting.h"
 
 namespace {
 
@@ -37,14 +36,10 @@ TEST(Trel, LivesOnWhenReleasedMoreOftenThanRetained) {
 
 TEST(Trel, ThreadsAgreeOnOneHandle) {
     std::array<trel_t, 4> found{};
-    {
-        std::array<std::jthread, 4> threads;
-        for (std::size_t i = 0; i < threads.size(); i++)
-            threads[i] = std::jthread([&slot = found[i]] {
-                for (int turn = 0; turn < 1000; turn++)
-                    slot = trel_create("test.threads", std::to_string(turn % 7).c_str());
-            });
-    }
+    plr::test::Threads(4, [&found](unsigned i) {
+        for (int turn = 0; turn < 1000; turn++)
+            found[i] = trel_create("test.threads", std::to_string(turn % 7).c_str());
+    });
     for (const trel_t handle : found)
         EXPECT_EQ(handle, found[0]);
     EXPECT_EQ(trel_get_reference_count(found[0]), 4 * 143);  // turns 5, 12, … of each thread

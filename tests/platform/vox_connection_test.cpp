@@ -28,15 +28,10 @@ TEST_F(VoxConnection, MessagesArriveInTheOrderSentFromBeforeTheResumeOn) {
 TEST_F(VoxConnection, EachThreadsMessagesKeepTheirOrder) {
     resumeBoth();
     constexpr std::int64_t kEach = 2000;
-    std::vector<std::thread> senders;
-    for (std::int64_t first = 0; first < 4 * kEach; first += kEach) {
-        senders.emplace_back([this, first] {
-            for (std::int64_t n = first; n < first + kEach; ++n)
-                EXPECT_EQ(left.send(message(n)), 0);
-        });
-    }
-    for (std::thread& sender : senders)
-        sender.join();
+    Threads(4, [this](unsigned thread) {
+        for (std::int64_t n = 0; n < kEach; ++n)
+            EXPECT_EQ(left.send(message(thread * kEach + n)), 0);
+    });
     ASSERT_TRUE(right.inbox.wait(4 * kEach));
     Numbers next = {0, kEach, 2 * kEach, 3 * kEach};
     for (const std::int64_t n : right.inbox.numbers())

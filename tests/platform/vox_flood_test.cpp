@@ -53,15 +53,6 @@ vox_limits_t limits() {
 Bytes request(std::uint64_t id, std::int64_t wish) {
     return frame({.type = frame_type::request, .id = id}, message(wish));
 }
-Bytes request(std::uint64_t id) {
-    return request(id, 1);
-}
-Bytes requestOfMuch(std::uint64_t id) {
-    return request(id, kBig);
-}
-Bytes requestWithoutAnswer(std::uint64_t id) {
-    return request(id, kHold);
-}
 Bytes requestGivenUp(std::uint64_t id) {
     return join({request(id, kHold), frame({.type = frame_type::cancel, .id = id}, Bytes{0xf6})});
 }
@@ -94,10 +85,10 @@ struct Attack {
     bool again;  // and again, else once
     bool reads;  // what comes back
 };
-constexpr Attack kAttacks[] = {
-    {request, 200, 100, true, true},
-    {requestOfMuch, 10, 20, true, false},
-    {requestWithoutAnswer, 100, 20, true, true},
+const Attack kAttacks[] = {
+    {[](std::uint64_t id) { return request(id, 1); }, 200, 100, true, true},
+    {[](std::uint64_t id) { return request(id, kBig); }, 10, 20, true, false},
+    {[](std::uint64_t id) { return request(id, kHold); }, 100, 20, true, true},
     {requestGivenUp, 100, 20, true, true},
     {ping, 200, 20, true, true},
     {partOfFrame, 1, 100, false, false},
@@ -218,7 +209,7 @@ Times askFor(steady_clock::duration length, const std::string& path) {
         const auto end = steady_clock::now() + length;
         for (std::uint64_t id = 1; steady_clock::now() < end; ++id) {
             const auto start = steady_clock::now();
-            client.send(request(id));
+            client.send(request(id, 1));
             const vox_link::frame_header answer = client.readFrame().first;
             const std::chrono::duration<double, std::milli> taken = steady_clock::now() - start;
             ASSERT_EQ(answer.type, frame_type::reply);

@@ -26,9 +26,7 @@ vox_connection_t clientOf(const char* name) {
 
 // That `made` ends at once.
 void expectEnd(vox_connection_t made, vox_error_code_t code, const char* why = "") {
-    Client ended(made);
-    EXPECT_EQ(ended.inbox.errorCode(), code);
-    EXPECT_NE(ended.inbox.errorText().find(why), std::string::npos) << ended.inbox.errorText();
+    Client(made).inbox.expectError(code, why);
 }
 void expectNobody(const char* name = kName) {
     expectEnd(clientOf(name), VOX_ERROR_CONNECTION_INTERRUPTED);
@@ -170,33 +168,15 @@ TEST_F(VoxListener, AClientThatTheHandlerDoesNotKeepIsRefused) {
     expectNobody();
 }
 
-// As many descriptors as are open now, and `more`.
-class DescriptorLimit {
-  public:
-    explicit DescriptorLimit(std::size_t more) {
-        EXPECT_EQ(::getrlimit(RLIMIT_NOFILE, &before_), 0);
-        const rlimit low = {openDescriptors() + more, before_.rlim_max};
-        EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &low), 0);
-    }
-    ~DescriptorLimit() { EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &before_), 0); }
-    DescriptorLimit(const DescriptorLimit&) = delete;
-    DescriptorLimit& operator=(const DescriptorLimit&) = delete;
-
-  private:
-    rlimit before_{};
-};
-
 TEST_F(VoxListener, DescriptorsThatCannotBeTakenEndTheConnection) {
     RawPair pair;
     pair.start();
     const std::size_t open = openDescriptors();
     {
-        const DescriptorLimit limit(3);
+        const DescriptorLimit limit(open + 3);
         pair.peer.send(frame({.descriptors = 10}, message(1)), std::vector<int>(10, 0));
-        EXPECT_EQ(pair.end.inbox.errorCode(), VOX_ERROR_CONNECTION_INVALID);
+        pair.end.inbox.expectError(VOX_ERROR_CONNECTION_INVALID, "descriptors were lost");
     }
-    const std::string why = pair.end.inbox.errorText();
-    EXPECT_NE(why.find("descriptors were lost"), std::string::npos) << why;
     EXPECT_EQ(openDescriptors(), open - 1);
 }
 
@@ -225,8 +205,7 @@ TEST_F(VoxListener, WhatIsNoConnectionIsRefusedByAnEndpoint) {
     EXPECT_TRUE(client.works());
     const std::size_t before = openDescriptors();
     const int fd = vox_values::as<vox_descriptor_object>(endpoint, VOX_TYPE_ENDPOINT)->descriptor;
-    std::array<int, 2> datagram{};
-    ASSERT_EQ(::socketpair(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0, datagram.data()), 0);
+    const Ends datagram(SOCK_DGRAM);
     const auto packet = [fd](std::size_t size, const std::vector<int>& descriptors) {
         Bytes bytes(size);
         iovec piece = {bytes.data(), size};
@@ -234,15 +213,13 @@ TEST_F(VoxListener, WhatIsNoConnectionIsRefusedByAnEndpoint) {
     };
     packet(1, {});
     packet(1, {0});
-    packet(1, {datagram[0]});
-    packet(1, {datagram[0], datagram[1]});
-    packet(2, {datagram[0]});
+    packet(1, {datagram.out()});
+    packet(1, {datagram.out(), datagram.in()});
+    packet(2, {datagram.out()});
     packet(1, std::vector<int>(64, 0));
-    ::close(datagram[0]);
-    ::close(datagram[1]);
     Client next(vox_connection_create_from_endpoint(endpoint));
     EXPECT_TRUE(next.works());
-    EXPECT_EQ(openDescriptors(), before + 2) << "but both ends of the new client";
+    EXPECT_EQ(openDescriptors(), before + 4) << "but both ends of the new client, and ours";
 }
 
 }  // namespace

@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
-#include <sys/wait.h>
 
 #include <array>
 #include <filesystem>
@@ -13,6 +12,7 @@
 #include "platform/linux/vox/admission.h"
 #include "platform/linux/vox/socket_io.h"
 #include "platform/linux/vox/value_layout.h"
+#include "support/child.h"
 #include "support/vox_raw_peer.h"
 #include "support/vox_service.h"
 
@@ -100,15 +100,10 @@ Fate fateOf(int fd) {
 // Connects by `connect` in a process of its own with the rights of `who`.
 template <class Connect>
 int connectAs(const Identity& who, Connect connect) {
-    const pid_t child = ::fork();
-    if (child == 0) {
-        ::alarm(static_cast<unsigned>(kBound.count()));
+    return inChild([&] {
         become(who);
-        ::_exit(fateOf(connect()));
-    }
-    int status = 0;
-    EXPECT_EQ(::waitpid(child, &status, 0), child);
-    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+        return int{fateOf(connect())};
+    });
 }
 
 bool sendOver(int endpoint, int fd) {
@@ -219,17 +214,10 @@ TEST_F(VoxPolicyOfRealClients, WithoutOneNamesAreForThisUserAndEndpointsForTheir
 TEST(VoxPolicy, NobodyPassesAnothersSocketOffAsItsOwn) {
     Service service(vox_connection_create_anonymous_listener(nullptr), nullptr);
     const Ref endpoint(vox_endpoint_create(service.listener()));
-    int ends[2];
-    ASSERT_EQ(::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends), 0);
-    const pid_t child = ::fork();
-    if (child == 0)
-        ::_exit(sendOver(descriptorOf(endpoint), ends[1]) ? 0 : 1);
-    int status = -1;
-    EXPECT_EQ(::waitpid(child, &status, 0), child);
-    EXPECT_EQ(status, 0);
-    ::close(ends[1]);
-    EXPECT_EQ(fateOf(ends[0]), kRefused);
-    ::close(ends[0]);
+    Ends ends(SOCK_STREAM);
+    EXPECT_TRUE(holdsInChild([&] { return sendOver(descriptorOf(endpoint), ends.in()); }));
+    ends.closeIn();
+    EXPECT_EQ(fateOf(ends.out()), kRefused);
     EXPECT_EQ(service.counts().clients_accepted, 0u);
 }
 

@@ -180,16 +180,14 @@ TEST(VoxValue, DepthCostsNoStack) {
 }
 
 TEST(VoxFd, IsADuplicateThatProgramsDoNotInherit) {
-    int ends[2];
-    ASSERT_EQ(pipe(ends), 0);
-    const int copy = vox_fd_dup(Ref(vox_fd_create(ends[0])));
-    close(ends[0]);
+    const Ends pipe;
+    const int copy = vox_fd_dup(Ref(vox_fd_create(pipe.out())));
+    EXPECT_GE(fcntl(pipe.out(), F_GETFD), 0) << "the object's duplicate alone is closed";
     EXPECT_NE(fcntl(copy, F_GETFD) & FD_CLOEXEC, 0);
-    EXPECT_EQ(write(ends[1], "x", 1), 1);
+    pipe.put("x");
     char byte = 0;
     EXPECT_EQ(read(copy, &byte, 1), 1);
     close(copy);
-    close(ends[1]);
     EXPECT_EQ(vox_get_type(vox_fd_create(-1)), VOX_TYPE_NULL);
 }
 

@@ -99,10 +99,6 @@ bool disarm() {
     return came.load();
 }
 
-std::size_t calls(Call call) {
-    return counts[static_cast<std::size_t>(call)].load();
-}
-
 }  // namespace plr::test::faults
 
 // ---- In place of the C library's ----------------------------------------------------

@@ -35,7 +35,5 @@ inline constexpr int kNoDescriptors = -2;
 void arm(Call call, int fault, std::size_t n);
 // Everything works again. Returns whether the call came.
 bool disarm();
-// Calls since arm() was last called.
-[[nodiscard]] std::size_t calls(Call call);
 
 }  // namespace plr::test::faults

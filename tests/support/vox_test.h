@@ -64,6 +64,11 @@ class Inbox {
     [[nodiscard]] std::string errorText() {
         return description(vox_error_get_value(waitForError(), vox_error_key_description));
     }
+    // That error is of this code, and says `why`.
+    void expectError(vox_error_code_t code, const std::string& why = "") {
+        EXPECT_EQ(errorCode(), code);
+        EXPECT_NE(errorText().find(why), std::string::npos) << errorText();
+    }
     [[nodiscard]] std::vector<Ref> all() const {
         const std::lock_guard guard(lock_);
         return events_;
