@@ -2,10 +2,7 @@
 
 #include <gmock/gmock.h>
 
-#include <optional>
 #include <string>
-#include <thread>
-#include <vector>
 
 #include "dispatch/dispatch.h"
 #include "dispatch/pump.h"

@@ -6,8 +6,6 @@
 #include <memory>
 #include <string>
 #include <thread>
-#include <utility>
-#include <vector>
 
 #include "dispatch/dispatch.h"
 #include "support/descriptors.h"

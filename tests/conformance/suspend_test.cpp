@@ -2,7 +2,6 @@
 
 #include <atomic>
 #include <thread>
-#include <vector>
 
 #include "dispatch/dispatch.h"
 #include "support/waiting.h"

@@ -3,7 +3,6 @@
 #include <atomic>
 #include <memory>
 #include <thread>
-#include <vector>
 
 #include "dispatch/dispatch.h"
 #include "support/waiting.h"

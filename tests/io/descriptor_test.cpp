@@ -3,11 +3,9 @@
 #include <gtest/gtest.h>
 #include <poll.h>
 #include <pthread.h>
-#include <sys/resource.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <array>
 #include <atomic>
 #include <cerrno>
@@ -15,7 +13,6 @@
 #include <future>
 #include <string>
 #include <thread>
-#include <utility>
 
 #include "Pelorin"
 #include "support/descriptors.h"

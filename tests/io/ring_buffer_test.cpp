@@ -5,7 +5,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cstring>
 #include <deque>
 #include <numeric>
 #include <queue>

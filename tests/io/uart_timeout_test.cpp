@@ -7,7 +7,6 @@
 #include <fstream>
 #include <functional>
 #include <thread>
-#include <vector>
 
 #include "io/serial_line.h"
 #include "support/sanitized.h"
@@ -93,6 +92,7 @@ TEST(TimedUart, ReadsReachTheirTargetOrTellSo) {
     EXPECT_EQ(transport.get(1000, true), (Got{true, text}));
     sender.join();
     line.send("late");
+    EXPECT_EQ(transport.get(1), (Got{true, "l"}));
     ASSERT_TRUE(eventually([&] { return line.unread() == 0; }));
     EXPECT_TRUE(transport.flushRead(&transport));
     EXPECT_EQ(transport.get(4, false, 0), (Got{false, ""}));

@@ -1,11 +1,5 @@
-#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
-#include <unistd.h>
-
-#include <functional>
-#include <thread>
-#include <vector>
 
 #include "dispatch/dispatch.h"
 #include "support/child.h"

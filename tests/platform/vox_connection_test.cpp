@@ -1,5 +1,4 @@
 // What both ends of a connection can rely on while it lasts.
-#include <fcntl.h>
 
 #include <random>
 #include <thread>

@@ -14,7 +14,6 @@
 #include <cstdio>
 #include <deque>
 #include <filesystem>
-#include <optional>
 #include <string>
 #include <thread>
 #include <vector>

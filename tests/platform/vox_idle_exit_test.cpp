@@ -5,7 +5,6 @@
 #include <sys/mman.h>
 
 #include <atomic>
-#include <cstring>
 #include <random>
 #include <thread>
 

@@ -37,11 +37,6 @@ class Stage {
         vox_listener_get_user_statistics(service.listener(), ::getuid(), &now);
         return now;
     }
-    [[nodiscard]] vox_listener_statistics_t counts() {
-        vox_listener_statistics_t now;
-        vox_listener_get_statistics(service.listener(), &now);
-        return now;
-    }
     // All that is charged to the user, in sum.
     [[nodiscard]] std::uint64_t charges() {
         const vox_user_statistics_t now = user();
@@ -96,7 +91,7 @@ void queueDescriptor(Stage& stage, std::size_t client) {
 
 void endsTheConnection(Stage& stage, std::size_t client, const std::string& limit) {
     stage.served(client).inbox.expectError(VOX_ERROR_CONNECTION_INVALID, limit);
-    EXPECT_TRUE(eventually([&] { return stage.counts().ended_for_limits == 1; }));
+    EXPECT_TRUE(eventually([&] { return stage.service.counts().ended_for_limits == 1; }));
 }
 void failsTheRequest(Stage& stage, std::size_t client, const std::string& limit) {
     stage.replies.expectError(VOX_ERROR_MESSAGE_REFUSED, limit);
@@ -109,7 +104,7 @@ void refusesTheRequest(Stage& stage, std::size_t client, const std::string& limi
     EXPECT_EQ(header.id, kAllowed + 1);
     EXPECT_EQ(vox_error_get_code(body), VOX_ERROR_MESSAGE_REFUSED);
     EXPECT_NE(description(body).find(limit), std::string::npos) << description(body);
-    EXPECT_EQ(stage.counts().requests_refused, 1u);
+    EXPECT_EQ(stage.service.counts().requests_refused, 1u);
     EXPECT_TRUE(stage.served(client).inbox.all().size() <= kAllowed)
         << "the service did not see it";
 }
@@ -215,7 +210,7 @@ TEST(VoxLimits, OfQueuedBytesAreUsedUpAndNotExceeded) {
             before = per_user ? stage.user().queued_bytes : stage.served(0).counts().queued_bytes;
         EXPECT_LE(before, kBytes);
         EXPECT_GT(before + 2 * kSize, kBytes);
-        EXPECT_TRUE(eventually([&] { return stage.counts().ended_for_limits == 1; }));
+        EXPECT_TRUE(eventually([&] { return stage.service.counts().ended_for_limits == 1; }));
         stage.peers.clear();
         EXPECT_TRUE(eventually([&] { return stage.charges() == 0; }));
     }
@@ -227,7 +222,7 @@ TEST(VoxLimits, OfAUserDropMessagesForAllItsClientsWhenThatIsThePolicy) {
         queueMessage(stage, client);
     EXPECT_EQ(stage.served(0).send(message(3)), ENOBUFS);
     EXPECT_EQ(stage.served(1).send(message(3)), ENOBUFS);
-    EXPECT_EQ(stage.counts().messages_dropped, 2u);
+    EXPECT_EQ(stage.service.counts().messages_dropped, 2u);
     for (RawPeer& peer : stage.peers)
         for (const frame_type next : {frame_type::hello, frame_type::message, frame_type::dropped})
             EXPECT_EQ(peer.readFrame().first.type, next);
@@ -246,8 +241,8 @@ TEST(VoxLimits, CountWhatWaitsForAHelloAsWell) {
     for (const frame_type next : {frame_type::hello, frame_type::message, frame_type::message})
         EXPECT_EQ(stage.peers[0].readFrame().first.type, next);
     EXPECT_TRUE(eventually([&] { return stage.charges() == 1; }));
-    EXPECT_EQ(stage.counts().messages_dropped, 1u);
-    EXPECT_EQ(stage.counts().messages_sent, 2u);
+    EXPECT_EQ(stage.service.counts().messages_dropped, 1u);
+    EXPECT_EQ(stage.service.counts().messages_sent, 2u);
 }
 
 TEST(VoxLimits, OfConnectionsCloseANewOneBeforeAnyMessage) {
@@ -257,13 +252,13 @@ TEST(VoxLimits, OfConnectionsCloseANewOneBeforeAnyMessage) {
         stage.served(stage.connect());
         stage.served(stage.connect());
         EXPECT_TRUE(stage.peers[stage.connect()].read().empty());
-        EXPECT_EQ(stage.counts().refused_by_limit, 1u);
+        EXPECT_EQ(stage.service.counts().refused_by_limit, 1u);
         EXPECT_EQ(stage.user().connections, 2u);
         stage.peers.pop_front();
         EXPECT_TRUE(eventually([&] { return stage.user().connections == 1; }));
         stage.connect();
         stage.served(2);
-        EXPECT_EQ(stage.counts().clients_accepted, 3u);
+        EXPECT_EQ(stage.service.counts().clients_accepted, 3u);
     }
 }
 
@@ -284,7 +279,7 @@ TEST(VoxLimits, OfTimeAreForPartsOfFramesAndForClientsThatDoNotSayHello) {
     for (const char* why :
          {"no hello after 20 ms", "no hello after 20 ms", "not whole after 20 ms"})
         stage.served(client++).inbox.expectError(VOX_ERROR_CONNECTION_INVALID, why);
-    EXPECT_TRUE(eventually([&] { return stage.counts().ended_for_limits == 3; }));
+    EXPECT_TRUE(eventually([&] { return stage.service.counts().ended_for_limits == 3; }));
     // A client waits for a slow service as long as it takes.
     RawPair slow(&limits);
     slow.end.resume();

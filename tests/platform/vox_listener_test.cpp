@@ -1,9 +1,6 @@
 // Services by name and by endpoint: who gets a name, where, and who gets in.
 #include <fcntl.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
-
-#include <optional>
 
 #include "platform/linux/vox/socket_io.h"
 #include "platform/linux/vox/value_layout.h"

@@ -4,7 +4,6 @@
 #include <sys/stat.h>
 #include <sys/syscall.h>
 
-#include <array>
 #include <filesystem>
 #include <string>
 #include <vector>

@@ -4,7 +4,6 @@
 #include <atomic>
 #include <cerrno>
 #include <optional>
-#include <string>
 
 #include "support/vox_raw_peer.h"
 

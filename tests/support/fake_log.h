@@ -6,11 +6,11 @@
 #include <sys/stat.h>
 
 #include <array>
-#include <cstdlib>
-#include <filesystem>
 
 #include "kel/kel.h"
+#include "support/descriptors.h"
 #include "support/journal_fields.h"
+#include "support/scratch_folder.h"
 #include "support/unix_socket.h"
 #include "support/waiting.h"
 
@@ -95,41 +95,31 @@ class FakeLog {
 // are opened while it lives send there. No log listens at first.
 class LogPlaces {
   public:
-    LogPlaces() {
-        EXPECT_EQ(::pipe2(console_, O_CLOEXEC), 0);
-        char name[] = "/tmp/kel.XXXXXX";
-        folder_ = ::mkdtemp(name);
-        kel_set_places(journal().c_str(), syslog().c_str(), console_[1]);
-    }
-    ~LogPlaces() {
-        kel_set_places(nullptr, nullptr, -1);
-        ::close(console_[0]);
-        ::close(console_[1]);
-        std::filesystem::remove_all(folder_);
-    }
+    LogPlaces() { kel_set_places(journal().c_str(), syslog().c_str(), console_.in()); }
+    ~LogPlaces() { kel_set_places(nullptr, nullptr, -1); }
     LogPlaces(const LogPlaces&) = delete;
     LogPlaces& operator=(const LogPlaces&) = delete;
 
-    [[nodiscard]] std::string journal() const { return folder_ + "/journal"; }
-    [[nodiscard]] std::string syslog() const { return folder_ + "/log"; }
+    [[nodiscard]] std::string journal() const { return folder_.at("journal"); }
+    [[nodiscard]] std::string syslog() const { return folder_.at("log"); }
     [[nodiscard]] bool hasConsoleText() const {
-        pollfd ready{console_[0], POLLIN, 0};
+        pollfd ready{console_.out(), POLLIN, 0};
         return ::poll(&ready, 1, 0) == 1;
     }
     // What the console has so far, at least a line.
     [[nodiscard]] std::string readConsole() const {
         std::string text(1 << 17, '\0');
-        pollfd ready{console_[0], POLLIN, 0};
+        pollfd ready{console_.out(), POLLIN, 0};
         EXPECT_EQ(::poll(&ready, 1, static_cast<int>(std::chrono::milliseconds(kBound).count())),
                   1);
-        const ssize_t length = ::read(console_[0], text.data(), text.size());
+        const ssize_t length = ::read(console_.out(), text.data(), text.size());
         text.resize(length < 0 ? 0 : static_cast<std::size_t>(length));
         return text;
     }
 
   private:
-    std::string folder_;
-    int console_[2] = {-1, -1};
+    const ScratchFolder folder_;
+    const Ends console_;
 };
 
 // A client for the length of a test.

@@ -4,7 +4,6 @@
 #include <sys/resource.h>
 
 #include <algorithm>
-#include <atomic>
 #include <map>
 
 #include "support/service_process.h"

@@ -12,6 +12,8 @@
 #include <string>
 #include <vector>
 
+#include "support/descriptors.h"
+
 // A test program that is its own service: started with the argument "service", or
 // others, it serves, says so by serviceIsReady() and runs until it is killed.
 namespace plr::test {
@@ -34,20 +36,18 @@ class ServiceProcess {
         for (std::string& word : words)
             arguments.push_back(word.data());
         arguments.push_back(nullptr);
-        int ends[2];
-        EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
+        Ends pipe;
         posix_spawn_file_actions_t actions;
         posix_spawn_file_actions_init(&actions);
-        posix_spawn_file_actions_adddup2(&actions, ends[1], STDOUT_FILENO);
+        posix_spawn_file_actions_adddup2(&actions, pipe.in(), STDOUT_FILENO);
         if (passed >= 0)
             posix_spawn_file_actions_adddup2(&actions, passed, 3);
         EXPECT_EQ(
             ::posix_spawn(&pid_, program.c_str(), &actions, nullptr, arguments.data(), environ), 0);
         posix_spawn_file_actions_destroy(&actions);
-        ::close(ends[1]);
+        pipe.closeIn();
         char byte = 0;
-        EXPECT_EQ(::read(ends[0], &byte, 1), 1) << "the service did not start";
-        ::close(ends[0]);
+        EXPECT_EQ(::read(pipe.out(), &byte, 1), 1) << "the service did not start";
     }
     ~ServiceProcess() { kill(); }
     ServiceProcess(const ServiceProcess&) = delete;

@@ -19,6 +19,11 @@ class EchoService {
     }
 
     [[nodiscard]] End& listener() { return listener_; }
+    [[nodiscard]] vox_listener_statistics_t counts() const {
+        vox_listener_statistics_t counts;
+        vox_listener_get_statistics(listener_, &counts);
+        return counts;
+    }
     // The client that came as number `index`, waited for.
     [[nodiscard]] End& client(std::size_t index) {
         EXPECT_TRUE(eventually([&] {

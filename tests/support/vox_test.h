@@ -2,7 +2,6 @@
 
 #include <condition_variable>
 #include <functional>
-#include <memory>
 #include <numeric>
 
 #include "support/runtime.h"
