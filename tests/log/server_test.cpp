@@ -41,7 +41,7 @@ TEST(MemoryBufferedLogWriter, DropsTheOldestBeyondItsLimits) {
     const struct {
         const char* name;
         long maxMessages, maxBytes;
-        std::size_t left;  // of 4 messages of 8 bytes
+        long left;  // of 4 messages of 8 bytes
     } rows[] = {{"no limits", -1, MemoryBufferedLogWriter::UNLIMITED, 4},
                 {"messages", 3, 0, 3},
                 {"bytes, exceeded by one message", 0, 10, 2},
@@ -54,7 +54,7 @@ TEST(MemoryBufferedLogWriter, DropsTheOldestBeyondItsLimits) {
         for (const std::string& text : texts)
             writer->write(messageOf(text));
         EXPECT_THAT(textsOf(*writer), ElementsAreArray(texts.end() - row.left, texts.end()));
-        EXPECT_EQ(writer->getDroppedMessageCount(), 4 - static_cast<long>(row.left));
+        EXPECT_EQ(writer->getDroppedMessageCount(), 4 - row.left);
     }
 }
 

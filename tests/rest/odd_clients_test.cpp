@@ -94,9 +94,10 @@ TEST_F(OddClients, EveryKeyMayHoldAnythingAndNoneNeedBeThere) {
     }
     for (int present = 0; present < 16; ++present) {
         const vox::dict message = odd_->message(Operation::kGet, "/kept/x");
+        const char* const keys[] = {"o", "a", "r", "v"};
         for (int i = 0; i < 4; ++i)
             if (present >> i & 1)
-                vox_dictionary_set_value(message.get(), std::array{"o", "a", "r", "v"}[i], nullptr);
+                vox_dictionary_set_value(message.get(), keys[i], nullptr);
         send(message);
     }
 }
