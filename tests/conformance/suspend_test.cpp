@@ -36,11 +36,13 @@ TEST(Suspend, FromItsOwnWorkTakesEffectBeforeTheNextPiece) {
     for (const queue& held : {child, target}) {
         Event ran;
         std::atomic<bool> resumed{false};
+        child.suspend();  // until both are there
         child.async([&] {
             held.suspend();
             ran.signal();
         });
         child.async([&] { EXPECT_TRUE(resumed); });
+        child.resume();
         queue::create("beside").async([&] { ran.signal(); });
         EXPECT_TRUE(ran.wait() && ran.wait());
         resumed = true;
