@@ -6,6 +6,7 @@
 namespace {
 
 using namespace plr::test;
+
 // Calls `atEnd` when it is destroyed.
 class Thing : public plr::SharedSynchronizable<Thing> {
   public:

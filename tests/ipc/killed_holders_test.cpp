@@ -23,20 +23,17 @@ class Service {
     }
 
   private:
-    struct Client {
-        Ref connection;
-        std::shared_ptr<std::string> activity;
-    };
-    struct Request {
-        Ref message;
+    // A client, or a request.
+    struct Held {
+        Ref what;
         std::shared_ptr<std::string> activity;
     };
 
     bool take(vox_object_t event) {
         if (vox_get_type(event) != VOX_TYPE_CONNECTION)
             return false;
-        const auto client = std::make_shared<Client>(
-            Client{Ref::retain(event), assertion_->createActivity("client")});
+        const auto client =
+            std::make_shared<Held>(Held{Ref::retain(event), assertion_->createActivity("client")});
         resumeOn(listener_.queue, event, [this, client](vox_object_t happened) {
             if (vox_get_type(happened) == VOX_TYPE_DICTIONARY)
                 keep(happened);
@@ -47,8 +44,8 @@ class Service {
     }
     // Until the asker is gone.
     void keep(vox_object_t message) {
-        const auto kept = std::make_shared<Request>(
-            Request{Ref::retain(message), assertion_->createActivity("request")});
+        const auto kept = std::make_shared<Held>(
+            Held{Ref::retain(message), assertion_->createActivity("request")});
         const dispatch::block<void()> gone([kept] { kept->activity.reset(); });
         EXPECT_EQ(vox_dictionary_set_cancel_handler(message, &gone), 0);
     }

@@ -1,4 +1,4 @@
-#include "plr/log/crash_drain.h"
+#include "plr/log.h"
 
 #include <gmock/gmock.h>
 #include <unistd.h>
@@ -9,15 +9,11 @@
 
 #include "plr/base/assert.h"
 #include "plr/base/report.h"
-#include "plr/log/log_message_buffer.h"
-#include "plr/log/log_server.h"
-#include "plr/log/log_writer.h"
-#include "plr/log/memory_buffered_log_writer.h"
-#include "plr/log/static_logger.h"
 
 namespace {
 
 using namespace plr;
+
 void print(const std::string& text) noexcept {
     static_cast<void>(!::write(STDERR_FILENO, text.data(), text.size()));
 }

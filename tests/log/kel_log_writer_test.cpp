@@ -9,6 +9,7 @@ namespace {
 
 using namespace plr;
 using namespace plr::test;
+
 constexpr std::int64_t kStart = 1'700'000'000'000'000'000;
 
 class KelLogWriterTest : public testing::Test {

@@ -4,10 +4,7 @@
 
 #include <csignal>
 
-#include "plr/log/log_message_buffer.h"
-#include "plr/log/log_server.h"
-#include "plr/log/memory_buffered_log_writer.h"
-#include "plr/log/static_logger.h"
+#include "plr/log.h"
 #include "support/function_log_writer.h"
 #include "support/sanitized.h"
 #include "support/waiting.h"

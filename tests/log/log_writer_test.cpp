@@ -1,14 +1,10 @@
-#include "plr/log/log_writer.h"
+#include "plr/log.h"
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <unistd.h>
 
 #include "plr/ipc/dict.h"
-#include "plr/log/console_log_writer.h"
-#include "plr/log/file_log_writer.h"
-#include "plr/log/kel_log_writer.h"
-#include "plr/log/memory_buffered_log_writer.h"
 #include "support/fake_log.h"
 #include "support/log_records.h"
 #include "support/scratch_folder.h"

@@ -1,13 +1,10 @@
-#include "plr/log/logger.h"
+#include "plr/log.h"
 
 #include <gmock/gmock.h>
 
 #include <latch>
 
 #include "plr/ipc/values.h"
-#include "plr/log/log_message.h"
-#include "plr/log/staged_logger.h"
-#include "plr/log/static_logger.h"
 #include "plr/test/manual_calendar.h"
 #include "support/log_fixture.h"
 #include "support/waiting.h"

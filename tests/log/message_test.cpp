@@ -5,10 +5,7 @@
 #include <locale>
 #include <sstream>
 
-#include "plr/log/log_level.h"
-#include "plr/log/log_message.h"
-#include "plr/log/log_message_buffer.h"
-#include "plr/log/log_tag.h"
+#include "plr/log.h"
 
 namespace {
 

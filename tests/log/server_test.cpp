@@ -1,12 +1,8 @@
-#include "plr/log/log_server.h"
+#include "plr/log.h"
 
 #include <gmock/gmock.h>
 
 #include "plr/ipc/read.h"
-#include "plr/log/log_message_buffer.h"
-#include "plr/log/memory_buffered_log_writer.h"
-#include "plr/log/scoped_log_flusher.h"
-#include "plr/log/static_logger.h"
 #include "support/fake_tracked_logger.h"
 #include "support/function_log_writer.h"
 #include "support/log_fixture.h"

@@ -13,6 +13,7 @@ namespace {
 
 using namespace plr::rest;
 using namespace plr::test;
+using enum Operation;
 
 const uid_t kMe = ::getuid();
 const uid_t kStranger = ::getuid() + 1;
@@ -29,7 +30,7 @@ std::shared_ptr<RestResource> open() {
         return shows && context.sendReplyWithValue(vox::string("SECRET"));
     };
     return std::make_shared<ScriptedResource>(show, [show](auto& context, const PathView& path) {
-        return context.getRestOperation() == asObject(Operation::kPush) && show(context, path);
+        return context.getRestOperation() == asObject(kPush) && show(context, path);
     });
 }
 
@@ -49,7 +50,7 @@ class Secrets {
         for (const vox::dict& message : client_->sent)
             reached |= isSecret(message["v"]);
         for (const char* secret : {"kept/x", "t/kept/x"})
-            reached |= !send(Operation::kGet, secret, "");
+            reached |= !send(kGet, secret, "");
         hide();
         return reached;
     }
@@ -68,8 +69,8 @@ class Secrets {
         return std::any_of(context.replies().begin(), context.replies().end(), isSecret);
     }
     void hide() {
-        send(Operation::kSet, "kept/x", "SECRET");
-        send(Operation::kSet, "t/kept/x", "SECRET");
+        send(kSet, "kept/x", "SECRET");
+        send(kSet, "t/kept/x", "SECRET");
         client_->sent.clear();
     }
 
@@ -109,7 +110,7 @@ TEST(AccessRules, NoSpellingOfAPathGetsRoundThem) {
     int reaching = 0;
     int allowed = 0;
     forEachPath([&](const std::string& path) {
-        for (const Operation operation : {Operation::kGet, Operation::kSet, Operation::kPush}) {
+        for (const Operation operation : {kGet, kSet, kPush}) {
             const Reached reached = reachedBy(secrets.root, operation, PathView(path));
             const bool byTight = tight.allows(operation, reached, nullptr);
             const bool byLoose = loose.allows(operation, reached, nullptr);
@@ -158,11 +159,11 @@ class AccessRulesOfAServer : public testing::Test {
 TEST_F(AccessRulesOfAServer, TheLongestPathThatNamesTheOperationDecides) {
     rig.server().setAccessRules({
         {.path = "/kept/x", .users = {kStranger}},
-        {.path = "/kept/_", .operations = {Operation::kSet}, .users = {kStranger}},
-        {.path = "/kept/set", .operations = {Operation::kSet}, .users = {kStranger}},
+        {.path = "/kept/_", .operations = {kSet}, .users = {kStranger}},
+        {.path = "/kept/set", .operations = {kSet}, .users = {kStranger}},
         {.path = "/t", .users = {kStranger}},
         {.path = "/t/kept/mine", .users = {kStranger, kMe}},
-        {.path = "/t/kept/mine/deeper", .operations = {Operation::kSet}, .users = {kStranger}},
+        {.path = "/t/kept/mine/deeper", .operations = {kSet}, .users = {kStranger}},
         {.path = "/t/kept/ours", .groups = {kNoGroup, kMyGroup}},
         {.path = "/t/kept/theirs", .groups = {kNoGroup}},
         {.path = "/t/kept/either", .users = {kStranger}},
@@ -176,35 +177,35 @@ TEST_F(AccessRulesOfAServer, TheLongestPathThatNamesTheOperationDecides) {
         Operation operation;
         bool isAllowed;
     } rows[] = {
-        {"/", Operation::kGet, true},
-        {"/kept", Operation::kGet, true},  // the names only
-        {"/kept/x", Operation::kGet, false},
-        {"kept/x/", Operation::kPush, false},
-        {"/kept/x/_/watchers", Operation::kGet, false},
-        {"/kept/x@part", Operation::kGet, false},
-        {"/kept/xx", Operation::kGet, true},
-        {"/kept//x", Operation::kGet, true},  // the names again
-        {"/kept/x@y@", Operation::kGet, false},
-        {"/kept/_", Operation::kSet, false},
-        {"/kept/_@", Operation::kSet, true},   // a property of the name "_"
-        {"/kept/_/x", Operation::kSet, true},  // nothing
-        {"/kept/*", Operation::kGet, false},   // x is among them
-        {"/*", Operation::kGet, false},
-        {"/*/x", Operation::kGet, false},
-        {"/*", Operation::kSet, true},  // does nothing
-        {"/kept/set", Operation::kSet, false},
-        {"/kept/set", Operation::kGet, true},
-        {"/t", Operation::kGet, false},
-        {"/t/kept/mine", Operation::kSet, true},
-        {"/t/kept/mine@part", Operation::kGet, true},
-        {"/t/open/mine", Operation::kGet, true},
-        {"/t/open/mine@part", Operation::kGet, false},   // or a name below /t/open
-        {"/t/kept/mine/deeper", Operation::kSet, true},  // means the property
-        {"/t/kept/ours", Operation::kGet, true},
-        {"/t/kept/theirs", Operation::kGet, false},
-        {"/t/kept/either", Operation::kGet, true},
-        {"/t/kept/unknown", Operation::kGet, false},
-        {"/t/nothing", Operation::kGet, false},
+        {"/", kGet, true},
+        {"/kept", kGet, true},  // the names only
+        {"/kept/x", kGet, false},
+        {"kept/x/", kPush, false},
+        {"/kept/x/_/watchers", kGet, false},
+        {"/kept/x@part", kGet, false},
+        {"/kept/xx", kGet, true},
+        {"/kept//x", kGet, true},  // the names again
+        {"/kept/x@y@", kGet, false},
+        {"/kept/_", kSet, false},
+        {"/kept/_@", kSet, true},   // a property of the name "_"
+        {"/kept/_/x", kSet, true},  // nothing
+        {"/kept/*", kGet, false},   // x is among them
+        {"/*", kGet, false},
+        {"/*/x", kGet, false},
+        {"/*", kSet, true},  // does nothing
+        {"/kept/set", kSet, false},
+        {"/kept/set", kGet, true},
+        {"/t", kGet, false},
+        {"/t/kept/mine", kSet, true},
+        {"/t/kept/mine@part", kGet, true},
+        {"/t/open/mine", kGet, true},
+        {"/t/open/mine@part", kGet, false},   // or a name below /t/open
+        {"/t/kept/mine/deeper", kSet, true},  // means the property
+        {"/t/kept/ours", kGet, true},
+        {"/t/kept/theirs", kGet, false},
+        {"/t/kept/either", kGet, true},
+        {"/t/kept/unknown", kGet, false},
+        {"/t/nothing", kGet, false},
     };
     for (const auto& row : rows)
         EXPECT_EQ(refusals(client->message(row.operation, row.path)), row.isAllowed ? 0U : 1U)
@@ -215,25 +216,25 @@ TEST_F(AccessRulesOfAServer, RefusedMessagesDoNothingAndAreToldOfByOneLineASecon
     const Reports reports;
     rig.server().setAccessRules({{.path = "/kept", .users = {kStranger}}});
     constexpr std::uint64_t kMany = 1000;
-    const vox::dict set = client->message(Operation::kSet, "/kept/x\n\x1b", vox::int64(1));
+    const vox::dict set = client->message(kSet, "/kept/x\n\x1b", vox::int64(1));
     for (std::uint64_t i = 0; i < kMany; ++i)
         client->send(set);
     EXPECT_EQ(client->takeMessages(), Texts());
     EXPECT_EQ(rig.server().accessRefusals(), kMany);
-    EXPECT_EQ(oneLine(client->exchange(client->message(Operation::kGet, "/kept/x"))),
+    EXPECT_EQ(oneLine(client->exchange(client->message(kGet, "/kept/x"))),
               R"({"o": "get","r": "/kept/x","e": "access denied"})");
     EXPECT_LT(reports.count("access denied"), kMany);
     EXPECT_GE(reports.count("access denied to user " + std::to_string(kMe) +
                             ": set of /kept/x?? (refused since the last such line: 1)"),
               1U);
     // The service itself may do anything.
-    EXPECT_TRUE(rig.handleOwn(client->message(Operation::kSet, "/kept/x", vox::int64(2))));
+    EXPECT_TRUE(rig.handleOwn(client->message(kSet, "/kept/x", vox::int64(2))));
     rig.server().setAccessRules({});
     EXPECT_EQ(client->textAt("/kept/x"), "2");
     EXPECT_EQ(client->textAt("/kept"), R"([0: "x"])") << "no refused one made a property";
     // Something that is no path is the root, for rules too.
     rig.server().setAccessRules(AccessRules(kNobody));
-    vox::dict rootless = client->message(Operation::kGet, "");
+    vox::dict rootless = client->message(kGet, "");
     rootless["r"] = vox::int64(7);
     EXPECT_EQ(oneLine(client->exchange(rootless)), R"({"o": "get","r": 7,"e": "access denied"})");
 }
@@ -242,7 +243,7 @@ TEST_F(AccessRulesOfAServer, ARedirectedMessageNeedsBoth) {
     rig.add("/elsewhere", std::make_shared<ScriptedResource>(
                               [](auto& context, auto&&) { return context.redirect("/kept/x"); }));
     const auto answer = [&] {
-        return oneLine(client->exchange(client->message(Operation::kGet, "/elsewhere")));
+        return oneLine(client->exchange(client->message(kGet, "/elsewhere")));
     };
     EXPECT_EQ(answer(), R"({"o": "get","r": "/elsewhere","v": null})");
     for (const char* path : {"/kept/x", "/elsewhere"}) {
@@ -274,8 +275,8 @@ TEST_F(AccessRulesOfAServer, DescriptionsShowWhatAClientMayGet) {
     };
     for (const auto& [path, expected] : rows)
         EXPECT_EQ(client->textAt(std::string("/descriptions") + path), expected) << path;
-    server.setAccessRules({{.path = "/kept", .users = {kStranger}},
-                           {.path = "/map", .operations = {Operation::kSet}}});
+    server.setAccessRules(
+        {{.path = "/kept", .users = {kStranger}}, {.path = "/map", .operations = {kSet}}});
     EXPECT_EQ(client->textAt("/descriptions"), "{" + other + "," + map + "}");
     EXPECT_EQ(client->textAt("/descriptions/kept"), "{}");
 }

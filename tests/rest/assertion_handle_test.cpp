@@ -7,11 +7,8 @@
 
 namespace {
 
+using namespace plr::rest;
 using namespace plr::test;
-using plr::rest::AssertionHandle;
-using plr::rest::AssertionProvider;
-using plr::rest::AssertionState;
-using plr::rest::Operation;
 
 constexpr const char* kPath = "/assertions/radio";
 
@@ -51,7 +48,11 @@ class Handle : public testing::Test, protected ModuleClient {
         on([&] { told = std::exchange(told_, {}); });
         return told;
     }
-    std::string clients(const char* list) { return granter_->textAt(std::string(kPath) + list); }
+    // Those in a list, once what the module sent has been handled.
+    std::string clients(const char* list) {
+        settle();
+        return granter_->textAt(std::string(kPath) + list);
+    }
 
     RestServerRig rig_;
     std::unique_ptr<RawRestClient> granter_;
@@ -61,7 +62,6 @@ class Handle : public testing::Test, protected ModuleClient {
 TEST_F(Handle, AssertsUntilItIsDroppedAndTellsEachChange) {
     std::optional<AssertionHandle> handle;
     on([&] { handle = make("a"); });
-    settle();
     EXPECT_EQ(clients("/waiting"), "[0: \"me\"]");
     answer("/granted", 1);
     EXPECT_EQ(told(), (Texts{"a granted"}));
@@ -73,7 +73,6 @@ TEST_F(Handle, AssertsUntilItIsDroppedAndTellsEachChange) {
     EXPECT_EQ(told(), (Texts{"a lost"}));
     EXPECT_EQ(clients("/waiting"), "[]");
     on([&] { handle->reassert(); });
-    settle();
     EXPECT_EQ(clients("/waiting"), "[0: \"me\"]");
     answer("/granted", 2);
     EXPECT_EQ(told(), (Texts{"a granted"}));
@@ -87,7 +86,6 @@ TEST_F(Handle, AssertsUntilItIsDroppedAndTellsEachChange) {
     answer("/granted", 3);
     EXPECT_EQ(told(), (Texts{"a granted"}));
     std::thread([&] { handle.reset(); }).join();
-    settle();
     EXPECT_EQ(clients("/granted"), "[]");
     EXPECT_EQ(told(), Texts());
 }
@@ -108,13 +106,11 @@ TEST_F(Handle, SharesItsAssertionWithTheOthersOfItsModule) {
     EXPECT_EQ(told(), (Texts{"late granted"}));
     on([&] { second.reset(); });
     first.reset();
-    settle();
     EXPECT_EQ(clients("/granted"), "[0: \"me\"]");
     on([&] {
         const AssertionHandle moved = std::move(late);
         EXPECT_TRUE(moved.isGranted());
     });
-    settle();
     EXPECT_EQ(clients("/granted"), "[]");
     EXPECT_EQ(told(), Texts());
 }
@@ -166,7 +162,7 @@ TEST_F(Handle, IsGrantedByAProvider) {
     std::optional<AssertionProvider> provider;
     AssertionHandle handle;
     on([&] {
-        provider.emplace(module, kPath, [&](const plr::rest::AssertionAcquireState& wanted) {
+        provider.emplace(module, kPath, [&](const AssertionAcquireState& wanted) {
             told_.push_back(asString(wanted.state) + (" " + std::to_string(wanted.generation)));
             EXPECT_EQ(provider->state(), wanted);
             if (wanted.state == AssertionState::kPending)
@@ -192,7 +188,6 @@ TEST_F(Handle, IsGrantedByAProvider) {
         provider.reset();
         handle.reset();
     });
-    settle();
     EXPECT_EQ(clients("/provider"), "null");
 }
 

@@ -18,6 +18,7 @@ namespace {
 
 using namespace plr::test;
 using namespace plr::rest;
+using enum Operation;
 
 constexpr unsigned kSeed = 20240517;
 constexpr int kSteps = kSanitized ? 50'000 : 1'000'000;
@@ -213,17 +214,17 @@ class Walk {
                         (model.*effect)(name, client); }};
         };
         if (dice < 35)
-            return step(Operation::kPush, "", &Model::assertBy);
+            return step(kPush, "", &Model::assertBy);
         if (dice < 60)
-            return step(Operation::kPop, "", &Model::releaseBy);
+            return step(kPop, "", &Model::releaseBy);
         if (dice < 85)
             return chooseAnswer(dice < 77, name, client);
         if (dice < 93)
-            return step(Operation::kPush, "/provider", &Model::registerBy);
+            return step(kPush, "/provider", &Model::registerBy);
         if (dice < 96)
-            return step(Operation::kPop, "/provider", &Model::unregisterBy);
+            return step(kPop, "/provider", &Model::unregisterBy);
         const int leaving = numbers_[below(kClients)];
-        return {Operation::kNone, {}, {}, leaving, {}, [=](Model& model) { model.drop(leaving); }};
+        return {kNone, {}, {}, leaving, {}, [=](Model& model) { model.drop(leaving); }};
     }
     // Mostly by the provider and of the current generation.
     Step chooseAnswer(bool grants, const std::string& name, int client) {
@@ -248,12 +249,7 @@ class Walk {
             default:
                 break;
         }
-        return {Operation::kSet,
-                name,
-                grants ? "/granted" : "/revoked",
-                client,
-                value,
-                [=](Model& model) {
+        return {kSet, name, grants ? "/granted" : "/revoked", client, value, [=](Model& model) {
                     grants ? model.grantBy(name, client, generation)
                            : model.revokeBy(name, client, generation);
                 }};
@@ -272,7 +268,7 @@ class Walk {
     std::string play(const Step& step) {
         model_.told.clear();
         step.effect(model_);
-        const bool isDrop = step.operation == Operation::kNone;
+        const bool isDrop = step.operation == kNone;
         NotingContext context(step.operation, step.value,
                               isDrop ? nullptr : connection(step.client));
         if (isDrop)
@@ -309,7 +305,7 @@ class Walk {
     }
 
     vox::object get(const std::string& path) {
-        NotingContext context(Operation::kGet);
+        NotingContext context(kGet);
         PathView view(path);
         view.advance(1);
         resource_.handleMessage(context, view);

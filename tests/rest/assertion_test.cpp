@@ -9,6 +9,7 @@ namespace {
 
 using namespace plr::test;
 using namespace plr::rest;
+using enum Operation;
 
 // A server with assertions at /a; three clients that it knows, and one, "stranger",
 // that it does not.
@@ -39,12 +40,9 @@ class Parties {
     // "me grants x 1" or "me asserts x". Returns what is heard of it.
     std::string does(const std::string& what, const std::string& mount = "/a/") {
         static const std::map<std::string, std::pair<Operation, const char*>> verbs = {
-            {"asserts", {Operation::kPush, ""}},
-            {"releases", {Operation::kPop, ""}},
-            {"provides", {Operation::kPush, "/provider"}},
-            {"leaves", {Operation::kPop, "/provider"}},
-            {"grants", {Operation::kSet, "/granted"}},
-            {"revokes", {Operation::kSet, "/revoked"}},
+            {"asserts", {kPush, ""}},           {"releases", {kPop, ""}},
+            {"provides", {kPush, "/provider"}}, {"leaves", {kPop, "/provider"}},
+            {"grants", {kSet, "/granted"}},     {"revokes", {kSet, "/revoked"}},
         };
         std::string client;
         std::string verb;
@@ -154,16 +152,16 @@ TEST(AssertionPath, HasTheEffectOfItsKindAndNoOther) {
         {"/x/provider/below", R"("me")", kUnhandled, kProvides, kLeaves},
     };
     for (const auto& row : rows) {
-        expectEffect(Operation::kGet, row.path, row.got, Effect{});
-        expectEffect(Operation::kSet, row.path, "", row.set);
-        expectEffect(Operation::kPush, row.path, "", row.push);
-        expectEffect(Operation::kPop, row.path, "", row.pop);
-        expectEffect(Operation::kNotify, row.path, "", kUnhandled);
+        expectEffect(kGet, row.path, row.got, Effect{});
+        expectEffect(kSet, row.path, "", row.set);
+        expectEffect(kPush, row.path, "", row.push);
+        expectEffect(kPop, row.path, "", row.pop);
+        expectEffect(kNotify, row.path, "", kUnhandled);
     }
     // A GET makes no assertion.
-    expectEffect(Operation::kGet, "/y", "null", Effect{});
-    expectEffect(Operation::kGet, "/y/waiting", "[]", Effect{});
-    expectEffect(Operation::kGet, "/y/provider", "null", Effect{});
+    expectEffect(kGet, "/y", "null", Effect{});
+    expectEffect(kGet, "/y/waiting", "[]", Effect{});
+    expectEffect(kGet, "/y/provider", "null", Effect{});
 }
 
 // What else happens is the model's, in assertion_model_test.cpp.

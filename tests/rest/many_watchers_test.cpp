@@ -14,9 +14,9 @@
 
 namespace {
 
+using namespace plr::rest;
 using namespace plr::test;
-using plr::rest::Operation;
-using plr::rest::PropertyRestResource;
+using enum Operation;
 
 constexpr const char* kName = "net.example.rest";
 constexpr int kLeaving = 1'000;  // watchers
@@ -46,8 +46,8 @@ void allowOpenFiles() {
         const auto& watcher = watchers.emplace_back(
             std::make_unique<RawRestClient>(vox::connection::create(kName), "w" + number));
         watcher->registerName();
-        watcher->send(Operation::kPush, "/kept/x");
-        watcher->send(Operation::kPush, "/kept/group" + std::to_string(i % kGroups));
+        watcher->send(kPush, "/kept/x");
+        watcher->send(kPush, "/kept/group" + std::to_string(i % kGroups));
     }
     for (const auto& watcher : watchers)
         if (watcher->takeMessages().size() != 2)
@@ -61,8 +61,8 @@ TEST(ManyWatchers, ThatGoAtOnceLeaveNothingBehindAndNobodyWaitsForIt) {
     rig.add("/kept", std::make_shared<PropertyRestResource>(true));
     rig.start();
     const auto me = rig.registeredClient("me");
-    me->send(Operation::kSet, "/kept/x", vox::int64(0));
-    me->send(Operation::kPush, "/kept/_/watched");
+    me->send(kSet, "/kept/x", vox::int64(0));
+    me->send(kPush, "/kept/_/watched");
     static_cast<void>(me->takeMessages());  // all that is handled before others come
     for (int time = 1; time <= 2; ++time) {
         ServiceProcess leaving({"watchers"});
@@ -72,8 +72,8 @@ TEST(ManyWatchers, ThatGoAtOnceLeaveNothingBehindAndNobodyWaitsForIt) {
 
         leaving.kill();
         const auto next = rig.registeredClient("next");
-        next->send(Operation::kPush, "/kept/x");
-        next->send(Operation::kSet, "/kept/x", vox::int64(time));
+        next->send(kPush, "/kept/x");
+        next->send(kSet, "/kept/x", vox::int64(time));
         EXPECT_EQ(next->takeMessages(), (Texts{"notify next /kept/x " + std::to_string(time - 1),
                                                "notify next /kept/x " + std::to_string(time)}));
         EXPECT_TRUE(eventually([&] {
@@ -120,8 +120,8 @@ class GoodWatcher {
 
   private:
     void push(const std::string& path) const {
-        connection_.send_message(plr::rest::createRestMessage(
-            plr::rest::asObject(Operation::kPush), vox::string("good"), vox::string(path), {}));
+        connection_.send_message(
+            createRestMessage(asObject(kPush), vox::string("good"), vox::string(path), {}));
     }
     void take(const vox::object& event) {
         const vox::dict message(event);
@@ -160,7 +160,7 @@ TEST(ManyWatchers, SeeEverySetOfEveryPropertyInOrder) {
     const auto setter = rig.client("setter");
     for (int round = 0; round < kRounds; ++round) {
         for (int i = 0; i < kProperties; ++i)
-            setter->send(Operation::kSet, "/kept/" + std::to_string(i), numbered(round, 1));
+            setter->send(kSet, "/kept/" + std::to_string(i), numbered(round, 1));
         for (const auto& watcher : watchers)
             ASSERT_TRUE(watcher->wait(kProperties));
     }
@@ -194,8 +194,8 @@ class StalledWatcher : public testing::Test {
                   }));
         rig_->start();
         slow_ = rig_->registeredClient("slow");
-        slow_->send(Operation::kPush, "/capture");
-        slow_->send(Operation::kPush, "/kept/0");
+        slow_->send(kPush, "/capture");
+        slow_->send(kPush, "/kept/0");
         EXPECT_EQ(slow_->takeMessages().size(), 1U);
         slow_->connection().suspend();
         setAll();
@@ -207,7 +207,7 @@ class StalledWatcher : public testing::Test {
         const auto setter = rig_->client("setter");
         const std::size_t before = residentBytes();
         for (int i = 0; i < kWindows * kWindow; ++i) {
-            ASSERT_EQ(setter->send(Operation::kSet, "/kept/0", numbered(i, kValueBytes)), 0);
+            ASSERT_EQ(setter->send(kSet, "/kept/0", numbered(i, kValueBytes)), 0);
             if ((i + 1) % kWindow != 0)
                 continue;
             ASSERT_TRUE(first.wait(kWindow) && second.wait(kWindow));
@@ -253,7 +253,7 @@ TEST_F(StalledWatcher, MissesWhatIsCountedUnderTheDropPolicy) {
     EXPECT_EQ(slow_->connection().statistics().peer_dropped, statistics.messages_dropped);
     // It is a watcher like others again.
     const auto late = rig_->client("late");
-    late->send(Operation::kSet, "/kept/0", vox::string("after"));
+    late->send(kSet, "/kept/0", vox::string("after"));
     EXPECT_EQ(late->get("/kept/0").text(), "after");
     EXPECT_EQ(slow_->takeMessages(), (Texts{"notify slow /kept/0 \"after\""}));
 }

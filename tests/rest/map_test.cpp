@@ -5,11 +5,8 @@
 
 namespace {
 
+using namespace plr::rest;
 using namespace plr::test;
-using plr::rest::MapChange;
-using plr::rest::MapRestResource;
-using plr::rest::Operation;
-using plr::rest::PathView;
 
 // A server with a map that has one entry, "k": {"part": 5}, and one whose entries
 // are owned; a client that is known to it.
@@ -17,7 +14,7 @@ class Map : public testing::Test {
   protected:
     Map() {
         rig_.add("/map", map_);
-        rig_.add("/owned", std::make_shared<MapRestResource>(plr::rest::owned_entries));
+        rig_.add("/owned", std::make_shared<MapRestResource>(owned_entries));
         rig_.start();
         client_ = rig_.registeredClient("me");
         set(*client_, "/map/k", valueOfK());
@@ -224,7 +221,7 @@ TEST(MapLimits, HoldForEntriesAndForWatchedKeysUntilTheyGo) {
 }
 
 TEST(MapDrop, TellsWhoWentNothing) {
-    MapRestResource map(plr::rest::owned_entries, 1);
+    MapRestResource map(owned_entries, 1);
     const auto client = std::make_shared<FakeRestConnection>("client");
     EXPECT_TRUE(tell(map, Operation::kSet, "/map/a", client, vox::int64(1)));
     EXPECT_TRUE(tell(map, Operation::kPush, "/map/a", client));

@@ -9,12 +9,10 @@
 // types.
 namespace {
 
+using namespace plr;
+using namespace plr::rest;
 using namespace plr::test;
 using namespace std::chrono_literals;
-using plr::ReconnectPolicy;
-using plr::RestModule;
-using plr::rest::Operation;
-using plr::rest::PathView;
 
 constexpr const char* kName = "net.example.rest";
 constexpr ReconnectPolicy kQuick{1ms, 2ms};
@@ -29,9 +27,9 @@ TEST(ReconnectPolicy, PausesDoubleUpToTheMaximumLessTheirShare) {
                 {1, 1, 50ms},  {2, 0, 200ms},   {4, 0, 800ms},   {5, 0, 1000ms},
                 {5, 1, 500ms}, {6, 0, 1000ms},  {~0U, 0, 1000ms}};
     for (const auto& row : rows)
-        EXPECT_EQ(plr::rest::pauseAfter(row.failures, policy, row.random), row.pause)
+        EXPECT_EQ(pauseAfter(row.failures, policy, row.random), row.pause)
             << row.failures << " failures, " << row.random;
-    EXPECT_EQ(plr::rest::pauseAfter(3, {1ms, 24h, 0}, 1), 4ms);
+    EXPECT_EQ(pauseAfter(3, {1ms, 24h, 0}, 1), 4ms);
 }
 
 // A module that writes down what happens to it.
@@ -196,7 +194,7 @@ std::shared_ptr<plr::rest::RestResource> answers() {
     });
 }
 
-std::string asText(const plr::Result<vox::object>& result) {
+std::string asText(const Result<vox::object>& result) {
     if (result)
         return oneLine(result.value());
     const vox::object& error = result.error();
@@ -215,7 +213,7 @@ TEST(ModuleRequest, GivesAValueOrTellsWhyThereIsNone) {
         return client.on([&] {
             return client.module.sendRequest(
                 path, vox::int64(5), limit,
-                [&](const plr::Result<vox::object>& result) { client.note(asText(result)); });
+                [&](const Result<vox::object>& result) { client.note(asText(result)); });
         });
     };
     EXPECT_FALSE(ask("/a/echo", kBound));
@@ -246,7 +244,7 @@ TEST(ModuleRequest, GivesAValueOrTellsWhyThereIsNone) {
         client.module.connect(mine);
         client.module.sendRequest(
             "/a/silence", {}, kBound,
-            Block([&](const plr::Result<vox::object>& result) { client.note(asText(result)); }));
+            Block([&](const Result<vox::object>& result) { client.note(asText(result)); }));
         client.module.sendRequest("/a/silence", {}, kBound, RestModule::ResultHandler());
         client.module.sendRawGet(
             "/", [&](const vox::object& reply) { client.note(vox_type_get_name(reply.type())); });
@@ -260,7 +258,7 @@ TEST(ModuleRequest, GivesAValueOrTellsWhyThereIsNone) {
 
 template <class T>
 std::string read(const vox::object& value) {
-    const std::optional<T> read = plr::rest::valueAs<T>(value);
+    const std::optional<T> read = valueAs<T>(value);
     if constexpr (std::is_arithmetic_v<T>)
         return read ? std::to_string(*read) : "-";
     else
@@ -296,13 +294,13 @@ TEST(TypedValue, TakesWhatFitsOnly) {
                                   read<std::string>(row.value)};
         EXPECT_TRUE(std::equal(std::begin(as), std::end(as), row.as))
             << oneLine(row.value) << ": " << testing::PrintToString(as);
-        EXPECT_EQ(plr::rest::valueAs<vox::object>(row.value).has_value(), bool(row.value));
+        EXPECT_EQ(valueAs<vox::object>(row.value).has_value(), bool(row.value));
     }
-    EXPECT_EQ(plr::rest::valueAs<std::vector<std::uint8_t>>(vox::data(bytes)),
+    EXPECT_EQ(valueAs<std::vector<std::uint8_t>>(vox::data(bytes)),
               (std::vector<std::uint8_t>{1, 2}));
-    const plr::rest::AssertionAcquireState state{3, plr::rest::AssertionState::kGranted};
-    EXPECT_EQ(plr::rest::valueAs<plr::rest::AssertionAcquireState>(write_rest_value(state)), state);
-    EXPECT_FALSE(plr::rest::valueAs<plr::rest::AssertionAcquireState>(nullptr));
+    const AssertionAcquireState state{3, AssertionState::kGranted};
+    EXPECT_EQ(valueAs<plr::rest::AssertionAcquireState>(write_rest_value(state)), state);
+    EXPECT_FALSE(valueAs<plr::rest::AssertionAcquireState>(nullptr));
 }
 
 }  // namespace

@@ -8,9 +8,9 @@
 // server comes and goes.
 namespace {
 
+using namespace plr;
+using namespace plr::rest;
 using namespace plr::test;
-using plr::RestModule;
-using plr::rest::Operation;
 using Reply = std::shared_ptr<vox::object>;
 using Block = dispatch::block<void(vox::object)>;
 
@@ -38,7 +38,7 @@ class Module : public testing::Test {
         on([this, mine = newServer()] { module_->connect(mine); });
     }
     // What the module has sent since the last call, as "operation me path value".
-    Texts heard() { return server_->takeMessagesBefore(plr::rest::createPingMessage()); }
+    Texts heard() { return server_->takeMessagesBefore(createPingMessage()); }
     // Sends to the module and waits until that was handled.
     void tell(const vox::dict& message) {
         server_->send(message);
@@ -108,9 +108,7 @@ TEST_F(Module, ObservingAgainKeepsTheFirstHandler) {
         module_->observeEvent("/p", Block(remember("third")));
     });
     EXPECT_EQ(heard(), (Texts{"push me /p null"}));
-    on([this] {
-        module_->observeProperty("/p", Block(remember("forced")), plr::force_resubscribe);
-    });
+    on([this] { module_->observeProperty("/p", Block(remember("forced")), force_resubscribe); });
     EXPECT_EQ(heard(), (Texts{"push me /p null"}));
     notify("/p", vox::int64(1));
     EXPECT_EQ(calls(), (Texts{"first 1"}));
@@ -119,7 +117,7 @@ TEST_F(Module, ObservingAgainKeepsTheFirstHandler) {
         module_->unobserveProperty("/p");
         module_->observeProperty("/p", RestModule::Handler());
         module_->observeEvent("/p", Block());
-        module_->observeProperty("/new", remember("new"), plr::force_resubscribe);
+        module_->observeProperty("/new", remember("new"), force_resubscribe);
     });
     EXPECT_EQ(heard(), (Texts{"pop me /p null", "push me /new null"}));
     notify("/p", vox::int64(2));
@@ -157,8 +155,8 @@ TEST_F(Module, AnswersARequestWhenItsHolderLetsGoAndAPingAtOnce) {
         });
     });
     server_->ask(server_->message(Operation::kGet, "/r", vox::int64(1)));
-    EXPECT_EQ(oneLine(server_->exchange(plr::rest::createPingMessage())), R"({"o": "ping"})");
-    tell(plr::rest::createPingMessage());  // one that wants no answer
+    EXPECT_EQ(oneLine(server_->exchange(createPingMessage())), R"({"o": "ping"})");
+    tell(createPingMessage());  // one that wants no answer
     on([&] {
         ASSERT_TRUE(kept);
         *kept = vox::int64(2);
@@ -177,7 +175,7 @@ TEST_F(Module, DropsWhatItDoesNotKnow) {
         });
     });
     const auto message = [](const vox::object& operation, const vox::object& path) {
-        return plr::rest::createRestMessage(operation, nullptr, path, nullptr);
+        return createRestMessage(operation, nullptr, path, nullptr);
     };
     const vox::object get = vox::string("get"), notify = vox::string("notify");
     const vox::object p = vox::string("/p"), r = vox::string("/r");

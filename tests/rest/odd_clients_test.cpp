@@ -9,6 +9,7 @@ namespace {
 
 using namespace plr::test;
 using plr::rest::Operation;
+using enum plr::rest::Operation;
 
 constexpr std::size_t kMebibyte = 1U << 20;
 
@@ -61,7 +62,7 @@ class OddClients : public testing::Test {
         rig_.add("/events", std::make_shared<plr::rest::PropertyRestResource>(false));
         rig_.start();
         good_ = rig_.registeredClient("good");
-        good_->send(Operation::kSet, "/kept/x", vox::array_creator()("x"));
+        good_->send(kSet, "/kept/x", vox::array_creator()("x"));
         EXPECT_EQ(good_->get("/kept/x@0"), vox::string("x"));
     }
     // Sends a message both ways and sees that the service still answers: this
@@ -82,8 +83,7 @@ TEST_F(OddClients, EveryKeyMayHoldAnythingAndNoneNeedBeThere) {
     for (const char* key : {"o", "a", "r", "v", "e"}) {
         for (const auto& [name, value] : oddValues()) {
             SCOPED_TRACE(key + (": " + name));
-            for (const Operation operation : {Operation::kSet, Operation::kGet, Operation::kPush,
-                                              Operation::kPop, Operation::kNotify}) {
+            for (const Operation operation : {kSet, kGet, kPush, kPop, kNotify}) {
                 const vox::dict message = odd_->message(operation, "/kept/x");
                 message[key] = value;
                 send(message);
@@ -93,7 +93,7 @@ TEST_F(OddClients, EveryKeyMayHoldAnythingAndNoneNeedBeThere) {
         }
     }
     for (int present = 0; present < 16; ++present) {
-        const vox::dict message = odd_->message(Operation::kGet, "/kept/x");
+        const vox::dict message = odd_->message(kGet, "/kept/x");
         const char* const keys[] = {"o", "a", "r", "v"};
         for (int i = 0; i < 4; ++i)
             if (present >> i & 1)
@@ -105,16 +105,16 @@ TEST_F(OddClients, EveryKeyMayHoldAnythingAndNoneNeedBeThere) {
 TEST_F(OddClients, ThatComeAndGoLeaveNoDescriptorBehind) {
     const auto visit = [this](int round) {
         auto client = rig_.registeredClient("visitor" + std::to_string(round));
-        client->send(Operation::kPush, "/kept/fd");
-        client->send(Operation::kSet, "/kept/fd", vox::object::adopt(vox_fd_create(0)));
+        client->send(kPush, "/kept/fd");
+        client->send(kSet, "/kept/fd", vox::object::adopt(vox_fd_create(0)));
         if (round % 2 == 0) {
             EXPECT_TRUE(vox::array(client->get("")));
         }
-        client->ask(client->message(Operation::kGet, "*"));  // under way when it leaves
+        client->ask(client->message(kGet, "*"));  // under way when it leaves
     };
     const auto settled = [this] {
         static_cast<void>(good_->get("/connections"));
-        good_->send(Operation::kSet, "/kept/fd", nullptr);
+        good_->send(kSet, "/kept/fd", nullptr);
         static_cast<void>(good_->get(""));
         return openDescriptors();
     };

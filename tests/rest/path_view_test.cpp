@@ -4,8 +4,7 @@
 
 namespace {
 
-using plr::rest::path_join;
-using plr::rest::PathView;
+using namespace plr::rest;
 
 // Head, current segment and tail; '<' and '>' where the view says it has them.
 std::string look(const PathView& view) {

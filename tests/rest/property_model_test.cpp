@@ -14,6 +14,7 @@ namespace {
 using namespace plr::test;
 using namespace plr::test::property_model;
 using plr::rest::PathView;
+using enum plr::rest::Operation;
 
 constexpr int kSteps = kSanitized ? 10'000 : 100'000;
 constexpr std::uint32_t kSeed = 20'261'121;
@@ -82,9 +83,8 @@ class PropertyModel : public testing::TestWithParam<bool> {
     }
 
     Step randomStep() {
-        static constexpr Operation kOperations[] = {
-            Operation::kGet,  Operation::kSet,  Operation::kSet, Operation::kPush,
-            Operation::kPush, Operation::kPush, Operation::kPop, Operation::kNotify};
+        static constexpr Operation kOperations[] = {kGet,  kSet,  kSet, kPush,
+                                                    kPush, kPush, kPop, kNotify};
         Step step{
             oneOf(kOperations), Kind::Root, below(4) == 0 ? "in/tree" : "/kept", {}, {}, {}, {}};
         const vox::object number = vox::int64(below(4));  // the same one comes often
@@ -112,7 +112,7 @@ class PropertyModel : public testing::TestWithParam<bool> {
 
     void dropOne() {
         Connection& client = clients_[below(static_cast<unsigned>(clients_.size()))];
-        FakeRestContext context{Operation::kNotify};
+        FakeRestContext context{kNotify};
         resource_.handleDroppedConnection(context, PathView("/kept"), client);
         client.reset();
     }

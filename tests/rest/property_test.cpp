@@ -5,10 +5,10 @@
 
 namespace {
 
+using namespace plr::rest;
 using namespace plr::test;
+using enum Operation;
 namespace model = plr::test::property_model;
-using plr::rest::Operation;
-using plr::rest::PropertyRestResource;
 
 // Every operation on every kind of path, by "me", who watches nothing or all: the
 // model's answers and notifications come, and the resource shows the model's state.
@@ -27,10 +27,10 @@ class PropertyTable : public testing::TestWithParam<bool> {
                                path.subpath,
                                "/kept" + path.text,
                                model::partsOf(vox::int64(7))};
-        SCOPED_TRACE(plr::rest::asString(operation) + (" " + step.path));
+        SCOPED_TRACE(asString(operation) + (" " + step.path));
         const model::Outcome expected = model_.apply(step, me_);
         Texts seen;
-        if (operation == Operation::kGet)
+        if (operation == kGet)
             seen.push_back("answer " + client_->textAt(step.path));
         else
             client_->send(operation, step.path, step.value);
@@ -41,12 +41,12 @@ class PropertyTable : public testing::TestWithParam<bool> {
     }
     void watchAll() {
         for (const model::Path& path : {kRoot, kWatched, kX})
-            play(Operation::kPush, path);
+            play(kPush, path);
     }
     void expectSameState() {
         for (const model::Path& path : model::kRootPaths)
-            play(Operation::kGet, path);
-        play(Operation::kGet, {model::Kind::ResourceWatchers, "/x/_/watchers", "x"});
+            play(kGet, path);
+        play(kGet, {model::Kind::ResourceWatchers, "/x/_/watchers", "x"});
     }
 
     const model::Path kRoot = model::kRootPaths[0];
@@ -76,17 +76,16 @@ TEST_P(PropertyTable, HasTheModelsCells) {
         {Kind::ResourceWatchers, "/x/_/watchers", "x"},
         {Kind::ResourceWatchers, "/y/_/watchers", "y"}};
     paths.insert(paths.end(), std::begin(model::kRootPaths), std::end(model::kRootPaths));
-    play(Operation::kSet, kX);
+    play(kSet, kX);
     for (const model::Path& path : paths)
         for (const bool watches : {false, true})
-            for (const Operation operation : {Operation::kGet, Operation::kSet, Operation::kPush,
-                                              Operation::kPop, Operation::kNotify}) {
+            for (const Operation operation : {kGet, kSet, kPush, kPop, kNotify}) {
                 if (watches)
                     watchAll();
                 play(operation, path);
                 expectSameState();
                 for (const model::Path& watched : {kRoot, kWatched, kX})
-                    play(Operation::kPop, watched);
+                    play(kPop, watched);
             }
 }
 
@@ -100,16 +99,16 @@ TEST(Property, WhenAClientWentWhoWatchesWhatIsWatchedIsToldOnce) {
     rig.add("/tree/kept", std::make_shared<PropertyRestResource>(true));
     rig.start();
     const auto client = rig.registeredClient("me");
-    client->send(Operation::kPush, "/tree/kept/_/watched");
+    client->send(kPush, "/tree/kept/_/watched");
     EXPECT_EQ(client->takeMessages().size(), 1U);
     for (const bool isByPop : {false, true}) {
         auto other = rig.registeredClient("other");
-        other->send(Operation::kPush, "/tree/kept/x");
-        other->send(Operation::kPush, "/tree/kept/y");
+        other->send(kPush, "/tree/kept/x");
+        other->send(kPush, "/tree/kept/y");
         static_cast<void>(other->takeMessages());
         EXPECT_EQ(client->takeMessages().size(), 2U);
         if (isByPop)
-            other->send(Operation::kPop, "/connections");
+            other->send(kPop, "/connections");
         else
             other.reset();
         Texts told;
@@ -119,7 +118,7 @@ TEST(Property, WhenAClientWentWhoWatchesWhatIsWatchedIsToldOnce) {
 }
 
 TEST(Watchable, HasItsWatchersOnceUntilTheyAreRemoved) {
-    plr::rest::WatchableRestResourceHelper watchers;
+    WatchableRestResourceHelper watchers;
     std::shared_ptr<plr::rest::RestResourceConnection> watcher =
         std::make_shared<FakeRestConnection>("me");
     EXPECT_TRUE(watchers.addWatcher(watcher));

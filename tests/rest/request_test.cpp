@@ -5,11 +5,11 @@
 
 namespace {
 
+using namespace plr::rest;
 using namespace plr::test;
-using plr::rest::Operation;
-using plr::rest::RequestRestResource;
 using Reply = std::shared_ptr<vox::object>;
 using Client = std::unique_ptr<RawRestClient>;
+using enum Operation;
 
 std::string errorOf(const vox::object& reply) {
     return std::string(vox::dict(reply).text("e"));
@@ -36,23 +36,23 @@ class Requests : public testing::Test {
   protected:
     Requests() {
         rig_.add("/requests", requests_);
-        rig_.add("/queued", std::make_shared<RequestRestResource>(
-                                plr::rest::queue_requests{.limit = 2, .total = 3}));
+        rig_.add("/queued",
+                 std::make_shared<RequestRestResource>(queue_requests{.limit = 2, .total = 3}));
         rig_.start();
         asker_ = rig_.registeredClient("asker");
     }
 
     [[nodiscard]] Client provider(const char* name, const char* path) const {
         Client made = rig_.registeredClient(name);
-        made->send(Operation::kPush, path);
+        made->send(kPush, path);
         static_cast<void>(made->takeMessages());
         return made;
     }
     void ask(const char* path, int value) const {
-        asker_->ask(asker_->message(Operation::kGet, path, vox::int64(value)));
+        asker_->ask(asker_->message(kGet, path, vox::int64(value)));
     }
     [[nodiscard]] std::string exchange(const char* path) const {
-        return errorOf(asker_->exchange(asker_->message(Operation::kGet, path)));
+        return errorOf(asker_->exchange(asker_->message(kGet, path)));
     }
     // The errors of the next `count` answers to what was asked.
     [[nodiscard]] Texts nextErrors(std::size_t count) {
@@ -91,13 +91,13 @@ TEST_F(Requests, AreAnsweredByTheirProviderNowOrLaterWithAValueOrAnError) {
     });
     EXPECT_EQ(asker_->get("/requests/call", vox::int64(5)), vox::int64(5));
     const auto answer = [&](const vox::object& value) {
-        return oneLine(asker_->exchange(asker_->message(Operation::kGet, "requests/call", value)));
+        return oneLine(asker_->exchange(asker_->message(kGet, "requests/call", value)));
     };
     EXPECT_EQ(answer(vox::string("bad")), R"({"o": "get","r": "requests/call","e": "busy"})");
     EXPECT_EQ(answer(nullptr), R"({"o": "get","r": "requests/call"})");
     EXPECT_TRUE(came.wait() && came.wait());
 
-    asker_->ask(asker_->message(Operation::kGet, "/requests/call", vox::string("later")));
+    asker_->ask(asker_->message(kGet, "/requests/call", vox::string("later")));
     EXPECT_TRUE(came.wait());
     EXPECT_EQ(asker_->textAt("/requests/call/waiting"), "1");
     sink.on([&] {
@@ -105,14 +105,14 @@ TEST_F(Requests, AreAnsweredByTheirProviderNowOrLaterWithAValueOrAnError) {
         kept.clear();
     });
     EXPECT_TRUE(asker_->replied.wait());
-    EXPECT_EQ(plr::rest::getReplyValue(asker_->replies().at(0)), vox::int64(7));
+    EXPECT_EQ(getReplyValue(asker_->replies().at(0)), vox::int64(7));
     EXPECT_EQ(asker_->textAt("/requests/call/waiting"), "0");
 }
 
 TEST_F(Requests, AProviderKilledInMidRequestIsToldToWhoWaitsAndASecondTakesOver) {
     Client first = provider("first", "/requests/call");
     ask("/requests/call", 1);
-    asker_->send(Operation::kGet, "/requests/call", vox::int64(2));  // wants no reply
+    asker_->send(kGet, "/requests/call", vox::int64(2));  // wants no reply
     EXPECT_EQ(gotBy(first), (Texts{"get asker /requests/call 1", "get asker /requests/call 2"}));
     EXPECT_EQ(asker_->textAt("/requests/*"), R"({"call": {"provider": "first","waiting": 2}})");
     first.reset();
@@ -134,12 +134,12 @@ TEST_F(Requests, ASecondProviderTakesTheFirstOnesPlaceAndAPopEndsEach) {
     const Client second = provider("second", "/requests/call");
     ask("/requests/call", 2);
     EXPECT_EQ(gotBy(second), (Texts{"get asker /requests/call 2"}));
-    asker_->send(Operation::kPop, "/requests/call");
+    asker_->send(kPop, "/requests/call");
     EXPECT_EQ(asker_->textAt("/requests/call/waiting"), "2") << "only its own POP ends a provider";
-    first->send(Operation::kPop, "/requests/call");
+    first->send(kPop, "/requests/call");
     EXPECT_EQ(nextErrors(1), (Texts{"provider is gone"}));
     EXPECT_EQ(asker_->textAt("/requests/*"), R"({"call": {"provider": "second","waiting": 1}})");
-    second->send(Operation::kPop, "/requests/call");
+    second->send(kPop, "/requests/call");
     EXPECT_EQ(nextErrors(1), (Texts{"provider is gone"}));
     EXPECT_EQ(asker_->textAt("/requests"), "[]");
 }
@@ -148,13 +148,13 @@ TEST_F(Requests, WaitForAProviderInOrderAndWithinLimits) {
     for (int i = 1; i <= 3; i++)
         ask("/queued/a", i);  // the third is one too many
     EXPECT_EQ(nextErrors(1), (Texts{"too many requests"}));
-    asker_->send(Operation::kGet, "/queued/b", vox::int64(4));
+    asker_->send(kGet, "/queued/b", vox::int64(4));
     EXPECT_EQ(exchange("/queued/c"), "too many requests") << "three wait in all";
     EXPECT_EQ(asker_->textAt("/queued/*"),
               R"({"a": {"provider": null,"waiting": 2},"b": {"provider": null,"waiting": 1}})");
 
     Client first = rig_.registeredClient("first");
-    first->send(Operation::kPush, "/queued/a");
+    first->send(kPush, "/queued/a");
     EXPECT_EQ(first->takeMessages(), (Texts{"get asker /queued/a 1", "get asker /queued/a 2"}));
     ask("/queued/a", 5);
     EXPECT_EQ(gotBy(first), (Texts{"get asker /queued/a 5"}));
@@ -170,7 +170,7 @@ TEST_F(Requests, OfAClientThatDropsWaitNoMore) {
     const Client provider = this->provider("provider", "/queued/call");
     Client other = rig_.registeredClient("other");
     for (const char* path : {"/queued/call", "/queued/a", "/queued/a"})
-        other->ask(other->message(Operation::kGet, path));
+        other->ask(other->message(kGet, path));
     static_cast<void>(other->takeMessages());
     ask("/queued/a", 1);
     EXPECT_EQ(nextErrors(1), (Texts{"too many requests"}));
@@ -188,7 +188,7 @@ TEST_F(Requests, AtAProviderHaveALimitToo) {
         ask("/requests/call", 1);
     EXPECT_EQ(exchange("/requests/call"), "too many requests");
     EXPECT_EQ(asker_->textAt("/requests/call/waiting"), "1024");
-    provider->send(Operation::kPop, "/requests/call");
+    provider->send(kPop, "/requests/call");
     EXPECT_EQ(nextErrors(1), (Texts{"provider is gone"}));
 }
 

@@ -17,19 +17,14 @@
 
 namespace {
 
+using namespace plr;
+using namespace plr::rest;
 using namespace plr::test;
 using namespace std::chrono_literals;
-using plr::RestModule;
-using plr::rest::AssertionHandle;
-using plr::rest::AssertionProvider;
-using plr::rest::AssertionState;
-using plr::rest::Operation;
-using plr::rest::PathView;
-using plr::rest::RestResourceContext;
 
 constexpr const char* kName = "net.example.rest";
 constexpr const char* kAssertion = "/assertions/busy";
-constexpr plr::ReconnectPolicy kQuick{1ms, 4ms};
+constexpr ReconnectPolicy kQuick{1ms, 4ms};
 constexpr std::size_t kProperties = 5;
 constexpr std::size_t kClients = 6;
 constexpr int kRestarts = kSanitized ? 15 : 50;
@@ -47,7 +42,7 @@ Values& valuesIn(int memory) {
 
 // Properties "0", "1", …, which start as they were left: a value is stored before
 // anybody is told.
-class StoredProperties : public plr::rest::PropertyRestResource {
+class StoredProperties : public PropertyRestResource {
   public:
     explicit StoredProperties(Values& values) : PropertyRestResource(true), values_(values) {
         for (std::size_t i = 0; i < kProperties; ++i) {
@@ -90,7 +85,7 @@ int serviceMain() {
     sigaddset(&end, SIGTERM);
     ::pthread_sigmask(SIG_BLOCK, &end, nullptr);
     const auto queue = dispatch::queue::create("service");
-    auto server = plr::rest::RestServerExample::create(queue, kName);
+    auto server = RestServerExample::create(queue, kName);
     server->registerResource("/connections", std::make_shared<plr::rest::ConnectionRestResource>());
     server->registerResource("/kept", std::make_shared<StoredProperties>(valuesIn(3)));
     server->registerResource("/assertions", std::make_shared<plr::rest::AssertionRestResource>());
@@ -194,7 +189,7 @@ class Setter : ModuleClient {
         for (std::size_t i = 0; i < kProperties; ++i)
             module.setProperty(pathOf(i), vox::int64(number_));
         board_.change([this] { board_.written = number_; });
-        module.sendRequest("", {}, kBound, [this](const plr::Result<vox::object>& heard) {
+        module.sendRequest("", {}, kBound, [this](const Result<vox::object>& heard) {
             if (heard)
                 setNext();
         });
@@ -210,11 +205,10 @@ class Granter : ModuleClient {
   public:
     Granter() : ModuleClient("granter") {
         queue.sync([this] {
-            provider_.emplace(module, kAssertion,
-                              [this](const plr::rest::AssertionAcquireState& wanted) {
-                                  if (wanted.state == AssertionState::kPending)
-                                      provider_->grant();
-                              });
+            provider_.emplace(module, kAssertion, [this](const AssertionAcquireState& wanted) {
+                if (wanted.state == AssertionState::kPending)
+                    provider_->grant();
+            });
             module.connectToService(kName, kQuick);
         });
     }

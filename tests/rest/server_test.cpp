@@ -13,6 +13,7 @@ namespace {
 
 using namespace plr::rest;
 using namespace plr::test;
+using enum Operation;
 
 // Answers what it sees of the author.
 std::shared_ptr<RestResourceBase> author() {
@@ -86,12 +87,12 @@ TEST_F(RestServer, ListsConnectionsThatRegisteredOnceAndForgetsThem) {
     const auto third = rig.registeredClient("b");
     EXPECT_EQ(third->textAt("/connections"), R"([0: "b",1: "b",2: "me"])");
     // A second registration changes nothing.
-    vox::dict again = me.message(Operation::kPush, "/connections");
+    vox::dict again = me.message(kPush, "/connections");
     again["a"] = vox::string("renamed");
     me.send(again);
     EXPECT_EQ(me.textAt("/connections"), R"([0: "b",1: "b",2: "me"])");
-    me.send(Operation::kPop, "/connections");
-    me.send(Operation::kPop, "/connections");
+    me.send(kPop, "/connections");
+    me.send(kPop, "/connections");
     EXPECT_TRUE(rig.waitForDrop()) << "for the others it is gone";
     EXPECT_EQ(me.textAt("/connections/*"), R"([0: "b",1: "b"])");
     EXPECT_EQ(me.textAt("/author"), R"("unknown, says "me"")");
@@ -109,13 +110,13 @@ TEST_F(RestServer, BoundsTheNamesOfConnections) {
         {vox::int64(5), R"([0: ""])"},
     };
     for (const auto& [name, expected] : rows) {
-        vox::dict message = client->message(Operation::kPush, "/connections");
+        vox::dict message = client->message(kPush, "/connections");
         message["a"] = name;
         client->send(message);
         EXPECT_EQ(client->textAt("/connections"), expected);
-        client->send(Operation::kPop, "/connections");
+        client->send(kPop, "/connections");
     }
-    client->send(Operation::kPush, "/connections/below");
+    client->send(kPush, "/connections/below");
     EXPECT_EQ(client->textAt("/connections"), "[]");
 }
 
@@ -128,16 +129,16 @@ TEST_F(RestServer, BoundsTheNamesThatClientsMakeWhereThatIsWanted) {
     rig.add("/p", properties);
     start().registerName();
     for (const char* path : {"/a/x", "/a/y", "/a/y/provider", "/a/x/provider", "/p/x", "/p/y"})
-        client->send(Operation::kPush, path);
+        client->send(kPush, path);
     for (const char* path : {"/p/z", "/p/y"})
-        client->send(Operation::kSet, path, vox::int64(1));
-    client->send(Operation::kPush, "/p/z");
+        client->send(kSet, path, vox::int64(1));
+    client->send(kPush, "/p/z");
     EXPECT_EQ(client->takeMessages(),
               (Texts{R"(notify me /a/x/provider {"generation": 1,)"
                      R"("state": "1:kPending"})",
                      "notify me /p/x null", "notify me /p/y null", "notify me /p/y 1"}));
     // The service itself is not bound.
-    EXPECT_TRUE(rig.handleOwn(client->message(Operation::kSet, "/p/own", vox::int64(1))));
+    EXPECT_TRUE(rig.handleOwn(client->message(kSet, "/p/own", vox::int64(1))));
     EXPECT_EQ(client->textAt("/p"), R"([0: "own",1: "x",2: "y"])");
     EXPECT_EQ(client->textAt("/a"), R"([0: "x"])");
 }
@@ -145,9 +146,9 @@ TEST_F(RestServer, BoundsTheNamesThatClientsMakeWhereThatIsWanted) {
 TEST_F(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
     rig.add("/leaf", std::make_shared<FakeRestResource>());
     start();
-    EXPECT_EQ(oneLine(client->exchange(client->message(Operation::kGet, "/leaf/x"))),
+    EXPECT_EQ(oneLine(client->exchange(client->message(kGet, "/leaf/x"))),
               R"({"o": "get","r": "/leaf/x","v": "value"})");
-    vox::dict rootless = client->message(Operation::kGet, "");
+    vox::dict rootless = client->message(kGet, "");
     rootless["r"] = vox::int64(7);
     EXPECT_EQ(oneLine(client->exchange(rootless)),
               R"({"o": "get","r": 7,"v": [0: "connections",1: "leaf",2: "~drops"]})")
@@ -155,17 +156,16 @@ TEST_F(RestServer, RepliesWithOperationAndPathAndDropsWhatIsUnhandled) {
     // None of these is answered: only the GET of the root behind each of them is.
     client->ask(createPingMessage());
     client->ask(vox::dict::create());
-    const std::pair<Operation, const char*> unanswered[] = {
-        {Operation::kGet, "/unknown"},
-        {Operation::kGet, "/connections/unknown"},
-        {Operation::kPing, "/leaf"},
-        {Operation::kNone, "/leaf"},
-        {Operation::kSet, "*"}};
+    const std::pair<Operation, const char*> unanswered[] = {{kGet, "/unknown"},
+                                                            {kGet, "/connections/unknown"},
+                                                            {kPing, "/leaf"},
+                                                            {kNone, "/leaf"},
+                                                            {kSet, "*"}};
     for (const auto& [operation, path] : unanswered)
         client->ask(client->message(operation, path));
     // Nor is what wants no answer.
     for (const char* path : {"/leaf", "", "*", "/connections"})
-        client->send(Operation::kGet, path);
+        client->send(kGet, path);
     EXPECT_EQ(client->takeMessages(), Texts());
     EXPECT_TRUE(client->replies().empty());
     // They are answered by the end of the connection.
@@ -189,11 +189,11 @@ TEST_F(RestServer, RedirectsAMessageTenTimesAtMost) {
         return rig.handleOwn(
             createRestMessage(asObject(operation), nullptr, vox::string("/loop"), nullptr));
     };
-    EXPECT_FALSE(send(Operation::kGet));
+    EXPECT_FALSE(send(kGet));
     EXPECT_EQ(reached, 11);
-    EXPECT_FALSE(send(Operation::kGet)) << "each message has its own ten";
+    EXPECT_FALSE(send(kGet)) << "each message has its own ten";
     EXPECT_EQ(reached, 22);
-    EXPECT_TRUE(send(Operation::kSet));
+    EXPECT_TRUE(send(kSet));
     EXPECT_EQ(leaf->calls, (Texts{"SET "}));
 }
 
@@ -239,8 +239,8 @@ TEST_F(RestServer, DeferredRepliesLeaveWithTheirLastHolder) {
             }));
     start();
     for (int i = 0; i < 3; ++i)
-        client->ask(client->message(Operation::kGet, "/late"));
-    client->send(Operation::kGet, "/late");  // wants no answer, and leaves nothing to hold
+        client->ask(client->message(kGet, "/late"));
+    client->send(kGet, "/late");  // wants no answer, and leaves nothing to hold
     EXPECT_EQ(client->takeMessages(), Texts());
     auto held = rig.queue().sync([&] { return std::exchange(replies, {}); });
     ASSERT_EQ(held.size(), 4U);
@@ -269,7 +269,7 @@ TEST_F(RestServer, SurvivesAResourceThatThrows) {
     rig.add("/throws", std::make_shared<ScriptedResource>(nullptr, [](auto& context, auto&&) {
                 return vox::dyn_cast_or_default(context.getRestValue(), 0ULL) != 0;
             }));
-    start().send(Operation::kSet, "/throws", vox::int64(-1));
+    start().send(kSet, "/throws", vox::int64(-1));
     EXPECT_EQ(client->takeMessages(), Texts());
     EXPECT_EQ(reports.count("dyn_cast to uint64_t requires nonnegative values"), 1U);
 }
@@ -277,7 +277,7 @@ TEST_F(RestServer, SurvivesAResourceThatThrows) {
 TEST_F(RestServer, IgnoresItsClientsOnceItIsGone) {
     EXPECT_EQ(start().textAt("/connections"), "[]");
     rig.stop();
-    client->ask(client->message(Operation::kGet, ""));
+    client->ask(client->message(kGet, ""));
     client->connection().cancel();
     EXPECT_TRUE(client->waitForEnd());
     ASSERT_EQ(client->replies().size(), 1U);

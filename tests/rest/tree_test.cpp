@@ -9,10 +9,9 @@ namespace {
 using namespace plr::rest;
 using namespace plr::test;
 using Texts = std::vector<std::string>;
+using enum Operation;
 
-constexpr Operation kOperations[] = {Operation::kNone, Operation::kSet, Operation::kGet,
-                                     Operation::kPush, Operation::kPop, Operation::kNotify,
-                                     Operation::kPing};
+constexpr Operation kOperations[] = {kNone, kSet, kGet, kPush, kPop, kNotify, kPing};
 
 TEST(RestResource, CallsTheHandlerOfTheOperationAndHandlesNothingByItself) {
     const std::vector<Texts> expected = {{},        {"SET a"},    {"GET a"}, {"PUSH a"},
@@ -55,7 +54,7 @@ class Tree : public testing::Test {
             return oneLine(context.replies()[0]);
         return handled ? "handled" : "";
     }
-    std::string get(const char* path) { return send(Operation::kGet, path); }
+    std::string get(const char* path) { return send(kGet, path); }
 
     TreeRestResource root_;
     const std::shared_ptr<FakeRestResource> a_ = std::make_shared<FakeRestResource>();
@@ -64,9 +63,9 @@ class Tree : public testing::Test {
 
 TEST_F(Tree, RoutesByWholeSegments) {
     for (const char* path : {"a", "/a", "a/x", "/a/x/y"})
-        EXPECT_EQ(send(Operation::kSet, path), "handled") << path;
+        EXPECT_EQ(send(kSet, path), "handled") << path;
     EXPECT_EQ(a_->calls, (Texts{"SET ", "SET ", "SET x", "SET x"}));
-    EXPECT_EQ(send(Operation::kPush, "/t/b/c"), "handled");
+    EXPECT_EQ(send(kPush, "/t/b/c"), "handled");
     EXPECT_EQ(b_->calls, (Texts{"PUSH c"}));
     for (const char* path : {"A", "aa", "t/a", "t/b2", "b", "**", "t/bb", "t/*x"})
         for (const Operation operation : kOperations)
@@ -95,7 +94,7 @@ TEST_F(Tree, ListsAndDumpsItsChildrenInOrder) {
     EXPECT_EQ(a_->calls.at(0), "GET *");
     a_->calls.clear();
     for (const Operation operation : kOperations) {
-        if (operation == Operation::kGet)
+        if (operation == kGet)
             continue;
         EXPECT_EQ(send(operation, "/t"), "") << asString(operation);
         EXPECT_EQ(send(operation, "*"), "handled") << asString(operation);
@@ -112,16 +111,16 @@ TEST_F(Tree, InstallsBelowNodesThatExist) {
     for (const char* path : {"", "/", "x/y", "t/x/y", "a/x", "t/b/x"})
         EXPECT_FALSE(install(path, late)) << path;
     EXPECT_TRUE(install("t/new/", late));
-    EXPECT_EQ(send(Operation::kSet, "t/new"), "handled");
+    EXPECT_EQ(send(kSet, "t/new"), "handled");
     // A name that is taken stays with its first resource.
     EXPECT_TRUE(install("a", late));
-    EXPECT_EQ(send(Operation::kSet, "a"), "handled");
+    EXPECT_EQ(send(kSet, "a"), "handled");
     EXPECT_EQ(a_->calls.size(), 1U);
     EXPECT_EQ(late->calls.size(), 1U);
 }
 
 TEST_F(Tree, TellsEveryResourceOfADroppedConnection) {
-    FakeRestContext context(Operation::kNone);
+    FakeRestContext context(kNone);
     root_.handleDroppedConnection(context, PathView("/"),
                                   std::make_shared<FakeRestConnection>("gone"));
     EXPECT_EQ(a_->dropped, (Texts{"/a gone"}));
@@ -149,8 +148,7 @@ TEST_F(Tree, AHandlerMayInstallResources) {
 }
 
 TEST(ReplyDict, CollectsAnswersUnderTheirScope) {
-    FakeRestContext inner(Operation::kGet, vox::int64(7),
-                          std::make_shared<FakeRestConnection>("me"));
+    FakeRestContext inner(kGet, vox::int64(7), std::make_shared<FakeRestConnection>("me"));
     std::shared_ptr<vox::object> deferred;
     {
         ReplyDictRestResourceContextDecorator answers(inner);
