@@ -185,6 +185,24 @@ TEST_F(VoxRequestRace, CallsEachHandlerOnceAndLeavesNothing) {
     }));
 }
 
+TEST(VoxRequests, ByTheHundredThousandHaveOneTimerAndEndTogether) {
+    constexpr std::uint32_t kRequests = 100'000;
+    vox_limits_t limits = vox_limits_default();
+    limits.max_pending_replies = limits.max_open_requests = kRequests;
+    Inbox replies;
+    RawPair pair(&limits);
+    pair.start();
+    std::thread reader([&] { static_cast<void>(pair.peer.read()); });
+    for (std::uint32_t n = 0; n < kRequests; ++n)
+        ASSERT_NE(request(pair.end, replies, 100 + n % 2), 0u);
+    EXPECT_TRUE(replies.wait(kRequests));
+    EXPECT_EQ(pair.end.counts().pending_replies, 0u);
+    for (const Ref& reply : replies.all())
+        ASSERT_EQ(vox_error_get_code(reply), VOX_ERROR_REQUEST_TIMED_OUT);
+    vox_connection_cancel(pair.end);
+    reader.join();
+}
+
 TEST(VoxRequests, GivenUpBeforeTheHelloAreNotSent) {
     Inbox replies;
     RawPair pair;
