@@ -13,9 +13,8 @@
 #include "src/text/conversion_chain.h"
 
 // Messages from outside, read as PDUs, as user data, as USSD strings, as pages of cell
-// broadcast and as names of a SIM:
-// what comes out is well-formed text. The same octets as a text: what is sent of it
-// reads back. The input: data coding scheme, length, choices, octets.
+// broadcast and as names of a SIM: what comes out is well-formed text. The same octets as
+// a text: what is sent of it reads back. The input: data coding scheme, length, choices, octets.
 namespace {
 
 using Octets = std::span<const std::uint8_t>;
