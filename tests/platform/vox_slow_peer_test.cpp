@@ -14,7 +14,6 @@ using vox_link::frame_type;
 
 vox_limits_t smallQueue(vox_overflow_policy_t policy) {
     vox_limits_t limits = vox_limits_default();
-    limits.max_queued_bytes = 64u << 10;
     limits.max_queued_messages = 100;
     limits.overflow = policy;
     return limits;
@@ -23,8 +22,10 @@ vox_limits_t smallQueue(vox_overflow_policy_t policy) {
 // A peer with little room in the queue for it, which has said hello.
 class VoxSlowPeer : public ::testing::Test {
   protected:
-    void start(vox_overflow_policy_t policy, const End::Handler& first = {}) {
+    void start(vox_overflow_policy_t policy, const End::Handler& first = {},
+               std::uint32_t mostBytes = 64u << 10) {
         limits = smallQueue(policy);
+        limits.max_queued_bytes = mostBytes;
         pair.emplace(&limits);
         pair->start(first);
     }
@@ -33,6 +34,12 @@ class VoxSlowPeer : public ::testing::Test {
         const vox_statistics_t counts = pair->end.counts();
         return counts.queued_bytes <= times * limits.max_queued_bytes &&
                counts.queued_messages <= times * limits.max_queued_messages;
+    }
+    // Has the kernel take no more: until the peer reads nobody is about to write.
+    void block() {
+        pair->peer.send(plainMessage(1));
+        ASSERT_TRUE(pair->end.inbox.wait(1)) << "both have said hello";
+        ASSERT_EQ(pair->end.send(message(accepted++, 4u << 20)), 0);
     }
     // Sends messages of so many bytes until one is not taken; that error.
     int fill(std::size_t bytes) {
@@ -73,7 +80,8 @@ TEST_F(VoxSlowPeer, GetsOneMessageOfAnySizeWhenNothingWaits) {
 }
 
 TEST_F(VoxSlowPeer, LearnsHowManyMessagesWereDroppedWhenThatIsThePolicy) {
-    start(VOX_OVERFLOW_DROP);
+    start(VOX_OVERFLOW_DROP, {}, 8u << 20);
+    block();
     EXPECT_EQ(fill(0), ENOBUFS);  // there are too many messages
     for (int more = 0; more < 10; ++more)
         EXPECT_EQ(pair->end.send(message(1, 1000)), ENOBUFS);
